@@ -1,0 +1,43 @@
+// Row kernels that know Y'CbCr: matrices, ranges, 4:2:2 and V210. Names carry the colorimetry where it matters: _601 and
+// _709. "Vuyx"/"Bgrx" kernels ignore the source's fourth channel and write it opaque; "Vuya"/"Bgra" kernels copy it,
+// which serves straight and premultiplied pixels alike (premultiplied Y'CbCr is scaled about black).
+#pragma once
+
+#include "convert/RowKernel.h"
+
+namespace vexel {
+
+// Depth of 4:4:4:4 Y'CbCr: 8u video range <-> 32f with Y 0..1 and chroma about 0 (YuvDepthKernels.cpp).
+extern const RowKernelSet kVuya8To32f, kVuyx8To32f, kVuya32fTo8, kVuyx32fTo8;
+extern const RowKernelSet kVuya8ToVuyp32f;  // widens, then premultiplies
+
+// Matrices in 32f (YuvMatrix32fKernels.cpp).
+extern const RowKernelSet kBgra32fToVuya32f_601, kBgra32fToVuya32f_709, kBgrx32fToVuyx32f_601, kBgrx32fToVuyx32f_709;
+extern const RowKernelSet kVuya32fToBgra32f_601, kVuya32fToBgra32f_709, kVuyx32fToBgrx32f_601, kVuyx32fToBgrx32f_709;
+extern const RowKernelSet kVuya32f_601To709, kVuya32f_709To601, kVuyx32f_601To709, kVuyx32f_709To601;
+extern const RowKernelSet kVuya8ToBgra32f_601, kVuya8ToBgra32f_709, kVuyx8ToBgrx32f_601, kVuyx8ToBgrx32f_709;
+extern const RowKernelSet kBgra32fToVuya8_601, kBgra32fToVuya8_709;
+
+// Matrices in 8u fixed point (YuvMatrix8Kernels.cpp).
+extern const RowKernelSet kBgra8ToVuya8_601, kBgra8ToVuya8_709, kBgrx8ToVuyx8_601, kBgrx8ToVuyx8_709;
+extern const RowKernelSet kVuya8ToBgra8_601, kVuya8ToBgra8_709, kVuyx8ToBgrx8_601, kVuyx8ToBgrx8_709;
+extern const RowKernelSet kVuya8_601To709, kVuya8_709To601, kVuyx8_601To709, kVuyx8_709To601;
+
+// Packed 4:2:2, 8u (Packed422Kernels8.cpp).
+extern const RowKernelSet kUyvy8ToBgrx8_601, kUyvy8ToBgrx8_709, kYuyv8ToBgrx8_601, kYuyv8ToBgrx8_709;
+extern const RowKernelSet kUyvy8ToVuyx8, kYuyv8ToVuyx8, kVuyx8ToUyvy8;
+extern const RowKernelSet kSwap422_8u;  // UYVY <-> YUYV
+extern const RowKernelSet kUyvy8_601To709, kUyvy8_709To601, kYuyv8_601To709, kYuyv8_709To601;
+
+// Packed 4:2:2, 32f (Packed422Kernels32f.cpp).
+extern const RowKernelSet kSwap422_32f;
+extern const RowKernelSet kUyvy8To32f, kYuyv8To32f, kUyvy32fTo8, kYuyv32fTo8;
+extern const RowKernelSet kUyvy32fToVuyx32f;         // chroma of odd pixels interpolated with (-1, 9, 9, -1) / 16
+extern const RowKernelSet kUyvy32fToVuyx32fNearest;  // both pixels of a pair take the pair's chroma
+extern const RowKernelSet kVuyx32fToUyvy32f;
+
+// V210: 6 pixels in 16 bytes, 10-bit studio codes (V210Kernels.cpp).
+extern const RowKernelSet kUyvy8ToV210, kV210ToUyvy8, kUyvy32fToV210, kV210ToUyvy32f;
+extern const RowKernelSet kV210ToBgrx8_601, kV210ToBgrx8_709, kV210ToVuyx8, kV210_709ToVuyx8_601;
+
+}  // namespace vexel

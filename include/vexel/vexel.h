@@ -1,0 +1,191 @@
+/* Vexel: image processing for video. The flat C interface.
+ *
+ * Buffers are described by a base pointer to the first stored row, a signed row stride in bytes (`rowBytes`; row r starts
+ * at base + r * rowBytes), a width and a height in pixels, and a VX_PixelFormat. The caller owns every buffer it passes.
+ * Whether the first stored row is the top of the picture follows from the format (VX_IsOriginTopLeft).
+ *
+ * No function throws. Except for VX_Initialize and VX_Terminate, every function may be called from many threads at once.
+ * Functions that compute with floats run with flush-to-zero set and put the caller's floating-point mode back. */
+#ifndef VEXEL_VEXEL_H
+#define VEXEL_VEXEL_H
+
+#include <stdbool.h>
+#include <stddef.h>
+#include <stdint.h>
+
+#include "vexel/pixel_formats.h"
+
+#if defined(_WIN32)
+#if defined(VEXEL_BUILDING)
+#define VX_API __declspec(dllexport)
+#else
+#define VX_API __declspec(dllimport)
+#endif
+#else
+#define VX_API __attribute__((visibility("default")))
+#endif
+
+#ifdef __cplusplus
+#define VX_NOEXCEPT noexcept
+extern "C" {
+#else
+#define VX_NOEXCEPT
+#endif
+
+/* ---- Types ---------------------------------------------------------------------------------------------------- */
+
+/* A pixel layout as a 32-bit code of bit fields (see pixel_formats.h). Values without a name are legal values. */
+#ifdef __cplusplus
+enum class VX_PixelFormat : uint32_t {
+#define VX_FORMAT_ENUMERATOR(name, value, hostName, mapping) name = value,
+  VX_PIXEL_FORMATS(VX_FORMAT_ENUMERATOR)
+#undef VX_FORMAT_ENUMERATOR
+};
+#else
+typedef uint32_t VX_PixelFormat;
+enum {
+#define VX_FORMAT_ENUMERATOR(name, value, hostName, mapping) VX_PixelFormat_##name = (int32_t)value,
+  VX_PIXEL_FORMATS(VX_FORMAT_ENUMERATOR)
+#undef VX_FORMAT_ENUMERATOR
+};
+#endif
+
+/* Result of an operation: 0 is success, every failure is negative. */
+typedef enum VX_Result
+#ifdef __cplusplus
+    : int32_t
+#endif
+{
+  VX_Success = 0,
+  VX_ErrReserved1 = -1,
+  VX_ErrInvalidRectangle = -2,
+  VX_ErrUnsupportedFormat = -3,
+  VX_ErrUnsupportedDestinationFormat = -4,
+  VX_ErrDestinationTooNarrow = -7,
+  VX_ErrDestinationTooShort = -8,
+  VX_ErrNullSource = -11,
+  VX_ErrNullDestination = -12,
+  VX_ErrUnsupportedConversion = -13,
+  VX_ErrOutOfMemory = -16,
+  VX_ErrArgumentOutOfRange = -17,
+  VX_ErrReserved18 = -18,
+  VX_ErrFailed = -999,
+  VX_ErrFormatNotHandled = -1000
+} VX_Result;
+
+/* ---- Lifecycle, switches, diagnostics ---------------------------------------------------------------------------- */
+
+/* Starts the library: detects processor features and the cache, reads the configuration keys "VX.disableAVX" and
+ * "VX.disableAVX2" (true only if the text is exactly "true"), creates the CPU-bound executor. Reference counted; call it
+ * and VX_Terminate from one thread. Always VX_Success. Before it, all feature switches are off and plain kernels run. */
+VX_API VX_Result VX_Initialize(void) VX_NOEXCEPT;
+/* Undoes one VX_Initialize; the last one releases the executor. Switches and debug flags keep their values. */
+VX_API VX_Result VX_Terminate(void) VX_NOEXCEPT;
+
+/* The current value of the has-SSE4.1, has-AVX and has-AVX2 switches, after keys and debug flags. */
+VX_API bool VX_hasSSE4(void) VX_NOEXCEPT;
+VX_API bool VX_hasAVX(void) VX_NOEXCEPT;
+VX_API bool VX_hasAVX2(void) VX_NOEXCEPT;
+
+/* Sets one switch to value != 0: 0 motion path, 1 nothing, 2 SSE, 3 SSE2, 4 SSE3, 5 SSSE3, 6 SSE4.1, 7 SSE4.2, 8 AVX,
+ * 9 AVX2, 10 force top-left origin. Higher indices are ignored. A switch never makes a kernel run that the processor
+ * cannot execute. Always VX_Success. */
+VX_API VX_Result VX_SetDebugFlag(uint32_t index, int32_t value) VX_NOEXCEPT;
+
+/* True if the first stored row is the top of the picture: every format but the 4:4:4:4 ones with an A, P or X channel. */
+VX_API bool VX_IsOriginTopLeft(VX_PixelFormat format) VX_NOEXCEPT;
+VX_API bool VX_IsOriginBottomLeft(VX_PixelFormat format) VX_NOEXCEPT;
+
+/* "Low" for render quality 2, "High" for every other value. */
+VX_API const char* VX_RenderQualityName(int32_t renderQuality) VX_NOEXCEPT;
+/* Bytes of the largest-level unified cache found at start-up; 0 if unknown. */
+VX_API uint32_t VX_GetCacheSize(void) VX_NOEXCEPT;
+/* The name of a code, for instance "VX_ErrOutOfMemory"; "Unknown result". */
+VX_API const char* VX_ResultName(VX_Result result) VX_NOEXCEPT;
+/* The version of the library that is running, for instance "1.0.0". */
+VX_API const char* VX_GetVersion(void) VX_NOEXCEPT;
+
+/* ---- Pixel formats and buffers ----------------------------------------------------------------------------------- */
+
+/* Bytes of `height` rows of `width` pixels with the library's own row padding (4:4:4:4 rows to 64 bytes, 4:2:2 to 16,
+ * V210 to 128); whole-frame sizes for DV and 4:2:0. Rasters are computed in 32 bits and sign-extended. 0 for unknown
+ * values. `Invalid` is sized as 2 bytes per pixel. */
+VX_API int64_t VX_PixelFormatSize(VX_PixelFormat format, int32_t width, int32_t height) VX_NOEXCEPT;
+/* The format's name, for instance "UYVY_422_8u_709"; "Unknown pixel format". */
+VX_API const char* VX_PixelFormatName(VX_PixelFormat format) VX_NOEXCEPT;
+/* The format of that name (case-sensitive); Invalid if there is none or name is null. */
+VX_API VX_PixelFormat VX_PixelFormatFromName(const char* name) VX_NOEXCEPT;
+
+/* A 16-byte-aligned block from the host's recycling allocator, placed at a pseudo-random multiple of 128 bytes (0 to
+ * 8,064) past the raw block to spread buffers over cache sets. Null when out of memory or when bytes is 0. Give
+ * *rawBlock and *rawSize back to VX_FreeTransientMemoryBlock, which ignores null. */
+VX_API void* VX_AllocateTransientMemoryBlock(size_t bytes, void** rawBlock, size_t* rawSize) VX_NOEXCEPT;
+VX_API void VX_FreeTransientMemoryBlock(void* rawBlock, size_t rawSize) VX_NOEXCEPT;
+
+/* A pixel buffer with padded rows; *rowBytes is 0 for DV and 4:2:0 formats. An empty size is VX_Success with null
+ * pointers. VX_ErrOutOfMemory zeroes all outputs; sizes that 32 bits cannot express are refused that way. The transient
+ * pair is the same thing for buffers that live for one operation. */
+VX_API VX_Result VX_AllocatePixelBuffer(VX_PixelFormat format, int32_t width, int32_t height, void** rawBlock,
+                                        void** pixels, int32_t* rowBytes, size_t* rawSize) VX_NOEXCEPT;
+VX_API VX_Result VX_FreePixelBuffer(VX_PixelFormat format, void* rawBlock, size_t rawSize) VX_NOEXCEPT;
+VX_API VX_Result VX_AllocateTransientPixelBuffer(VX_PixelFormat format, int32_t width, int32_t height, void** rawBlock,
+                                                 void** pixels, int32_t* rowBytes, size_t* rawSize) VX_NOEXCEPT;
+VX_API VX_Result VX_FreeTransientPixelBuffer(VX_PixelFormat format, void* rawBlock, size_t rawSize) VX_NOEXCEPT;
+
+/* Copies bytes between areas that do not overlap; from half the cache size on past the cache. Always VX_Success. */
+VX_API VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) VX_NOEXCEPT;
+/* Turns a raster upside down. Row padding stays; height below 2 does nothing. VX_ErrOutOfMemory only if the scratch row
+ * of a very wide raster cannot be had. */
+VX_API VX_Result VX_FlipInPlace(void* base, int32_t rowBytes, int32_t width, int32_t height,
+                                VX_PixelFormat format) VX_NOEXCEPT;
+/* The address of pixel (x, y), y counting stored rows, of a 4:4:4:4 raster; nothing is clipped or checked.
+ * VX_ErrUnsupportedFormat for formats whose pixels have no address of their own; *pixel is then untouched. */
+VX_API VX_Result VX_ClipBufferToRect(void* base, int32_t rowBytes, VX_PixelFormat format, int32_t x, int32_t y,
+                                     void** pixel) VX_NOEXCEPT;
+
+/* ---- Conversion -------------------------------------------------------------------------------------------------- */
+
+/* Converts width x height pixels from one format to another; never scales. Each buffer is walked from its bottom picture
+ * row, so pictures keep their orientation. Source and destination must not overlap.
+ *
+ * A 4:2:0 picture is one block laid out as VX_GetPlanarBuffers says, its row bytes argument is not used. renderQuality
+ * above 1 interpolates chroma where 4:2:2 in 32f becomes 4:4:4:4; below 3 it lets special sources decode reduced.
+ *
+ * 0 done, and for height < 1; -3 a special source without a decoder; -4 a special destination inside a chain; -13 a
+ * special source that cannot be decoded to exactly width x height; -16 out of memory; -999 no chain of at most eight
+ * steps; -1000 a special destination without an encoder. Nothing is written on failure. */
+VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
+                            int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
+                            int32_t renderQuality) VX_NOEXCEPT;
+
+/* The formats that VX_Convert goes through between two raster formats, both ends included: up to 9 values into formats[],
+ * their number into *count. -999 if there is no chain; -3 or -4 for special formats. */
+VX_API VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
+                                      VX_PixelFormat formats[9], int32_t* count) VX_NOEXCEPT;
+
+/* Plane pointers and row bytes of a 4:2:0 picture held in one block: luma pitch = width (2 * width above 8 bits) to 128,
+ * chroma pitch = width / 2 to 128 (the luma pitch above 8 bits), planes of height rounded up to 32 rows; biplanar
+ * pictures have no height padding, chroma pitch = luma pitch and no third plane (null). Only computes. */
+VX_API VX_Result VX_GetPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, int32_t height, void* planes[3],
+                                     int32_t rowBytes[3]) VX_NOEXCEPT;
+/* The same for 8-bit biplanar pictures: both pitches are width to 128. The format is not used. */
+VX_API VX_Result VX_GetBiPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, int32_t height,
+                                       void* planes[2], int32_t rowBytes[2]) VX_NOEXCEPT;
+/* Copies the planes of 8-bit 4:2:0 pictures: height rows of width bytes of luma, height / 2 rows of width / 2 bytes of
+ * each chroma plane (width bytes of the interleaved one). */
+VX_API VX_Result VX_CopyPlanar_8u(const void* const srcPlanes[3], const int32_t srcRowBytes[3],
+                                  void* const dstPlanes[3], const int32_t dstRowBytes[3], int32_t width,
+                                  int32_t height) VX_NOEXCEPT;
+VX_API VX_Result VX_CopyBiPlanar_8u(const void* const srcPlanes[2], const int32_t srcRowBytes[2],
+                                    void* const dstPlanes[2], const int32_t dstRowBytes[2], int32_t width,
+                                    int32_t height) VX_NOEXCEPT;
+
+/* ---- Codec and camera formats ------------------------------------------------------------------------------------ */
+
+/* ---- Transpose and rotation -------------------------------------------------------------------------------------- */
+
+#ifdef __cplusplus
+} /* extern "C" */
+#endif
+
+#endif
