@@ -1,0 +1,20 @@
+#pragma once
+
+#include <cstdint>
+
+namespace zovmediatypes::color {
+
+// A colour space by its code points: primaries, transfer characteristics and matrix coefficients as ITU-T H.273 counts
+// them, with the depth in bits and the range of the samples. All zero is no colour space.
+struct ColorSpace {
+  int32_t mPrimaries;
+  int32_t mTransfer;
+  int32_t mMatrix;
+  int32_t mBitDepth;
+  bool mIsFullRange;
+  bool mIsRGB;
+
+  friend constexpr bool operator==(const ColorSpace&, const ColorSpace&) = default;
+};
+
+}  // namespace zovmediatypes::color
