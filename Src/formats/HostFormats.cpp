@@ -62,7 +62,7 @@ constexpr auto kFromHost = [] {
   return ordered;
 }();
 // 67 of the 71 named formats and all 23 unnamed ones.
-static_assert(kFromHost.size() == 90 && kFromHost.back().host != nullptr);
+static_assert(kFromHost.size() == 90 && kFromHost.back().group == 10);
 
 constexpr uint32_t kOpaqueFrame = 0x7F000020;
 

@@ -1,0 +1,286 @@
+// The catalogue: values, names, sizes, and the mapping to the host's formats and colour spaces.
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+#include <vector>
+
+#include "formats/FormatBits.h"
+#include "vexel/host_types.h"
+
+namespace vexel {
+namespace {
+
+using HostFormat = zovmediatypes::PixelFormat;
+
+struct Named {
+  uint32_t value;
+  std::string name;
+};
+
+// A second copy, kept by hand: saved projects and other programs hold these numbers and names.
+const Named kCatalogue[] = {
+    {0x0, "Invalid"},
+    {0x805, "VUYA_4444_8u"},
+    {0x809, "VUYP_4444_8u"},
+    {0x80D, "VUYX_4444_8u"},
+    {0xA05, "VUYA_4444_8u_709"},
+    {0xA09, "VUYP_4444_8u_709"},
+    {0xA0D, "VUYX_4444_8u_709"},
+    {0x905, "VUYA_4444_32f"},
+    {0x909, "VUYP_4444_32f"},
+    {0x90D, "VUYX_4444_32f"},
+    {0xB05, "VUYA_4444_32f_709"},
+    {0xB09, "VUYP_4444_32f_709"},
+    {0xB0D, "VUYX_4444_32f_709"},
+    {0x4, "BGRA_4444_8u"},
+    {0x8, "BGRP_4444_8u"},
+    {0xC, "BGRX_4444_8u"},
+    {0x104, "BGRA_4444_32f"},
+    {0x108, "BGRP_4444_32f"},
+    {0x10C, "BGRX_4444_32f"},
+    {0x1004, "ARGB_4444_8u"},
+    {0x1008, "PRGB_4444_8u"},
+    {0x100C, "XRGB_4444_8u"},
+    {0x1104, "ARGB_4444_32f"},
+    {0x1108, "PRGB_4444_32f"},
+    {0x110C, "XRGB_4444_32f"},
+    {0x811, "UYVY_422_8u"},
+    {0xA11, "UYVY_422_8u_709"},
+    {0x1811, "YUYV_422_8u"},
+    {0x1A11, "YUYV_422_8u_709"},
+    {0x911, "UYVY_422_32f"},
+    {0xB11, "UYVY_422_32f_709"},
+    {0x1911, "YUYV_422_32f"},
+    {0x1B11, "YUYV_422_32f_709"},
+    {0x851, "V210_422_10u"},
+    {0xA51, "V210_422_10u_709"},
+    {0x84, "BGRA_4444_15u"},
+    {0x88, "BGRP_4444_15u"},
+    {0x8C, "BGRX_4444_15u"},
+    {0x1084, "ARGB_4444_15u"},
+    {0x1088, "PRGB_4444_15u"},
+    {0x108C, "XRGB_4444_15u"},
+    {0x106, "BGRA_4444_32f_Linear"},
+    {0x10A, "BGRP_4444_32f_Linear"},
+    {0x10E, "BGRX_4444_32f_Linear"},
+    {0x1106, "ARGB_4444_32f_Linear"},
+    {0x110A, "PRGB_4444_32f_Linear"},
+    {0x110E, "XRGB_4444_32f_Linear"},
+    {0x1000821, "NTSCDV25"},
+    {0x2000821, "PALDV25"},
+    {0x7000821, "NTSCDV50"},
+    {0x8000821, "PALDV50"},
+    {0x3000A21, "NTSC_DV100_720p"},
+    {0x4000A21, "PAL_DV100_720p"},
+    {0x5000A21, "NTSC_DV100_1080i"},
+    {0x6000A21, "PAL_DV100_1080i"},
+    {0x9000831, "YUV_420_MPEG2_FIELD"},
+    {0xA000831, "YUV_420_MPEG2_FRAME"},
+    {0x9000031, "YUV_420_MPEG2_FIELD_FullRange"},
+    {0xA000031, "YUV_420_MPEG2_FRAME_FullRange"},
+    {0x9000A31, "YUV_420_MPEG2_FIELD_709"},
+    {0xA000A31, "YUV_420_MPEG2_FRAME_709"},
+    {0x9000231, "YUV_420_MPEG2_FIELD_FullRange_709"},
+    {0xA000231, "YUV_420_MPEG2_FRAME_FullRange_709"},
+    {0xB000831, "YUV_420_MPEG4_FIELD"},
+    {0xC000831, "YUV_420_MPEG4_FRAME"},
+    {0xB000031, "YUV_420_MPEG4_FIELD_FullRange"},
+    {0xC000031, "YUV_420_MPEG4_FRAME_FullRange"},
+    {0xB000A31, "YUV_420_MPEG4_FIELD_709"},
+    {0xC000A31, "YUV_420_MPEG4_FRAME_709"},
+    {0xB000231, "YUV_420_MPEG4_FIELD_FullRange_709"},
+    {0xC000231, "YUV_420_MPEG4_FRAME_FullRange_709"},
+};
+
+struct Listed {
+  std::string name;
+  uint32_t value;
+  std::string hostName;
+  HostFormat host;
+};
+
+const Listed kListed[] = {
+#define LISTED(name, value, hostName, mapping) {#name, value, #hostName, zovmediatypes::kPixelFormat_##hostName},
+    VX_PIXEL_FORMATS(LISTED)
+#undef LISTED
+};
+const Listed kUnnamed[] = {
+#define LISTED(value, hostName, mapping) {"", value, #hostName, zovmediatypes::kPixelFormat_##hostName},
+    VX_UNNAMED_PIXEL_FORMATS(LISTED)
+#undef LISTED
+};
+
+bool Has(const std::string& text, const char* part) { return text.find(part) != std::string::npos; }
+
+TEST(PixelFormats, ValuesAndNamesInOrder) {
+  ASSERT_EQ(std::size(kListed), std::size(kCatalogue));
+  for (size_t i = 0; i < std::size(kCatalogue); ++i) {
+    EXPECT_EQ(kListed[i].name, kCatalogue[i].name);
+    EXPECT_EQ(kListed[i].value, kCatalogue[i].value) << kCatalogue[i].name;
+    EXPECT_EQ(VX_PixelFormatName(FromBits(kCatalogue[i].value)), kCatalogue[i].name);
+    EXPECT_EQ(Bits(VX_PixelFormatFromName(kCatalogue[i].name.c_str())), kCatalogue[i].value);
+  }
+  for (const uint32_t value : {0x40u, 0x105u, 0x801u, 0x0D000031u, 0x7F000020u, 0xFFFFFFFFu})
+    EXPECT_STREQ(VX_PixelFormatName(FromBits(value)), "Unknown pixel format");
+  for (const char* name : {static_cast<const char*>(nullptr), "", "bgra_4444_8u", "BGRA_4444_8u ", "BGRA_4444_8"})
+    EXPECT_EQ(VX_PixelFormatFromName(name), VX_PixelFormat::Invalid);
+}
+
+// How a raster's row is stored: groups of so many pixels in so many bytes, the row padded to a multiple.
+struct RowRule {
+  int pixels, bytes, padding;
+};
+
+RowRule RuleOfName(const std::string& name) {
+  if (Has(name, "V210")) return {6, 16, 128};
+  if (Has(name, "_422_8u")) return {1, 2, 16};
+  if (Has(name, "_422_32f")) return {1, 8, 16};
+  if (Has(name, "_4444_8u")) return {1, 4, 64};
+  if (Has(name, "_4444_15u")) return {1, 8, 64};
+  if (Has(name, "_4444_32f")) return {1, 16, 64};
+  EXPECT_EQ(name, "Invalid");
+  return {1, 2, 64};
+}
+
+__int128 RoundUp(__int128 value, int multiple) {
+  const __int128 rest = (value % multiple + multiple) % multiple;
+  return rest == 0 ? value : value + multiple - rest;
+}
+
+const std::vector<int32_t> kExtents = [] {
+  std::vector<int32_t> extents = {INT32_MIN,  INT32_MIN + 1, -65536,     -721,     719,       1920,
+                                  4095,       4096,          8191,       65536,    0x7FFFFFF, 0x8000000,
+                                  0x1FFFFFFF, 0x20000000,    0x7FFFFFF0, INT32_MAX};
+  for (int32_t i = -140; i <= 140; ++i) extents.push_back(i);
+  return extents;
+}();
+
+TEST(PixelFormatSize, RastersFollowTheirRowRule) {
+  std::vector<std::pair<uint32_t, RowRule>> rules = {
+      // No names: 10-bit RGB, rows without alpha, 10-bit and 15-bit 4:2:2, depths that do not exist.
+      {0x40, {1, 4, 64}},  {0x41, {1, 0, 64}},  {0x801, {1, 2, 64}}, {0x105, {1, 16, 64}}, {0x100, {1, 8, 64}},
+      {0x901, {1, 8, 64}}, {0x10, {1, 2, 16}},  {0x50, {1, 4, 16}},  {0x90, {1, 8, 16}},   {0x91, {1, 8, 16}},
+      {0xC4, {1, 0, 64}},  {0x1D0, {1, 0, 16}}, {0x20, {1, 2, 64}},  {0x130, {1, 8, 64}},  {0xC51, {1, 0, 16}}};
+  for (const auto& format : kListed)
+    if (format.value < 0x1000000) rules.emplace_back(format.value, RuleOfName(format.name));
+  for (const auto& [value, rule] : rules)
+    for (const int32_t width : kExtents) {
+      const __int128 groups = rule.pixels == 1 ? width : (__int128{width} + rule.pixels - 1) / rule.pixels;
+      const __int128 rowBytes = RoundUp(groups * rule.bytes, rule.padding);
+      ASSERT_EQ(PaddedRowBytes(FromBits(value), width), static_cast<int64_t>(rowBytes)) << value << " " << width;
+      for (const int32_t height : kExtents)
+        ASSERT_EQ(VX_PixelFormatSize(FromBits(value), width, height), static_cast<int32_t>(rowBytes * height))
+            << std::hex << value << std::dec << " " << width << " x " << height;
+    }
+}
+
+TEST(PixelFormatSize, WholeFrames) {
+  const struct {
+    uint32_t kind;
+    int64_t bytes;
+  } frames[] = {{1, 120000}, {2, 144000}, {3, 240000}, {4, 288000}, {5, 480000}, {6, 576000},
+                {7, 240000}, {8, 288000}, {15, 0},     {0x20, 0},   {0x7F, 0},   {0xFF, 0}};
+  for (const auto& frame : frames)
+    for (const int32_t extent : {INT32_MIN, -1, 0, 1, 720, INT32_MAX})
+      EXPECT_EQ(VX_PixelFormatSize(FromBits(frame.kind << 24 | 0x821), extent, extent / 2), frame.bytes);
+  const __int128 most = INT64_MAX, least = INT64_MIN;
+  for (const int32_t w : kExtents)
+    for (const int32_t h : kExtents) {
+      const __int128 planar = (RoundUp(w, 128) + RoundUp(w / 2, 128)) * RoundUp(h, 32);
+      const __int128 biplanar = RoundUp(w, 128) * (h + (__int128{h} + 1) / 2);
+      for (uint32_t kind = 9; kind <= 12; ++kind)
+        ASSERT_EQ(VX_PixelFormatSize(FromBits(kind << 24 | 0x831), w, h), static_cast<int64_t>(planar));
+      for (uint32_t kind = 13; kind <= 14; ++kind) {
+        ASSERT_EQ(VX_PixelFormatSize(FromBits(kind << 24 | 0x1031), w, h), static_cast<int64_t>(biplanar));
+        ASSERT_EQ(VX_PixelFormatSize(FromBits(kind << 24 | 0xE71), w, h),
+                  static_cast<int64_t>(std::clamp(2 * biplanar, least, most)));
+      }
+    }
+  EXPECT_EQ(VX_PixelFormatSize(VX_PixelFormat::YUV_420_MPEG2_FRAME, 720, 480), 552960);
+}
+
+TEST(UnpaddedRowBytes, HoldsWholeGroups) {
+  const struct {
+    uint32_t value;
+    int64_t pixels, bytes;  // per group
+  } rules[] = {{0x811, 2, 4}, {0x1A11, 2, 4},  {0x911, 2, 16}, {0x851, 6, 16}, {0x91, 2, 16},
+               {0x4, 1, 4},   {0x1108, 1, 16}, {0x84, 1, 8},   {0x40, 1, 4},   {0, 1, 2},
+               {0x100, 1, 8}, {0x80, 1, 8},    {0xC4, 1, 0}};
+  for (const auto& rule : rules)
+    for (int64_t width = 0; width < 200; ++width) {
+      const int64_t groups = width / rule.pixels + (width % rule.pixels != 0);
+      EXPECT_EQ(UnpaddedRowBytes(FromBits(rule.value), width), groups * rule.bytes) << rule.value << " " << width;
+    }
+  EXPECT_EQ(UnpaddedRowBytes(VX_PixelFormat::BGRA_4444_32f, INT32_MAX), int64_t{INT32_MAX} * 16);
+}
+
+// The host spells 4:2:0 names out; everything else is called the same.
+std::string HostNameOf(const std::string& name) {
+  if (!Has(name, "YUV_420")) return name;
+  return name.substr(0, std::string("YUV_420_MPEG2_FIELD").size()) + "_PICTURE_PLANAR_8u_" +
+         (Has(name, "_709") ? "709" : "601") + (Has(name, "_FullRange") ? "_FullRange" : "");
+}
+
+uint32_t BiplanarValueOf(const std::string& hostName) {
+  return (Has(hostName, "_FIELD_") ? 0x0D000031 : 0x0E000031) | (Has(hostName, "YVU") ? 0x1000 : 0) |
+         (Has(hostName, "10u_as16u") ? 0x40 : 0) | (Has(hostName, "FullRange") ? 0 : 0x800) |
+         (Has(hostName, "_709") ? 0x200 : 0) | (Has(hostName, "_2020") ? 0x400 : 0) |
+         (Has(hostName, "HDR") ? 0x200 : 0);
+}
+
+TEST(HostFormats, RoundTripsWithTheirExceptions) {
+  const std::set<std::string> notIn = {"YUYV_422_32f", "YUYV_422_32f_709", "BGRX_4444_32f_Linear",
+                                       "XRGB_4444_32f_Linear"};
+  const std::set<std::string> notOut = {"YUYV_422_32f", "YUYV_422_32f_709"};
+  for (const auto& format : kListed) {
+    EXPECT_EQ(format.hostName, HostNameOf(format.name));
+    EXPECT_EQ(Bits(VX_ZOVPixelFormatToVXPixelFormat(format.host)), notIn.count(format.name) ? 0 : format.value);
+    EXPECT_EQ(VX_VXPixelFormatToZOVPixelFormat(FromBits(format.value)) == format.host, !notOut.count(format.name))
+        << format.name;
+  }
+  std::set<uint32_t> values;
+  for (const auto& format : kUnnamed) {
+    const bool isRgb10 = format.hostName == "RGB_444_10u";
+    const uint32_t value = isRgb10 ? 0x40 : BiplanarValueOf(format.hostName);
+    EXPECT_EQ(Bits(VX_ZOVPixelFormatToVXPixelFormat(format.host)), value) << format.hostName;
+    EXPECT_EQ(VX_VXPixelFormatToZOVPixelFormat(FromBits(value)) == format.host, isRgb10) << format.hostName;
+    values.insert(value);
+  }
+  EXPECT_EQ(values.size(), 23u);
+}
+
+TEST(HostFormats, UnknownOnes) {
+  for (uint32_t lowByte = 0; lowByte < 256; ++lowByte) {
+    const uint32_t expected = lowByte == 64 || lowByte == 95 ? 0x7F000020 : 0;
+    EXPECT_EQ(Bits(VX_ZOVPixelFormatToVXPixelFormat({0x12345600 | lowByte, 7})), expected);
+  }
+  // One equal word is not enough.
+  HostFormat other = zovmediatypes::kPixelFormat_BGRA_4444_8u;
+  ++other.mSecond;
+  EXPECT_EQ(VX_ZOVPixelFormatToVXPixelFormat(other), VX_PixelFormat::Invalid);
+  for (const uint32_t value : {0x105u, 0x801u, 0x7F000020u, 0x0D000A71u, 0x7F000000u, 0x2104u})
+    EXPECT_EQ(VX_VXPixelFormatToZOVPixelFormat(FromBits(value)), HostFormat{}) << value;
+}
+
+TEST(HostColorSpaces, ComeFromTheFormatsBits) {
+  const struct {
+    uint32_t value;
+    zovmediatypes::color::ColorSpace space;  // primaries, transfer, matrix, depth, full range, RGB
+  } cases[] = {{0x805, {1, 1, 1, 8, false, false}},
+               {0x106, {1, 8, 0, 32, true, true}},
+               {0x4, {1, 1, 0, 8, true, true}},
+               {0x84, {1, 1, 0, 16, true, true}},
+               {0x40, {1, 1, 0, 10, true, true}},
+               {0xA51, {1, 1, 1, 10, false, false}},
+               {0xB11, {1, 1, 1, 32, false, false}},
+               {0x09000031, {1, 1, 1, 8, true, false}},
+               {0x0E000E71, {1, 1, 1, 10, false, false}},
+               {0x0A000C31, {1, 1, 1, 8, false, false}},
+               {0, {1, 1, 0, 8, true, true}},
+               {0xC5, {1, 1, 1, 8, true, false}}};
+  for (const auto& c : cases) EXPECT_EQ(VX_PixelFormatToColorSpace(FromBits(c.value)), c.space) << std::hex << c.value;
+}
+
+}  // namespace
+}  // namespace vexel
