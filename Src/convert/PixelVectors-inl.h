@@ -1,0 +1,159 @@
+// Vector helpers shared by the four-channel row kernels: row maps, opaque alpha, packing in memory order.
+#if defined(VEXEL_CONVERT_PIXELVECTORS_INL_H_) == defined(HWY_TARGET_TOGGLE)
+#ifdef VEXEL_CONVERT_PIXELVECTORS_INL_H_
+#undef VEXEL_CONVERT_PIXELVECTORS_INL_H_
+#else
+#define VEXEL_CONVERT_PIXELVECTORS_INL_H_
+#endif
+
+#include <cstddef>
+#include <cstdint>
+
+#include <hwy/highway.h>
+
+#include "convert/PlainPixels.h"
+#include "frame/RowLoop-inl.h"
+
+// Highway's scalar fallback target is never chosen (the plain definitions serve there), so it gets no kernels.
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace hn = hwy::HWY_NAMESPACE;
+
+// Full vectors by lane type.
+template <class T>
+using Full = hn::Vec<hn::ScalableTag<T>>;
+using U8 = Full<uint8_t>;
+using U16 = Full<uint16_t>;
+using I16 = Full<int16_t>;
+using U32 = Full<uint32_t>;
+using I32 = Full<int32_t>;
+using F32 = Full<float>;
+
+template <class T>
+inline constexpr size_t kLanes = HWY_MAX_BYTES / sizeof(T);
+
+template <class T>
+HWY_INLINE Full<T> LoadVector(const uint8_t* p, size_t index = 0) {
+  return hn::BitCast(hn::ScalableTag<T>(), hn::LoadU(hn::ScalableTag<uint8_t>(), p + index * HWY_MAX_BYTES));
+}
+
+template <class V>
+HWY_INLINE void StoreVector(V v, uint8_t* p, size_t index = 0) {
+  const hn::ScalableTag<uint8_t> d8;
+  hn::StoreU(hn::BitCast(d8, v), d8, p + index * HWY_MAX_BYTES);
+}
+
+// Half and quarter vectors of bytes or words, widened to a full vector.
+template <class T, class From>
+HWY_INLINE Full<T> LoadPromoted(const uint8_t* p) {
+  const hn::ScalableTag<T> d;
+  const hn::Rebind<From, decltype(d)> dFrom;
+  const hn::Repartition<uint8_t, decltype(dFrom)> d8;
+  return hn::PromoteTo(d, hn::BitCast(dFrom, hn::LoadU(d8, p)));
+}
+
+// Runs op.Map over four vectors of lane type T at a time; the pixels have four channels of type T on both sides.
+template <class T, class Op>
+HWY_INLINE void MapRow(const uint8_t* src, uint8_t* dst, size_t count, const Op& op) {
+  constexpr size_t kPixel = 4 * sizeof(T);
+  RowLoop<4 * HWY_MAX_BYTES / kPixel, kPixel, kPixel>(src, dst, count, op);
+}
+
+// Body of MapRow for an op of one vector: every vector on its own.
+template <class T, class Op>
+struct EachVector {
+  Op op;
+  HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
+    const auto v0 = LoadVector<T>(in, 0), v1 = LoadVector<T>(in, 1);
+    const auto v2 = LoadVector<T>(in, 2), v3 = LoadVector<T>(in, 3);
+    StoreVector(op(v0), out, 0);
+    StoreVector(op(v1), out, 1);
+    StoreVector(op(v2), out, 2);
+    StoreVector(op(v3), out, 3);
+  }
+};
+
+// A vector with `value` in channel kIndex of each pixel and `other` in the rest.
+template <size_t kIndex, class T>
+HWY_INLINE Full<T> ChannelVector(T value, T other) {
+  constexpr size_t kIn128 = 16 / sizeof(T);
+  alignas(16) T lanes[kIn128];
+  for (size_t i = 0; i < kIn128; ++i) lanes[i] = i % 4 == kIndex ? value : other;
+  return hn::LoadDup128(hn::ScalableTag<T>(), lanes);
+}
+
+// All bits of channel kIndex.
+template <size_t kIndex, class T>
+HWY_INLINE Full<T> ChannelMask() {
+  const hn::ScalableTag<T> d;
+  using TU = hwy::MakeUnsigned<T>;
+  return hn::BitCast(d, ChannelVector<kIndex, TU>(static_cast<TU>(~TU{0}), TU{0}));
+}
+
+// The vector with its alpha channel opaque, if kAlpha says so.
+template <AlphaWrite kAlpha, class T>
+HWY_INLINE Full<T> WriteAlpha(Full<T> v) {
+  if constexpr (kAlpha == AlphaWrite::Keep) {
+    return v;
+  } else {
+    constexpr size_t kIndex = AlphaIndex(kAlpha);
+    const auto opaque = ChannelVector<kIndex, T>(kFullScale<T>, T{0});
+    if constexpr (sizeof(T) == 1) return hn::Or(v, opaque);
+    return hn::Or(hn::AndNot(ChannelMask<kIndex, T>(), v), opaque);
+  }
+}
+
+// int16 -> uint8, saturating, within each 128-bit block: its 8 lanes of `a`, then its 8 of `b`.
+HWY_INLINE U8 PackBlocks(I16 a, I16 b) {
+#if HWY_TARGET == HWY_AVX3
+  return U8{_mm512_packus_epi16(a.raw, b.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return U8{_mm256_packus_epi16(a.raw, b.raw)};
+#else
+  return U8{_mm_packus_epi16(a.raw, b.raw)};
+#endif
+}
+
+// Undoes the block order of packing two vectors: 64-bit groups a0 b0 a1 b1 ... become a0 a1 ... b0 b1 ...
+template <class V>
+HWY_INLINE V OrderPacked2(V v) {
+#if HWY_TARGET == HWY_AVX3
+  return V{_mm512_permutexvar_epi64(_mm512_setr_epi64(0, 2, 4, 6, 1, 3, 5, 7), v.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return V{_mm256_permute4x64_epi64(v.raw, 0xD8)};
+#else
+  return v;
+#endif
+}
+
+// The same for four vectors and 32-bit groups.
+HWY_INLINE U8 OrderPacked4(U8 v) {
+#if HWY_TARGET == HWY_AVX3
+  return U8{_mm512_permutexvar_epi32(_mm512_setr_epi32(0, 4, 8, 12, 1, 5, 9, 13, 2, 6, 10, 14, 3, 7, 11, 15), v.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return U8{_mm256_permutevar8x32_epi32(v.raw, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))};
+#else
+  return v;
+#endif
+}
+
+// int32 -> int16, saturating, in memory order.
+HWY_INLINE I16 PackTo16(I32 a, I32 b) { return OrderPacked2(hn::ReorderDemote2To(hn::ScalableTag<int16_t>(), a, b)); }
+
+// int32 -> uint8, saturating, in memory order.
+HWY_INLINE U8 PackTo8(I32 a, I32 b, I32 c, I32 d) {
+  const hn::ScalableTag<int16_t> d16;
+  return OrderPacked4(PackBlocks(hn::ReorderDemote2To(d16, a, b), hn::ReorderDemote2To(d16, c, d)));
+}
+
+// int16 -> uint8, saturating, in memory order.
+HWY_INLINE U8 PackTo8(I16 a, I16 b) { return OrderPacked2(PackBlocks(a, b)); }
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#endif

@@ -1,0 +1,58 @@
+// What the plain definitions of the four-channel kernels share: the walk over a row, opaque alpha per depth, and the
+// processor's float conversion.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <xmmintrin.h>
+
+namespace vexel {
+
+// What a kernel does with the alpha channel besides its work on the pixel.
+enum class AlphaWrite : uint8_t { Keep, OpaqueLast, OpaqueFirst };
+
+// Full scale of a channel of type T, which is also opaque alpha. 15u reaches 32768 in 16-bit words.
+template <class T>
+inline constexpr T kFullScale = T{1};
+template <>
+inline constexpr uint8_t kFullScale<uint8_t> = 255;
+template <>
+inline constexpr uint16_t kFullScale<uint16_t> = 32768;
+
+// Index of the channel that holds alpha.
+inline constexpr size_t AlphaIndex(AlphaWrite alpha) { return alpha == AlphaWrite::OpaqueFirst ? 0 : 3; }
+
+namespace plain {
+
+// Calls pixel(in, out) with four channels of type From and To for each pixel of a row. Rows need no alignment.
+template <class From, class To, class Pixel>
+inline void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Pixel& pixel) {
+  for (size_t i = 0; i < count; ++i) {
+    From in[4];
+    To out[4];
+    std::memcpy(in, src + i * sizeof in, sizeof in);
+    pixel(in, out);
+    std::memcpy(dst + i * sizeof out, out, sizeof out);
+  }
+}
+
+// The same, channel by channel, then with the alpha channel written opaque if asked for.
+template <class From, class To, AlphaWrite kAlpha, class Channel>
+inline void MapChannels(const uint8_t* src, uint8_t* dst, size_t count, const Channel& channel) {
+  MapPixels<From, To>(src, dst, count, [&](const From* in, To* out) {
+    for (int k = 0; k < 4; ++k) out[k] = channel(in[k]);
+    if constexpr (kAlpha != AlphaWrite::Keep) out[AlphaIndex(kAlpha)] = kFullScale<To>;
+  });
+}
+
+// Round as the processor is set to (to nearest even unless the host changed it); NaN and what int32 cannot hold give
+// INT32_MIN, so narrowing saturates them to 0.
+inline int32_t ConvertNearest(float value) { return _mm_cvtss_si32(_mm_set_ss(value)); }
+
+inline int32_t Clamp(int32_t value, int32_t least, int32_t most) {
+  return value < least ? least : value > most ? most : value;
+}
+
+}  // namespace plain
+}  // namespace vexel
