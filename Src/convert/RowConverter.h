@@ -1,0 +1,55 @@
+// Converts rows from one raster format to another: a plan and the scratch rows between its steps. The one way in which
+// every operation converts rows.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "convert/Planner.h"
+#include "frame/KernelVariant.h"
+
+namespace vexel {
+
+// Pixels per block of a chain whose steps are all point-wise: two blocks of 16-byte pixels stay in the first-level
+// cache.
+inline constexpr size_t kChainBlock = 384;
+static_assert(kChainBlock % kBlockMultiple == 0);
+
+// Use: Prepare, then give it ScratchBytes() bytes with UseScratch (none needed when 0), then Convert any number of
+// rows. A prepared converter is read-only but for its scratch memory: copies with scratch of their own may run in
+// parallel.
+class RowConverter {
+ public:
+  // Plans for rows of `width` pixels. Codes as MakePlan.
+  VX_Result Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, int32_t width,
+                    KernelVariant variant = ActiveKernelVariant()) noexcept;
+
+  // For destinations too large for the cache: the last step's output goes past the cache. Before ScratchBytes. Call
+  // StreamFence (frame/StreamCopy.h) after the last row.
+  void StreamOutput() noexcept { mStream = true; }
+
+  size_t ScratchBytes() const noexcept;
+  void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }
+
+  bool IsCopy() const noexcept { return mIsCopy; }
+
+  // Converts one row. Source and destination must not overlap.
+  void Convert(const void* srcRow, void* dstRow) const noexcept;
+
+ private:
+  // Runs the chain on `count` pixels; the last step writes to dst.
+  void RunSteps(const uint8_t* src, uint8_t* dst, size_t count) const noexcept;
+  size_t UnitPixels() const noexcept { return mWholeRow ? mWidth : kChainBlock; }
+  size_t ScratchRowBytes() const noexcept;
+
+  RowKernel mSteps[kMaxSteps] = {};
+  int mStepCount = 0;
+  size_t mWidth = 0;
+  VX_PixelFormat mDstFormat{};
+  uint32_t mSrcBytesPerSixPixels = 0, mDstBytesPerSixPixels = 0;
+  bool mWholeRow = false, mStream = false, mIsCopy = false;
+  KernelVariant mVariant = KernelVariant::Plain;
+  uint8_t* mScratch = nullptr;
+};
+
+}  // namespace vexel

@@ -1,0 +1,185 @@
+#include "support/Bench.h"
+
+#include <benchmark/benchmark.h>
+#include <immintrin.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <limits>
+#include <map>
+#include <vector>
+
+#include "frame/KernelVariant.h"
+#include "vexel/vexel.h"
+
+namespace vexel::bench {
+namespace {
+
+constexpr size_t kFloorStep = 4096;  // bytes of the larger side per step
+
+__attribute__((target("avx2"))) void ReadBytes(const uint8_t* src, size_t bytes) {
+  __m256i a = _mm256_setzero_si256(), b = a;
+  size_t i = 0;
+  for (; i + 64 <= bytes; i += 64) {
+    a = _mm256_or_si256(a, _mm256_load_si256(reinterpret_cast<const __m256i*>(src + i)));
+    b = _mm256_or_si256(b, _mm256_load_si256(reinterpret_cast<const __m256i*>(src + i + 32)));
+  }
+  benchmark::DoNotOptimize(_mm256_or_si256(a, b));
+}
+
+template <bool kStream>
+__attribute__((target("avx2"))) void WriteBytes(uint8_t* dst, size_t bytes) {
+  const __m256i value = _mm256_set1_epi8(0x5A);
+  for (size_t i = 0; i + 32 <= bytes; i += 32) {
+    if (kStream)
+      _mm256_stream_si256(reinterpret_cast<__m256i*>(dst + i), value);
+    else
+      _mm256_store_si256(reinterpret_cast<__m256i*>(dst + i), value);
+  }
+}
+
+template <bool kStream>
+void Floor(const uint8_t* src, size_t srcBytes, uint8_t* dst, size_t dstBytes) {
+  const size_t steps = std::max<size_t>(1, std::max(srcBytes, dstBytes) / kFloorStep);
+  const size_t srcStep = srcBytes / steps / 64 * 64, dstStep = dstBytes / steps / 64 * 64;
+  for (size_t i = 0; i < steps; ++i) {
+    ReadBytes(src + i * srcStep, srcStep);
+    WriteBytes<kStream>(dst + i * dstStep, dstStep);
+  }
+  if (srcStep * steps < srcBytes) ReadBytes(src + srcStep * steps, srcBytes - srcStep * steps);
+  if (dstStep * steps < dstBytes) WriteBytes<kStream>(dst + dstStep * steps, dstBytes - dstStep * steps);
+  if (kStream) _mm_sfence();
+  benchmark::ClobberMemory();
+}
+
+// Collects the least time of each contender and prints one line per case.
+class RatioReporter final : public benchmark::BenchmarkReporter {
+ public:
+  bool ReportContext(const Context&) override { return true; }
+  void ReportRuns(const std::vector<Run>& runs) override {
+    for (const Run& run : runs) {
+      if (run.run_type != Run::RT_Iteration || run.error_occurred) continue;
+      const std::string name = run.run_name.function_name;
+      const size_t bar = name.rfind('|');
+      const std::string key = name.substr(0, bar), contender = name.substr(bar + 1);
+      if (mTimes.find(key) == mTimes.end()) mOrder.push_back(key);
+      auto& times = mTimes[key];
+      auto it = std::find_if(times.begin(), times.end(), [&](const auto& t) { return t.first == contender; });
+      if (it == times.end()) it = times.insert(times.end(), {contender, std::numeric_limits<double>::max()});
+      const double perPixel =
+          1e9 * run.cpu_accumulated_time / static_cast<double>(run.iterations) / run.counters.at("px").value;
+      it->second = std::min(it->second, perPixel);
+    }
+  }
+  void Finalize() override {
+    std::printf("| case | contender | ns/px | x floor | Vexel is |\n|---|---|---:|---:|---:|\n");
+    for (const std::string& key : mOrder) Print(key, mTimes[key]);
+  }
+
+ private:
+  using Times = std::vector<std::pair<std::string, double>>;
+  static void Print(const std::string& key, const Times& times) {
+    double floor = 0, ours = 0;
+    for (const auto& [contender, time] : times) {
+      if (contender.rfind("floor", 0) == 0) floor = floor == 0 ? time : std::min(floor, time);
+      if (contender == "vexel") ours = time;
+    }
+    for (const auto& [contender, time] : times) {
+      if (contender == "floor streamed") continue;
+      const bool isFloor = contender == "floor cached";
+      std::printf("| %s | %s | %.4f |", key.c_str(), isFloor ? "floor" : contender.c_str(), isFloor ? floor : time);
+      if (floor > 0)
+        std::printf(" %.2f |", (isFloor ? floor : time) / floor);
+      else
+        std::printf(" |");
+      if (ours > 0 && contender != "vexel" && !isFloor)
+        std::printf(" %.2fx as fast |\n", time / ours);
+      else
+        std::printf(" |\n");
+    }
+  }
+
+  std::vector<std::string> mOrder;
+  std::map<std::string, Times> mTimes;
+};
+
+}  // namespace
+
+void Memory::Free::operator()(uint8_t* p) const { std::free(p); }
+
+Memory::Memory(size_t bytes) : mBytes(bytes) {
+  const size_t rounded = (bytes + 4095) & ~size_t{4095};
+  mData.reset(static_cast<uint8_t*>(std::aligned_alloc(4096, std::max<size_t>(rounded, 4096))));
+  std::memset(mData.get(), 0, std::max<size_t>(rounded, 4096));
+}
+
+void Memory::FillBytes(uint64_t seed) {
+  uint64_t state = seed * 0x9E3779B97F4A7C15u + 1;
+  for (size_t i = 0; i + 8 <= mBytes; i += 8) {
+    state ^= state << 13, state ^= state >> 7, state ^= state << 17;
+    std::memcpy(mData.get() + i, &state, 8);
+  }
+}
+
+void Memory::FillFloats(uint64_t seed) {
+  FillBytes(seed);
+  for (size_t i = 0; i + 4 <= mBytes; i += 4) {
+    uint32_t bits;
+    std::memcpy(&bits, mData.get() + i, 4);
+    const float value = static_cast<float>(bits >> 8) * 0x1p-24f;
+    std::memcpy(mData.get() + i, &value, 4);
+  }
+}
+
+void FloorCached(const uint8_t* src, size_t srcBytes, uint8_t* dst, size_t dstBytes) {
+  Floor<false>(src, srcBytes, dst, dstBytes);
+}
+void FloorStreamed(const uint8_t* src, size_t srcBytes, uint8_t* dst, size_t dstBytes) {
+  Floor<true>(src, srcBytes, dst, dstBytes);
+}
+
+BenchCase& BenchCase::Add(const std::string& contender, std::function<void()> work) {
+  const std::string name = mName + "|" + contender;
+  benchmark::RegisterBenchmark(name.c_str(), [work = std::move(work), pixels = mPixels](benchmark::State& state) {
+    work();
+    for (auto _ : state) work();
+    state.counters["px"] = static_cast<double>(pixels);
+  });
+  return *this;
+}
+
+BenchCase& BenchCase::AddFloor(size_t srcBytes, size_t dstBytes) {
+  auto src = std::make_shared<Memory>(srcBytes), dst = std::make_shared<Memory>(dstBytes);
+  Add("floor cached", [=] { FloorCached(src->data(), srcBytes, dst->data(), dstBytes); });
+  return Add("floor streamed", [=] { FloorStreamed(src->data(), srcBytes, dst->data(), dstBytes); });
+}
+
+}  // namespace vexel::bench
+
+// --variant=NAME limits the kernels; the rest goes to Google Benchmark, with short interleaved repetitions by default.
+int main(int argc, char** argv) {
+  VX_Initialize();
+  static char minTime[] = "--benchmark_min_time=0.05", repetitions[] = "--benchmark_repetitions=7",
+              interleave[] = "--benchmark_enable_random_interleaving=true";
+  std::vector<char*> arguments = {argv[0], minTime, repetitions, interleave};
+  for (int i = 1; i < argc; ++i) {
+    bool isVariant = false;
+    for (int v = 0; v < vexel::kKernelVariantCount; ++v) {
+      const auto variant = static_cast<vexel::KernelVariant>(v);
+      if (std::string("--variant=") + vexel::KernelVariantName(variant) != argv[i]) continue;
+      vexel::LimitKernelVariant(variant);
+      isVariant = true;
+    }
+    if (!isVariant) arguments.push_back(argv[i]);
+  }
+  int count = static_cast<int>(arguments.size());
+  benchmark::Initialize(&count, arguments.data());
+  if (benchmark::ReportUnrecognizedArguments(count, arguments.data())) return 1;
+  RegisterBenchmarks();
+  vexel::bench::RatioReporter reporter;
+  benchmark::RunSpecifiedBenchmarks(&reporter);
+  VX_Terminate();
+  return 0;
+}
