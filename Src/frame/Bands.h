@@ -18,15 +18,17 @@ class Task {
 };
 
 // Runs all pieces and returns when they are done. Without an executor (before VX_Initialize) they run on the calling
-// thread in order. Pieces run under the entry points' floating-point mode on every worker.
-void RunTask(Task& task) noexcept;
+// thread in order. Pieces run under the entry points' floating-point mode on every worker. Nothing that a piece throws
+// comes out: the other pieces still run, and the result is false.
+bool RunTask(Task& task) noexcept;
 
-// Calls rows(first, end) for bands of 32 rows, in parallel; 32 rows or fewer run inline without a task.
+// Calls rows(first, end) for bands of 32 rows, in parallel; 32 rows or fewer run inline without a task. False if a band
+// on another thread threw; what an inline call throws comes out.
 template <class Rows>
-void ForEachBand(int rowCount, Rows&& rows) {
+bool ForEachBand(int rowCount, Rows&& rows) {
   if (rowCount <= kBandRows) {
     if (rowCount > 0) rows(0, rowCount);
-    return;
+    return true;
   }
   struct BandTask final : Task {
     BandTask(int count, Rows& f) : rowCount(count), rows(f) {}
@@ -38,7 +40,7 @@ void ForEachBand(int rowCount, Rows&& rows) {
     int rowCount;
     Rows& rows;
   } task(rowCount, rows);
-  RunTask(task);
+  return RunTask(task);
 }
 
 }  // namespace vexel

@@ -5,13 +5,17 @@
 
 namespace vexel {
 
-// Least capable first. Highway has no SSE2 or AVX target: the has-SSE2 switch is served by the SSSE3 kernels (plain code
-// on a processor without SSSE3) and the has-AVX switch by the SSE4.1 ones. AVX-512 counts as part of the AVX2 switch.
+// Least capable first. Highway has no SSE2 or AVX target: the has-SSE2 switch is served by the SSSE3 kernels (plain
+// code on a processor without SSSE3) and the has-AVX switch by the SSE4.1 ones. AVX-512 counts as part of the AVX2
+// switch.
 enum class KernelVariant : uint8_t { Plain, Ssse3, Sse41, Avx2, Avx512 };
 inline constexpr int kKernelVariantCount = 5;
 
 // The best variant that the processor has and the feature switches allow. Read once per API call, then passed down.
 KernelVariant ActiveKernelVariant() noexcept;
+
+// The best variant that the processor can run, whatever the switches say.
+KernelVariant ProcessorVariant() noexcept;
 
 // "plain", "ssse3", "sse4.1", "avx2", "avx512".
 const char* KernelVariantName(KernelVariant variant) noexcept;

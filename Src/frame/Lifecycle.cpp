@@ -1,0 +1,73 @@
+#include "frame/Lifecycle.h"
+
+#include "frame/DvModule.h"
+#include "frame/Features.h"
+#include "frame/Platform.h"
+#include "vexel/vexel.h"
+#include "zovcore/Debug.h"
+#include "zovcore/Threads.h"
+
+namespace vexel {
+namespace {
+
+// Written by VX_Initialize and VX_Terminate only, which one thread calls.
+uint32_t gInitCount = 0;
+constinit CacheInfo gCache;
+
+// Never destroyed: host threads may still be busy while the process ends.
+boost::shared_ptr<zovcore::threads::AsyncExecutor>& Executor() noexcept {
+  static auto& executor = *new boost::shared_ptr<zovcore::threads::AsyncExecutor>;
+  return executor;
+}
+
+bool IsKeyTrue(const char* key) noexcept try {
+  return zovcore::debug::DebugDatabase::Instance().GetEntry(key, "false") == "true";
+} catch (...) {
+  return false;
+}
+
+void ApplyKeys() noexcept {
+  if (IsKeyTrue("VX.disableAVX")) gSwitches.avx.Set(false);
+  if (IsKeyTrue("VX.disableAVX2")) gSwitches.avx2.Set(false);
+  gSwitches.noAvx512.Set(IsKeyTrue("VX.disableAVX512"));
+}
+
+void CreateExecutor() noexcept try { Executor() = zovcore::threads::CreateCPUBoundExecutor(); } catch (...) {
+  Executor().reset();  // bands then run on the calling thread
+}
+
+}  // namespace
+
+CacheInfo FallbackCache(const Features& features) noexcept {
+  if (features.avx || features.avx2) return {3u << 20, 3};
+  if (features.sse2) return {1u << 20, 2};
+  return {};
+}
+
+bool HasExecutor() noexcept { return Executor() != nullptr; }
+
+CacheInfo UnifiedCache() noexcept { return gCache; }
+
+}  // namespace vexel
+
+VX_Result VX_Initialize() noexcept {
+  using namespace vexel;
+  if (++gInitCount != 1) return VX_Success;
+  const Features features = DetectFeatures(platform::kProcessor);
+  SetFeatureSwitches(features);
+  if (!platform::FindUnifiedCache(gCache)) gCache = FallbackCache(features);
+  ApplyKeys();
+  LoadDvModule();
+  CreateExecutor();
+  return VX_Success;
+}
+
+VX_Result VX_Terminate() noexcept {
+  using namespace vexel;
+  if (gInitCount == 0 || --gInitCount != 0) return VX_Success;
+  ReleaseDvModule();
+  Executor().reset();
+  return VX_Success;
+}
+
+uint32_t VX_GetCacheSize() noexcept { return vexel::UnifiedCache().bytes; }

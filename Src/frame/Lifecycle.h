@@ -1,0 +1,18 @@
+// The state that lives from VX_Initialize to VX_Terminate.
+#pragma once
+
+#include "frame/CacheInfo.h"
+#include "frame/Features.h"
+
+namespace vexel {
+
+// Whether the host's fan-out may be used.
+bool HasExecutor() noexcept;
+
+// The cache found at start-up; zero before.
+CacheInfo UnifiedCache() noexcept;
+
+// What is assumed where the cache cannot be found out.
+CacheInfo FallbackCache(const Features& features) noexcept;
+
+}  // namespace vexel

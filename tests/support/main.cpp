@@ -1,0 +1,53 @@
+// Runs all tests with the kernels limited to one variant: --variant=plain, ssse3, sse4.1, avx2 or avx512.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <optional>
+#include <string_view>
+
+#include "frame/KernelVariant.h"
+#include "vexel/vexel.h"
+
+namespace {
+
+std::optional<vexel::KernelVariant> VariantFromName(std::string_view name) {
+  for (int i = 0; i < vexel::kKernelVariantCount; ++i)
+    if (const auto variant = static_cast<vexel::KernelVariant>(i); name == vexel::KernelVariantName(variant))
+      return variant;
+  return std::nullopt;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  testing::InitGoogleMock(&argc, argv);
+  std::string_view name;
+  for (int i = 1; i < argc; ++i) {
+    const std::string_view argument = argv[i];
+    constexpr std::string_view kVariant = "--variant=";
+    if (argument.substr(0, kVariant.size()) != kVariant) {
+      std::fprintf(stderr, "vexel_tests: unknown argument %s\n", argv[i]);
+      return 2;
+    }
+    name = argument.substr(kVariant.size());
+  }
+  VX_Initialize();
+  if (!name.empty()) {
+    const auto variant = VariantFromName(name);
+    if (!variant) {
+      std::fprintf(stderr, "vexel_tests: unknown variant %s\n", name.data());
+      return 2;
+    }
+    if (*variant > vexel::ProcessorVariant()) {
+      std::printf("SKIPPED: this processor has no %s; its best is %s\n", name.data(),
+                  vexel::KernelVariantName(vexel::ProcessorVariant()));
+      VX_Terminate();
+      return 0;
+    }
+    vexel::LimitKernelVariant(*variant);
+  }
+  const int failed = RUN_ALL_TESTS();
+  VX_Terminate();
+  return failed;
+}
