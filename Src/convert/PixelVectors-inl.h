@@ -139,6 +139,17 @@ HWY_INLINE U8 OrderPacked4(U8 v) {
 #endif
 }
 
+// Float to int32 toward zero, whatever the rounding mode, for values known to fit.
+HWY_INLINE I32 Truncate(F32 v) {
+#if HWY_TARGET == HWY_AVX3
+  return I32{_mm512_cvttps_epi32(v.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return I32{_mm256_cvttps_epi32(v.raw)};
+#else
+  return I32{_mm_cvttps_epi32(v.raw)};
+#endif
+}
+
 // int32 -> int16, saturating, in memory order.
 HWY_INLINE I16 PackTo16(I32 a, I32 b) { return OrderPacked2(hn::ReorderDemote2To(hn::ScalableTag<int16_t>(), a, b)); }
 
