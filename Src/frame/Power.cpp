@@ -1,0 +1,141 @@
+#include "frame/Power.h"
+
+#include <cmath>
+#include <limits>
+
+#include <emmintrin.h>
+
+namespace vexel {
+namespace {
+
+using power::kEighthsMagic;
+using power::kEighthsMagicDouble;
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+constexpr uint32_t kInfinityBits = 0x7f800000;
+constexpr float kQuietNaN = std::numeric_limits<float>::quiet_NaN();
+
+struct SplitArgument {
+  int32_t eighths;  // Of an octave; the low three bits number the segment.
+  float mantissa;
+};
+
+// For finite x > 0. The integer conversion renormalises a denormal whatever the floating-point mode.
+SplitArgument Split(float x) {
+  int32_t i = std::bit_cast<int32_t>(x);
+  if (i < 0x00800000) i = std::bit_cast<int32_t>(static_cast<float>(i)) - (149 << 23);
+  i -= static_cast<int32_t>(power::kFirstBits);
+  return {i >> 20, std::bit_cast<float>((static_cast<uint32_t>(i) & power::kMantissaMask) + power::kFirstBits)};
+}
+
+// 2^(eighths + f), where eighths is a whole number of eighths below 2^18 in magnitude.
+float Exp2Tail(float eighths, float f) {
+  const uint32_t count = std::bit_cast<uint32_t>(eighths + kEighthsMagic);
+  const uint32_t j = count & 7;
+  const float f2 = f * f;
+  const float series = (power::kExp2[0] + f * power::kExp2[1]) + f2 * (power::kExp2[2] + f * power::kExp2[3]);
+  const float g = f * series;
+  const float root = power::kRoot[j];
+  const float mantissa = root + (power::kRootRest[j] + root * g);
+  const int32_t n = static_cast<int32_t>(count - power::kEighthsMagicBits) >> 3;
+  if (n > 128) return kInfinity;
+  if (n < -125) {
+    // The integer part of the result in units of the smallest denormal is its bit pattern.
+    const float unit = std::bit_cast<float>((n < -151 ? -2 + 127 : n + 149 + 127) << 23);
+    return std::bit_cast<float>(_mm_cvtss_si32(_mm_set_ss(mantissa * unit)));
+  }
+  const uint32_t bits = std::bit_cast<uint32_t>(mantissa) + (static_cast<uint32_t>(n) << 23);
+  return std::bit_cast<float>(bits < kInfinityBits ? bits : kInfinityBits);
+}
+
+// 2^(high + low); high has enough trailing zeros that taking eighths off it is exact.
+float Exp2Pair(float high, float low) {
+  const float eighths = ((high + low) + kEighthsMagic) - kEighthsMagic;
+  return Exp2Tail(eighths, (high - eighths) + low);
+}
+
+double Log2Double(float x) {
+  const SplitArgument s = Split(x);
+  const int j = s.eighths & 7;
+  const double r = static_cast<double>(s.mantissa) * power::kReciprocal[j] - 1.0;
+  const double* c = power::kLog2;
+  const double r2 = r * r;
+  const double series = ((c[0] + r * c[1]) + r2 * (c[2] + r * c[3])) + (r2 * r2) * (c[4] + r * c[5]);
+  return static_cast<double>(s.eighths) * 0.125 + (power::kReciprocalOffset[j] + r * series);
+}
+
+float PowerFloat(float x, const PowerExponent& y) {
+  const SplitArgument s = Split(x);
+  const int j = s.eighths & 7;
+  const float k = static_cast<float>(s.eighths);
+  const float w = (s.mantissa - power::kCentre[j]) * y.slope[j];
+  const float w2 = w * w;
+  const float series = (y.series[0] + w * y.series[1]) + w2 * (y.series[2] + w * y.series[3]);
+  const float rest = w + w2 * series;
+  return Exp2Pair(y.eighthHigh * k, y.eighthLow * k + (y.offset[j] + rest));
+}
+
+float PowerDouble(float x, float y) {
+  double t = static_cast<double>(y) * Log2Double(x);
+  t = t < 1024.0 ? t : 1024.0;
+  t = t > -1024.0 ? t : -1024.0;
+  const double eighths = (t + kEighthsMagicDouble) - kEighthsMagicDouble;
+  return Exp2Tail(static_cast<float>(eighths), static_cast<float>(t - eighths));
+}
+
+// What the exponents give that have no core of their own.
+float PowerScalar(float x, float y) {
+  if (y == 0.0f || x == 1.0f) return 1.0f;
+  if (x != x || y != y || x < 0.0f) return kQuietNaN;
+  if (y == kInfinity) return x > 1.0f ? kInfinity : 0.0f;
+  if (y == -kInfinity) return x > 1.0f ? 0.0f : kInfinity;
+  if (x == 0.0f) return kInfinity;
+  if (x == kInfinity) return 0.0f;
+  return PowerDouble(x, y);
+}
+
+bool IsNaN(float x) { return (std::bit_cast<uint32_t>(x) & 0x7fffffff) > kInfinityBits; }
+
+// e^x or 10^x: x is cut into two short halves so that the large product with log2(base) is exact.
+float ExpOfBase(float x, const power::SplitFloat& log2Base) {
+  if (IsNaN(x)) return kQuietNaN;
+  x = x < 256.0f ? x : 256.0f;
+  x = x > -256.0f ? x : -256.0f;
+  const float top = std::bit_cast<float>(std::bit_cast<uint32_t>(x) & 0xfffff000);
+  const float bottom = x - top;
+  return Exp2Pair(top * log2Base.high, top * log2Base.low + bottom * (log2Base.high + log2Base.low));
+}
+
+float LogOfBase(float x, double scale) {
+  if (IsNaN(x)) return kQuietNaN;
+  if (x == 0.0f) return -kInfinity;
+  if (x < 0.0f) return kQuietNaN;
+  if (x == kInfinity) return kInfinity;
+  return static_cast<float>(Log2Double(x) * scale);
+}
+
+}  // namespace
+
+float Power(float x, const PowerExponent& y) noexcept {
+  if (y.core == PowerCore::Scalar) return PowerScalar(x, y.exponent);
+  const uint32_t bits = std::bit_cast<uint32_t>(x);
+  if ((bits & 0x7fffffff) == 0) return 0.0f;
+  if (bits == kInfinityBits) return kInfinity;
+  if (bits > kInfinityBits) return kQuietNaN;
+  return y.core == PowerCore::Float ? PowerFloat(x, y) : PowerDouble(x, y.exponent);
+}
+
+float Power(float x, float y) noexcept { return Power(x, PowerExponent(y)); }
+
+float SignedPower(float x, const PowerExponent& y) noexcept {
+  const uint32_t sign = std::bit_cast<uint32_t>(x) & 0x80000000;
+  const float magnitude = Power(std::bit_cast<float>(std::bit_cast<uint32_t>(x) ^ sign), y);
+  return std::bit_cast<float>(std::bit_cast<uint32_t>(magnitude) | sign);
+}
+
+float Log(float x) noexcept { return LogOfBase(x, power::kLn2); }
+float Log10(float x) noexcept { return LogOfBase(x, power::kLog10Of2); }
+float Exp(float x) noexcept { return ExpOfBase(x, power::kLog2EShort); }
+float Exp10(float x) noexcept { return ExpOfBase(x, power::kLog2Of10Short); }
+
+}  // namespace vexel

@@ -1,0 +1,135 @@
+// The library's one implementation of powers, logarithms and exponentials of floats. Scalar code uses the functions
+// here, row kernels the vector forms of Power-inl.h; both perform the same operations in the same order, so that every
+// kernel variant gives the same bits on every processor (the C library's powf does not promise that).
+//
+// Results are within 1 ulp of the correctly rounded float, denormal arguments and results included, whatever
+// flush-to-zero says; denormals-are-zero is not supported. Rounding must be to nearest.
+//
+// How: the bits of x split into k, the number of eighths of an octave, and a mantissa in one of eight segments;
+// log2(x) = k / 8 + (what is left, below 1/12), 2^t = 2^(n / 8) * (1 + f * polynomial), |f| <= 1/16. Small exponents
+// work in float with the large term y / 8 * k held exactly; large ones need more digits of the logarithm and work in
+// double.
+#pragma once
+
+#include <bit>
+#include <cstdint>
+
+namespace vexel {
+
+namespace power {
+
+// Segment j holds mantissas from kFirstBits + (j << 20); segment 0 is centred on 1, where logarithms vanish.
+inline constexpr uint32_t kFirstBits = 0x3f755555;
+inline constexpr uint32_t kMantissaMask = 0x007fffff;
+
+// Short centres of the segments, and log2(centre) - j / 8.
+alignas(32) inline constexpr float kCentre[8] = {1.0f,        1.10424805f, 1.22924805f, 1.35424805f,
+                                                 1.47924805f, 1.60424805f, 1.72924805f, 1.85424805f};
+inline constexpr double kCentreOffset[8] = {0.0,
+                                            0.018064280631411165,
+                                            0.047776062894147021,
+                                            0.062492010125352063,
+                                            0.064863990226941989,
+                                            0.056897226786234635,
+                                            0.040144826949798755,
+                                            0.015834249389445772};
+// ln(1 + r) = r + r^2 * (...), |r| < 0.0569, to 2^-32.
+inline constexpr double kLn[4] = {-0.49999925580796534, 0.33333223612080437, -0.25074945919769887, 0.20080257931802578};
+
+// The same split for the double form: reciprocals whose logarithm is a float to 2^-41.
+alignas(32) inline constexpr float kReciprocal[8] = {1.0f,         0.905404091f, 0.813294947f, 0.738525391f,
+                                                     0.675993145f, 0.623168707f, 0.578119814f, 0.539312065f};
+alignas(32) inline constexpr float kReciprocalOffset[8] = {0.0f,          0.0183662698f, 0.0481494442f, 0.062280573f,
+                                                           0.0649194792f, 0.0573053062f, 0.040559575f,  0.015807787f};
+// log2(1 + r) = r * (...), to 2^-36 and to 2^-32 of the result.
+inline constexpr double kLog2[6] = {1.4426950411084996,   -0.72134752104861699, 0.48089712699959069,
+                                    -0.36067218359279224, 0.28954285675094638,  -0.24145339859794785};
+
+// 2^f - 1 = f * (...), |f| <= 1/16, to 2^-32, and 2^(j / 8) as a float and what it lacks.
+inline constexpr float kExp2[4] = {0.693147182464599609375f, 0.2402265071868896484375f, 5.5508099496364593505859375e-2f,
+                                   9.6186101436614990234375e-3f};
+alignas(32) inline constexpr float kRoot[8] = {1.0f,        1.09050775f, 1.18920708f, 1.29683959f,
+                                               1.41421354f, 1.54221082f, 1.68179286f, 1.8340081f};
+alignas(32) inline constexpr float kRootRest[8] = {0.0f,           -1.30775399e-08f, 3.79763527e-08f,  -4.01899953e-08f,
+                                                   2.4203235e-08f, 8.07090483e-09f,  -2.47553267e-08f, -1.1239278e-08f};
+
+// Adding these rounds a float or double to eighths, which then stand in the low bits.
+inline constexpr float kEighthsMagic = 1572864.0f;                // 1.5 * 2^20
+inline constexpr double kEighthsMagicDouble = 844424930131968.0;  // 1.5 * 2^49
+inline constexpr uint32_t kEighthsMagicBits = 0x49c00000;
+
+inline constexpr double kLog2E = 1.4426950408889634;
+inline constexpr double kLn2 = 0.69314718055994531;
+inline constexpr double kLog10Of2 = 0.30102999566398120;
+
+// A constant as a float of at most `bits` mantissa bits and the rest, so that products with short numbers are exact.
+struct SplitFloat {
+  float high, low;
+  constexpr SplitFloat(double value, int bits)
+      : high(std::bit_cast<float>(std::bit_cast<uint32_t>(static_cast<float>(value)) & (0xffffffffu << (24 - bits)))),
+        low(static_cast<float>(value - high)) {}
+};
+inline constexpr SplitFloat kLog2EShort{kLog2E, 12};
+inline constexpr SplitFloat kLog2Of10Short{3.3219280948873623, 12};
+
+}  // namespace power
+
+// How x^y is computed, from y alone: in float for 2^-10 <= y <= 4, in double for other positive exponents, by the
+// scalar function for zero, negative, infinite and NaN exponents.
+enum class PowerCore : uint8_t { Float, Double, Scalar };
+
+// An exponent with all that is derived from it. Making one costs a few dozen operations: make it once per call.
+struct PowerExponent {
+  constexpr explicit PowerExponent(float y)
+      : exponent(y),
+        core(!(y > 0.0f && y < __builtin_huge_valf()) ? PowerCore::Scalar
+             : y >= 0x1p-10f && y <= 4.0f             ? PowerCore::Float
+                                                      : PowerCore::Double) {
+    if (core == PowerCore::Scalar) return;
+    const power::SplitFloat eighth(y * 0.125, 13);
+    eighthHigh = eighth.high;
+    eighthLow = eighth.low;
+    const double inOctaves = y * power::kLog2E;
+    double scale = 1.0;
+    for (int i = 0; i < 4; ++i) {
+      scale /= inOctaves;
+      if (core == PowerCore::Float) series[i] = static_cast<float>(power::kLn[i] * scale);
+    }
+    for (int j = 0; j < 8; ++j) {
+      slope[j] = static_cast<float>(inOctaves / power::kCentre[j]);
+      offset[j] = static_cast<float>(y * power::kCentreOffset[j]);
+    }
+    // Every x between these powers of two gives a normal result.
+    if (y > 0.98f) {
+      const int down = y < 128.0f ? static_cast<int>(125.0f / y) : 0;
+      const int up = y < 128.0f ? static_cast<int>(127.0f / y) : 0;
+      if (down < 126) firstBits = static_cast<uint32_t>(127 - down) << 23;
+      if (up < 127) lastBits = static_cast<uint32_t>(127 + up) << 23;
+    }
+  }
+
+  float exponent;
+  PowerCore core;
+  float eighthHigh = 0, eighthLow = 0;
+  float series[4] = {};
+  alignas(32) float slope[8] = {};
+  alignas(32) float offset[8] = {};
+  uint32_t firstBits = 0x00800000, lastBits = 0x7f7fffff;
+};
+
+// x^y for x >= 0 (-0 counts as 0); NaN for negative x. As in C: x^0 = 1, 1^y = 1, NaN otherwise stays NaN.
+float Power(float x, const PowerExponent& y) noexcept;
+float Power(float x, float y) noexcept;
+
+// sign(x) * |x|^y: a power law kept odd-symmetric.
+float SignedPower(float x, const PowerExponent& y) noexcept;
+
+// Natural and decimal logarithm: -inf for 0, NaN for negative x.
+float Log(float x) noexcept;
+float Log10(float x) noexcept;
+
+// e^x and 10^x.
+float Exp(float x) noexcept;
+float Exp10(float x) noexcept;
+
+}  // namespace vexel
