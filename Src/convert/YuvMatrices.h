@@ -16,8 +16,8 @@ inline constexpr YuvMatrix kBt601 = {0.5,   -0.418688, -0.081312, -0.168736, -0.
 inline constexpr YuvMatrix kBt709 = {0.5,    -0.454153, -0.045847, -0.114572,   -0.385428,   0.5,   0.2126,
                                      0.7152, 0.0722,    1.8556,    -0.18732427, -0.46812427, 1.5748};
 
-// Y'CbCr of one colorimetry to that of another: the product of the two matrices. Every row of a matrix that makes chroma
-// sums to 0 and that of luma to 1, so the luma column is (0, 0, 1): grey stays what it is.
+// Y'CbCr of one colorimetry to that of another: the product of the two matrices. Every row of a matrix that makes
+// chroma sums to 0 and that of luma to 1, so the luma column is (0, 0, 1): grey stays what it is.
 struct YuvRecoding {
   double vU, vV;  // V' = vU U + vV V
   double uU, uV;  // U' = uU U + uV V
@@ -25,9 +25,8 @@ struct YuvRecoding {
 };
 
 constexpr YuvRecoding Recode(const YuvMatrix& from, const YuvMatrix& to) {
-  return {to.vG * from.gU + to.vB * from.bU, to.vR * from.rV + to.vG * from.gV,
-          to.uG * from.gU + to.uB * from.bU, to.uR * from.rV + to.uG * from.gV,
-          to.yG * from.gU + to.yB * from.bU, to.yR * from.rV + to.yG * from.gV};
+  return {to.vG * from.gU + to.vB * from.bU, to.vR * from.rV + to.vG * from.gV, to.uG * from.gU + to.uB * from.bU,
+          to.uR * from.rV + to.uG * from.gV, to.yG * from.gU + to.yB * from.bU, to.yR * from.rV + to.yG * from.gV};
 }
 
 inline constexpr YuvRecoding k601To709 = Recode(kBt601, kBt709);

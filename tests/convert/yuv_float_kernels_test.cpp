@@ -1,0 +1,199 @@
+// Depths and matrices of 4:4:4:4 Y'CbCr in single precision.
+#include <cmath>
+#include <cstring>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "convert/RowKernelCheck.h"
+#include "convert/YuvKernels.h"
+#include "support/Random.h"
+
+namespace vexel::testing {
+namespace {
+
+constexpr float kNan = std::numeric_limits<float>::quiet_NaN(), kInfinity = std::numeric_limits<float>::infinity();
+
+const KernelCase kCases[] = {
+    {"Vuya8To32f", &kVuya8To32f, kPixels8, kPixels32f},
+    {"Vuyx8To32f", &kVuyx8To32f, kPixels8, kPixels32f},
+    {"Vuya8ToVuyp32f", &kVuya8ToVuyp32f, kPixels8, kPixels32f},
+    {"Vuya32fTo8", &kVuya32fTo8, kPixels32f, kPixels8},
+    {"Vuyx32fTo8", &kVuyx32fTo8, kPixels32f, kPixels8},
+    {"Bgra32fToVuya32f_601", &kBgra32fToVuya32f_601, kPixels32f, kPixels32f},
+    {"Bgra32fToVuya32f_709", &kBgra32fToVuya32f_709, kPixels32f, kPixels32f},
+    {"Bgrx32fToVuyx32f_601", &kBgrx32fToVuyx32f_601, kPixels32f, kPixels32f},
+    {"Bgrx32fToVuyx32f_709", &kBgrx32fToVuyx32f_709, kPixels32f, kPixels32f},
+    {"Vuya32fToBgra32f_601", &kVuya32fToBgra32f_601, kPixels32f, kPixels32f},
+    {"Vuya32fToBgra32f_709", &kVuya32fToBgra32f_709, kPixels32f, kPixels32f},
+    {"Vuyx32fToBgrx32f_601", &kVuyx32fToBgrx32f_601, kPixels32f, kPixels32f},
+    {"Vuyx32fToBgrx32f_709", &kVuyx32fToBgrx32f_709, kPixels32f, kPixels32f},
+    {"Vuya32f_601To709", &kVuya32f_601To709, kPixels32f, kPixels32f},
+    {"Vuya32f_709To601", &kVuya32f_709To601, kPixels32f, kPixels32f},
+    {"Vuyx32f_601To709", &kVuyx32f_601To709, kPixels32f, kPixels32f},
+    {"Vuyx32f_709To601", &kVuyx32f_709To601, kPixels32f, kPixels32f},
+    {"Vuya8ToBgra32f_601", &kVuya8ToBgra32f_601, kPixels8, kPixels32f},
+    {"Vuya8ToBgra32f_709", &kVuya8ToBgra32f_709, kPixels8, kPixels32f},
+    {"Vuyx8ToBgrx32f_601", &kVuyx8ToBgrx32f_601, kPixels8, kPixels32f},
+    {"Vuyx8ToBgrx32f_709", &kVuyx8ToBgrx32f_709, kPixels8, kPixels32f},
+    {"Bgra32fToVuya8_601", &kBgra32fToVuya8_601, kPixels32f, kPixels8},
+    {"Bgra32fToVuya8_709", &kBgra32fToVuya8_709, kPixels32f, kPixels8},
+};
+
+TEST(YuvFloatKernels, VariantsAgreeAndStayInTheRow) {
+  for (const KernelCase& kernelCase : kCases) ExpectVariantsAgree(kernelCase, 70);
+}
+
+// R'G'B' of one pixel by the matrix equations, from luma coefficients alone; the published tables round them to six or
+// seven digits.
+struct Luma {
+  double r, b;
+  double g() const { return 1 - r - b; }
+};
+constexpr Luma k601{0.299, 0.114}, k709{0.2126, 0.0722};
+
+struct Pixel {
+  double c[4];
+};
+Pixel ToYuv(const Luma& k, const Pixel& bgra) {
+  const double y = k.r * bgra.c[2] + k.g() * bgra.c[1] + k.b * bgra.c[0];
+  return {{(bgra.c[2] - y) / (2 - 2 * k.r), (bgra.c[0] - y) / (2 - 2 * k.b), y, bgra.c[3]}};
+}
+Pixel ToBgr(const Luma& k, const Pixel& vuya) {
+  const double r = vuya.c[2] + (2 - 2 * k.r) * vuya.c[0], b = vuya.c[2] + (2 - 2 * k.b) * vuya.c[1];
+  return {{b, (vuya.c[2] - k.r * r - k.b * b) / k.g(), r, vuya.c[3]}};
+}
+
+std::vector<float> RandomPixels(size_t count, float least, float most) {
+  Random random(7);
+  std::vector<float> pixels(4 * count);
+  for (float& value : pixels) value = random.Float(least, most);
+  return pixels;
+}
+
+TEST(YuvFloatKernels, MatricesFollowTheEquations) {
+  struct {
+    const RowKernelSet* kernels;
+    Pixel (*expected)(const Pixel&);
+    bool opaque;
+  } const kMatrices[] = {
+      {&kBgra32fToVuya32f_601, [](const Pixel& p) { return ToYuv(k601, p); }, false},
+      {&kBgra32fToVuya32f_709, [](const Pixel& p) { return ToYuv(k709, p); }, false},
+      {&kBgrx32fToVuyx32f_601, [](const Pixel& p) { return ToYuv(k601, p); }, true},
+      {&kBgrx32fToVuyx32f_709, [](const Pixel& p) { return ToYuv(k709, p); }, true},
+      {&kVuya32fToBgra32f_601, [](const Pixel& p) { return ToBgr(k601, p); }, false},
+      {&kVuya32fToBgra32f_709, [](const Pixel& p) { return ToBgr(k709, p); }, false},
+      {&kVuyx32fToBgrx32f_601, [](const Pixel& p) { return ToBgr(k601, p); }, true},
+      {&kVuyx32fToBgrx32f_709, [](const Pixel& p) { return ToBgr(k709, p); }, true},
+      {&kVuya32f_601To709, [](const Pixel& p) { return ToYuv(k709, ToBgr(k601, p)); }, false},
+      {&kVuya32f_709To601, [](const Pixel& p) { return ToYuv(k601, ToBgr(k709, p)); }, false},
+      {&kVuyx32f_601To709, [](const Pixel& p) { return ToYuv(k709, ToBgr(k601, p)); }, true},
+      {&kVuyx32f_709To601, [](const Pixel& p) { return ToYuv(k601, ToBgr(k709, p)); }, true},
+  };
+  constexpr size_t kCount = 1000;
+  const std::vector<float> source = RandomPixels(kCount, -0.5f, 1.5f);
+  for (size_t m = 0; m < std::size(kMatrices); ++m) {
+    const auto got = RunKernel<float>(*kMatrices[m].kernels, source, kCount, 4 * kCount);
+    for (size_t i = 0; i < kCount; ++i) {
+      const float* p = &source[4 * i];
+      const Pixel expected = kMatrices[m].expected({{p[0], p[1], p[2], p[3]}});
+      for (size_t c = 0; c < 3; ++c)
+        ASSERT_NEAR(got[4 * i + c], expected.c[c], 2.5e-6) << "matrix " << m << " channel " << c;
+      ASSERT_EQ(got[4 * i + 3], kMatrices[m].opaque ? 1.0f : p[3]) << "matrix " << m;
+    }
+  }
+}
+
+TEST(YuvFloatKernels, GreyStaysGreyBetweenColorimetries) {
+  const std::vector<float> source = {0, 0, 0.3f, 0.25f, 0, 0, 1.0f, 0, 0, 0, -0.7f, 1, 0, 0, 1e20f, 2};
+  for (const RowKernelSet* kernels : {&kVuya32f_601To709, &kVuya32f_709To601})
+    EXPECT_EQ(RunKernel<float>(*kernels, source, 4, 16), source);
+}
+
+// An infinite or undefined channel reaches only those channels whose formula names it.
+TEST(YuvFloatKernels, SpecialValuesReachOnlyTheirChannels) {
+  for (const float bad : {kInfinity, kNan}) {
+    const std::vector<float> badV = {bad, 0.25f, 0.5f, 1}, badU = {0.25f, bad, 0.5f, 1},
+                             badA = {0.25f, 0.25f, 0.5f, bad};
+    for (const RowKernelSet* kernels : {&kVuya32fToBgra32f_601, &kVuya32fToBgra32f_709}) {
+      const auto fromV = RunKernel<float>(*kernels, badV, 1, 4), fromU = RunKernel<float>(*kernels, badU, 1, 4);
+      EXPECT_TRUE(std::isfinite(fromV[0]) && !std::isfinite(fromV[1]) && !std::isfinite(fromV[2]) && fromV[3] == 1);
+      EXPECT_TRUE(!std::isfinite(fromU[0]) && !std::isfinite(fromU[1]) && std::isfinite(fromU[2]) && fromU[3] == 1);
+    }
+    for (const RowKernelSet* kernels : {&kBgra32fToVuya32f_601, &kVuya32fToBgra32f_709, &kVuya32f_601To709}) {
+      const auto got = RunKernel<float>(*kernels, badA, 1, 4);
+      for (int c = 0; c < 3; ++c) EXPECT_TRUE(std::isfinite(got[c]));
+      EXPECT_FALSE(std::isfinite(got[3]));
+    }
+  }
+}
+
+std::vector<uint8_t> AllCodes() {
+  std::vector<uint8_t> codes(4 * 256);
+  for (size_t i = 0; i < codes.size(); ++i) codes[i] = static_cast<uint8_t>(i / 4);
+  return codes;
+}
+
+TEST(YuvFloatKernels, EveryCodeWidensAndComesBack) {
+  const std::vector<uint8_t> codes = AllCodes();
+  const auto wide = RunKernel<float>(kVuya8To32f, codes, 256, 1024);
+  const auto opaque = RunKernel<float>(kVuyx8To32f, codes, 256, 1024);
+  const auto premultiplied = RunKernel<float>(kVuya8ToVuyp32f, codes, 256, 1024);
+  for (int code = 0; code < 256; ++code) {
+    const double expected[4] = {(code - 128) / 224.0, (code - 128) / 224.0, (code - 16) / 219.0, code / 255.0};
+    for (int c = 0; c < 4; ++c) {
+      const size_t i = static_cast<size_t>(4 * code + c);
+      EXPECT_NEAR(wide[i], expected[c], 1.2e-7 * std::abs(expected[c]));
+      EXPECT_EQ(opaque[i], c == 3 ? 1.0f : wide[i]);
+      EXPECT_EQ(premultiplied[i], c == 3 ? wide[i] : wide[i] * wide[static_cast<size_t>(4 * code + 3)]);
+    }
+  }
+  EXPECT_EQ(wide[4 * 16 + 2], 0.0f);
+  EXPECT_EQ(wide[4 * 255 + 3], 1.0f);
+
+  EXPECT_EQ(RunKernel<uint8_t>(kVuya32fTo8, wide, 256, 1024), codes);
+  auto opaqueCodes = codes;
+  for (size_t i = 3; i < 1024; i += 4) opaqueCodes[i] = 255;
+  EXPECT_EQ(RunKernel<uint8_t>(kVuyx32fTo8, wide, 256, 1024), opaqueCodes);
+}
+
+TEST(YuvFloatKernels, NarrowingSaturates) {
+  struct {
+    float value;
+    uint8_t chroma, luma, alpha;
+  } const kValues[] = {{-1, 0, 0, 0},         {1, 255, 235, 255},    {2, 255, 255, 255},   {-100, 0, 0, 0},
+                       {0.5f, 240, 126, 128}, {kNan, 0, 0, 0},       {kInfinity, 0, 0, 0}, {-kInfinity, 0, 0, 0},
+                       {1e10f, 0, 0, 0},      {8e6f, 255, 255, 255}, {-1e10f, 0, 0, 0},    {1e-40f, 128, 16, 0}};
+  for (const auto& [value, chroma, luma, alpha] : kValues) {
+    const std::vector<uint8_t> expected = {chroma, chroma, luma, alpha};
+    EXPECT_EQ(RunKernel<uint8_t>(kVuya32fTo8, std::vector<float>(4, value), 1, 4), expected) << value;
+  }
+}
+
+TEST(YuvFloatKernels, MixedDepthsAreTheirTwoSteps) {
+  struct {
+    const RowKernelSet *direct, *first, *second;
+  } const kWidening[] = {{&kVuya8ToBgra32f_601, &kVuya8To32f, &kVuya32fToBgra32f_601},
+                         {&kVuya8ToBgra32f_709, &kVuya8To32f, &kVuya32fToBgra32f_709},
+                         {&kVuyx8ToBgrx32f_601, &kVuyx8To32f, &kVuyx32fToBgrx32f_601},
+                         {&kVuyx8ToBgrx32f_709, &kVuyx8To32f, &kVuyx32fToBgrx32f_709}},
+          kNarrowing[] = {{&kBgra32fToVuya8_601, &kBgra32fToVuya32f_601, &kVuya32fTo8},
+                          {&kBgra32fToVuya8_709, &kBgra32fToVuya32f_709, &kVuya32fTo8}};
+  constexpr size_t kCount = 4099;
+  std::vector<uint8_t> codes(4 * kCount);
+  Random random(3);
+  random.Fill(codes.data(), codes.size());
+  for (const auto& steps : kWidening)
+    EXPECT_EQ(
+        RunKernel<float>(*steps.direct, codes, kCount, 4 * kCount),
+        RunKernel<float>(*steps.second, RunKernel<float>(*steps.first, codes, kCount, 4 * kCount), kCount, 4 * kCount));
+  std::vector<float> pixels(4 * kCount);
+  for (float& value : pixels) value = AnyFloat(random);
+  for (const auto& steps : kNarrowing)
+    EXPECT_EQ(RunKernel<uint8_t>(*steps.direct, pixels, kCount, 4 * kCount),
+              RunKernel<uint8_t>(*steps.second, RunKernel<float>(*steps.first, pixels, kCount, 4 * kCount), kCount,
+                                 4 * kCount));
+}
+
+}  // namespace
+}  // namespace vexel::testing
