@@ -15,6 +15,7 @@
 #include <numeric>
 
 #include "formats/FormatBits.h"
+#include "frame/FpModeGuard.h"
 #include "support/ArenaMemory.h"
 
 namespace vexel::testing {
@@ -250,6 +251,7 @@ std::vector<int> Range(int first, int last) {
 
 std::function<VX_Result(const ArenaFrame*, const ArenaFrame&)> RunRows(const RowKernelSet& kernel) {
   return [&kernel](const ArenaFrame* sources, const ArenaFrame& destination) {
+    const FpModeGuard guard;
     const RowKernel convert = kernel[ActiveKernelVariant()];
     for (int row = 0; row < destination.height; ++row)
       convert(sources[0].Row(row), destination.Row(row), static_cast<size_t>(destination.width));
