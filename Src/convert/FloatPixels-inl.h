@@ -46,6 +46,19 @@ HWY_INLINE F32 TakeChannels(F32 first, F32 second) {
 #endif
 }
 
+// The channels of each pixel in a new order.
+template <int k0, int k1, int k2, int k3>
+HWY_INLINE F32 PermuteChannels(F32 v) {
+  constexpr int kOrder = k0 | k1 << 2 | k2 << 4 | k3 << 6;
+#if HWY_TARGET == HWY_AVX3
+  return F32{_mm512_permute_ps(v.raw, kOrder)};
+#elif HWY_TARGET == HWY_AVX2
+  return F32{_mm256_permute_ps(v.raw, kOrder)};
+#else
+  return F32{_mm_shuffle_ps(v.raw, v.raw, kOrder)};
+#endif
+}
+
 // `colour` with the fourth channel of `source`, or with an opaque one.
 template <bool kOpaque>
 HWY_INLINE F32 FinishAlpha(F32 colour, F32 source) {

@@ -29,11 +29,16 @@ extern const RowKernelSet kUyvy8ToVuyx8, kYuyv8ToVuyx8, kVuyx8ToUyvy8;
 extern const RowKernelSet kSwap422_8u;  // UYVY <-> YUYV
 extern const RowKernelSet kUyvy8_601To709, kUyvy8_709To601, kYuyv8_601To709, kYuyv8_709To601;
 
-// Packed 4:2:2, 32f (Packed422Kernels32f.cpp).
+// Packed 4:2:2, 32f (Packed422Kernels32f.cpp). A row of an odd width ends with a whole pair.
 extern const RowKernelSet kSwap422_32f;
 extern const RowKernelSet kUyvy8To32f, kYuyv8To32f, kUyvy32fTo8, kYuyv32fTo8;
-extern const RowKernelSet kUyvy32fToVuyx32f;         // chroma of odd pixels interpolated with (-1, 9, 9, -1) / 16
-extern const RowKernelSet kUyvy32fToVuyx32fNearest;  // both pixels of a pair take the pair's chroma
+// Chroma is co-sited with the even pixel. Interpolation makes that of the odd ones with the taps (-1, 9, 9, -1) / 16,
+// which repeat the last sample beyond the row's ends; "Nearest" repeats the pair's. Alpha is written opaque.
+extern const RowKernelSet kUyvy32fToVuyx32f, kUyvy32fToVuyx32fNearest;
+// The way back low-passes chroma as the lifting partner of the interpolation: with d[i] what the interpolation gets wrong
+// at the odd pixel of pair i, chroma is even[i] - (d[i - 1] + d[i]) / 4, that is (1, 0, -8, 16, 46, 16, -8, 0, 1) / 64.
+// An interpolated row comes back bit for bit. Beyond the ends d is 0, and the luma that an odd width lacks repeats the
+// last. The fourth channel is ignored.
 extern const RowKernelSet kVuyx32fToUyvy32f;
 
 // V210: 6 pixels in 16 bytes, 10-bit studio codes (V210Kernels.cpp).
