@@ -25,12 +25,12 @@ inline constexpr size_t AlphaIndex(AlphaWrite alpha) { return alpha == AlphaWrit
 
 namespace plain {
 
-// Calls pixel(in, out) with four channels of type From and To for each pixel of a row. Rows need no alignment.
-template <class From, class To, class Pixel>
+// Calls pixel(in, out) for each pixel of a row, with its channels of type From and To. Rows need no alignment.
+template <class From, class To, size_t kFromChannels = 4, size_t kToChannels = 4, class Pixel>
 inline void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Pixel& pixel) {
   for (size_t i = 0; i < count; ++i) {
-    From in[4];
-    To out[4];
+    From in[kFromChannels];
+    To out[kToChannels];
     std::memcpy(in, src + i * sizeof in, sizeof in);
     pixel(in, out);
     std::memcpy(dst + i * sizeof out, out, sizeof out);
