@@ -1,0 +1,149 @@
+// Matrices of 8-bit 4:4:4 pixels in fixed point: RGB to Y'CbCr, back, and from one colorimetry to the other.
+#include <cstddef>
+#include <cstdint>
+
+#include "convert/PlainPixels.h"
+#include "convert/YuvFixed8.h"
+#include "convert/YuvKernels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "convert/YuvMatrix8Kernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "convert/YuvVectors8-inl.h"
+#include "frame/KernelTable.h"
+
+// X(kernel, family, coefficients, alpha): all kernels of this file.
+#ifndef VEXEL_CONVERT_YUVMATRIX8_KERNELS
+#define VEXEL_CONVERT_YUVMATRIX8_KERNELS(X)                             \
+  X(Bgra8ToVuya8_601, RgbToYuv, kRgbToYuv8_601, AlphaWrite::Keep)       \
+  X(Bgra8ToVuya8_709, RgbToYuv, kRgbToYuv8_709, AlphaWrite::Keep)       \
+  X(Bgrx8ToVuyx8_601, RgbToYuv, kRgbToYuv8_601, AlphaWrite::OpaqueLast) \
+  X(Bgrx8ToVuyx8_709, RgbToYuv, kRgbToYuv8_709, AlphaWrite::OpaqueLast) \
+  X(Vuya8ToBgra8_601, YuvToRgb, kYuvToRgb8_601, AlphaWrite::Keep)       \
+  X(Vuya8ToBgra8_709, YuvToRgb, kYuvToRgb8_709, AlphaWrite::Keep)       \
+  X(Vuyx8ToBgrx8_601, YuvToRgb, kYuvToRgb8_601, AlphaWrite::OpaqueLast) \
+  X(Vuyx8ToBgrx8_709, YuvToRgb, kYuvToRgb8_709, AlphaWrite::OpaqueLast) \
+  X(Vuya8_601To709, YuvToYuv, kYuv8_601To709, AlphaWrite::Keep)         \
+  X(Vuya8_709To601, YuvToYuv, kYuv8_709To601, AlphaWrite::Keep)         \
+  X(Vuyx8_601To709, YuvToYuv, kYuv8_601To709, AlphaWrite::OpaqueLast)   \
+  X(Vuyx8_709To601, YuvToYuv, kYuv8_709To601, AlphaWrite::OpaqueLast)
+#endif
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace {
+
+// No result leaves 0..255, so the sums' third bytes are the results.
+template <AlphaWrite kAlpha>
+struct RgbToYuvOp {
+  HWY_INLINE U8 operator()(U8 bgra) const {
+    const I16 blueRed = VectorMatrix8::OuterChannels(bgra), green = matrix.InnerChannel(bgra);
+    const I32 v = matrix.Sum(0, blueRed, green), u = matrix.Sum(1, blueRed, green), y = matrix.Sum(2, blueRed, green);
+#if HWY_TARGET == HWY_AVX3
+    const __m512i third = ByteOrder<0x8222>().raw;
+    __m512i out = AlphaBytes<kAlpha>(bgra).raw;
+    out = _mm512_mask_mov_epi8(out, 0x4444444444444444, y.raw);
+    out = _mm512_mask_shuffle_epi8(out, 0x1111111111111111, v.raw, third);
+    return U8{_mm512_mask_shuffle_epi8(out, 0x2222222222222222, u.raw, third)};
+#else
+    const auto vy = hn::OddEven(AsU16(y), AsU16(hn::ShiftRight<16>(v)));
+    const auto ua = hn::OddEven(AsU16(AlphaBytes<kAlpha>(bgra)), AsU16(hn::ShiftRight<8>(u)));
+    return SelectBytes(Dwords(0xFF00FF00), AsU8(ua), AsU8(vy));
+#endif
+  }
+  VectorMatrix8 matrix;
+};
+
+template <AlphaWrite kAlpha>
+struct YuvToYuvOp {
+  HWY_INLINE U8 operator()(U8 vuya) const {
+    const I16 outer = VectorMatrix8::OuterChannels(vuya), inner = matrix.InnerChannel(vuya);
+    const auto v = hn::ShiftRight<14>(matrix.Sum(0, outer, inner));
+    const auto u = hn::ShiftRight<14>(matrix.Sum(1, outer, inner));
+    const auto y = hn::ShiftLeft<2>(matrix.Sum(2, outer, inner));
+    const auto alpha = hn::ShiftRight<8>(AsU16(AlphaBytes<kAlpha>(vuya)));
+    const auto vy = hn::OddEven(AsI16(y), AsI16(v)), ua = hn::OddEven(AsI16(alpha), AsI16(u));
+    // Each block now holds v0 y0 v1 y1 ... v3 y3 u0 a0 ... u3 a3.
+    alignas(16) static constexpr uint8_t kOrder[16] = {0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15};
+    return hn::TableLookupBytes(PackBlocks(vy, ua), hn::LoadDup128(hn::ScalableTag<uint8_t>(), kOrder));
+  }
+  VectorMatrix8 matrix;
+};
+
+template <AlphaWrite kAlpha>
+struct YuvToRgbOp {
+  HWY_INLINE U8 operator()(U8 vuya) const {
+    const auto uv = AsI16(hn::Xor(hn::TableLookupBytes(vuya, ByteOrder<0x0818>()), Dwords(0x80008000)));
+    const I16 y = matrix.Luma(AsU16(hn::TableLookupBytes(vuya, ByteOrder<0x2828>())));
+    const I16 blueRed = Double(matrix.BlueRed(y, uv));
+    const I16 green = Double(hn::SaturatedAdd(y, matrix.GreenChroma(uv)));
+#if HWY_TARGET == HWY_AVX3
+    __m512i out = AlphaBytes<kAlpha>(vuya).raw;
+    out = _mm512_mask_shuffle_epi8(out, 0x5555555555555555, blueRed.raw, ByteOrder<0x8381>().raw);
+    out = _mm512_mask_shuffle_epi8(out, 0x2222222222222222, green.raw, ByteOrder<0x8838>().raw);
+    return hn::Xor(U8{out}, Dwords(0x00808080));
+#else
+    const auto ga = hn::OddEven(AsU16(AlphaBytes<kAlpha>(vuya)), AsU16(hn::ShiftRight<16>(AsI32(green))));
+    const auto br = hn::ShiftRight<8>(AsU16(blueRed));
+    return hn::Xor(SelectBytes(Dwords(0xFF00FF00), AsU8(ga), AsU8(br)), Dwords(0x00808080));
+#endif
+  }
+  VectorYuvToRgb8 matrix;
+};
+
+#define VX_KERNEL(Name, Family, kCoefficients, kAlpha)                                                  \
+  HWY_ATTR void Name(const uint8_t* src, uint8_t* dst, size_t count) {                                  \
+    using Op = Family##Op<kAlpha>;                                                                      \
+    MapRow<uint8_t>(src, dst, count, EachVector<uint8_t, Op>{Op{decltype(Op::matrix)(kCoefficients)}}); \
+  }
+VEXEL_CONVERT_YUVMATRIX8_KERNELS(VX_KERNEL)
+#undef VX_KERNEL
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#if HWY_ONCE
+namespace vexel {
+namespace plain {
+namespace {
+
+struct Multiply {
+  const FixedMatrix8& matrix;
+  void operator()(const uint8_t* in, uint8_t* out) const { MultiplyMatrix8(matrix, in, out); }
+};
+using RgbToYuv = Multiply;
+using YuvToYuv = Multiply;
+
+struct YuvToRgb {
+  const FixedYuvToRgb8& matrix;
+  void operator()(const uint8_t* vuya, uint8_t* bgra) const {
+    Yuv8ToBgr8(matrix, vuya[2], 256 * (vuya[1] - 128), 256 * (vuya[0] - 128), bgra);
+  }
+};
+
+#define VX_KERNEL(Name, Family, kCoefficients, kAlpha)                                 \
+  void Name(const uint8_t* src, uint8_t* dst, size_t count) {                          \
+    MapPixels<uint8_t, uint8_t>(src, dst, count, [](const uint8_t* in, uint8_t* out) { \
+      Family{kCoefficients}(in, out);                                                  \
+      out[3] = kAlpha == AlphaWrite::Keep ? in[3] : 255;                               \
+    });                                                                                \
+  }
+VEXEL_CONVERT_YUVMATRIX8_KERNELS(VX_KERNEL)
+#undef VX_KERNEL
+
+}  // namespace
+}  // namespace plain
+
+#define VX_KERNEL(Name, Family, kCoefficients, kAlpha) const RowKernelSet k##Name = VX_KERNEL_VARIANTS(Name);
+VEXEL_CONVERT_YUVMATRIX8_KERNELS(VX_KERNEL)
+#undef VX_KERNEL
+
+}  // namespace vexel
+#endif  // HWY_ONCE
