@@ -1,0 +1,12 @@
+// The sub-commands. Each lives in a file of its own; main.cpp lists them in the order of the help text.
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace tool {
+
+void AddFormatsCommand(CLI::App& app);
+void AddInfoCommand(CLI::App& app);
+void AddConvertCommand(CLI::App& app);
+
+}  // namespace tool

@@ -1,0 +1,60 @@
+#include <clocale>
+#include <csignal>
+#include <exception>
+#include <iostream>
+#include <string>
+
+#include "commands.h"
+#include "tool_error.h"
+#include "vexel/vexel.h"
+
+namespace {
+
+constexpr int kExitFailed = 1;
+constexpr int kExitUsage = 2;
+
+void AddCommands(CLI::App& app) {
+  tool::AddFormatsCommand(app);
+  tool::AddInfoCommand(app);
+  tool::AddConvertCommand(app);
+}
+
+struct Library {
+  Library() { VX_Initialize(); }
+  ~Library() { VX_Terminate(); }
+};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::signal(SIGPIPE, SIG_IGN);  // a closed pipe is an error to report, not a silent death
+  Library library;
+  CLI::App app{"Vexel: convert pictures and video between pixel formats", "vexel"};
+  app.set_version_flag("--version", std::string("vexel ") + VX_GetVersion());
+  app.require_subcommand(1);
+  app.failure_message(CLI::FailureMessage::simple);
+  AddCommands(app);
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::Success& success) {
+    return app.exit(success);
+  } catch (const CLI::ParseError& error) {
+    std::cerr << "vexel: " << error.what() << "\nRun \"vexel --help\" or \"vexel COMMAND --help\" for usage.\n";
+    return kExitUsage;
+  } catch (const tool::ToolError& error) {
+    std::cerr << "vexel: " << error.what() << '\n';
+    return kExitFailed;
+  } catch (const std::bad_alloc&) {
+    std::cerr << "vexel: out of memory\n";
+    return kExitFailed;
+  } catch (const std::exception& error) {
+    std::cerr << "vexel: " << error.what() << '\n';
+    return kExitFailed;
+  }
+  std::cout.flush();
+  if (!std::cout) {
+    std::cerr << "vexel: cannot write to standard output\n";
+    return kExitFailed;
+  }
+  return 0;
+}

@@ -1,0 +1,31 @@
+#include "picture_io.h"
+
+#include "tool_error.h"
+
+namespace tool {
+
+Picture LoadPicture(const std::string& path, const SourceOptions& options) {
+  Picture picture = OpenSource(path, options)->Next();
+  if (!picture) throw ToolError("cannot read \"" + path + "\": it holds no frame");
+  return picture;
+}
+
+Picture LoadPictureAs(const std::string& path, VX_PixelFormat format, const ConvertOptions& convert,
+                      const SourceOptions& options) {
+  Picture picture = LoadPicture(path, options);
+  return picture.Format() == format ? std::move(picture) : ConvertPicture(picture, format, convert);
+}
+
+void SavePicture(const Picture& picture, const std::string& path, const ConvertOptions& convert,
+                 const SinkOptions& options) {
+  const std::unique_ptr<FrameSink> sink = OpenSink(path, options);
+  const VX_PixelFormat format = sink->StorageFormat(picture.Format());
+  const auto save = [&](const Picture& stored) { sink->Append(stored, sink->Encode(stored)); };
+  if (format == picture.Format())
+    save(picture);
+  else
+    save(ConvertPicture(picture, format, convert));
+  sink->Close();
+}
+
+}  // namespace tool

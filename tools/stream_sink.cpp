@@ -1,0 +1,145 @@
+// Raw frames and Y4M: one stream of bytes.
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+
+extern "C" {
+#include <libavutil/pixdesc.h>
+}
+
+#include "format_catalogue.h"
+#include "frame_export.h"
+#include "frame_sink.h"
+#include "tool_error.h"
+
+namespace tool {
+namespace {
+
+// The stream that frames are appended to; a file is made when its first frame is complete.
+class ByteStream {
+ public:
+  explicit ByteStream(const std::string& path) : mPath(path) {}
+  ~ByteStream() {
+    if (mFile && mFile != stdout) std::fclose(mFile);
+  }
+  ByteStream(const ByteStream&) = delete;
+
+  void Write(const void* bytes, size_t count) {
+    if (!mFile) mFile = mPath == "-" ? stdout : std::fopen(mPath.c_str(), "wb");
+    if (!mFile || std::fwrite(bytes, 1, count, mFile) != count) Fail();
+  }
+  void Close() {
+    if (!mFile) return;
+    std::FILE* file = std::exchange(mFile, nullptr);
+    if ((file == stdout ? std::fflush(file) : std::fclose(file)) != 0) Fail();
+  }
+
+ private:
+  [[noreturn]] void Fail() const {
+    const std::string name = mPath == "-" ? "standard output" : "\"" + mPath + "\"";
+    throw ToolError("cannot write " + name + ": " + std::strerror(errno));
+  }
+  std::string mPath;
+  std::FILE* mFile = nullptr;
+};
+
+class RawSink : public FrameSink {
+ public:
+  explicit RawSink(const std::string& path) : mStream(path) {}
+  VX_PixelFormat StorageFormat(VX_PixelFormat format) const override { return format; }
+  std::vector<uint8_t> Encode(const Picture& picture) const override { return RawBytes(picture); }
+  void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
+    mStream.Write(encoded.data(), encoded.size());
+  }
+  bool TakesManyFrames() const override { return true; }
+  void Close() override { mStream.Close(); }
+
+ private:
+  ByteStream mStream;
+};
+
+// How Y4M names a coding, and the frame layout of its planes.
+struct Y4mCoding {
+  const char* name;
+  AVPixelFormat frameFormat;
+};
+
+Y4mCoding Y4mCodingOf(VX_PixelFormat format) {
+  if (Is420(format)) {
+    const bool mpeg2Siting = true;  // co-sited columns in both families
+    return {mpeg2Siting ? "420mpeg2" : "420jpeg", AV_PIX_FMT_YUV420P};
+  }
+  if (IsV210(format)) return {"422p10", AV_PIX_FMT_YUV422P10LE};
+  if (IsPacked422(format)) return {"422", AV_PIX_FMT_YUV422P};
+  if (IsFloat(format)) return {"444p16", AV_PIX_FMT_YUV444P16LE};
+  if (HasAlpha(format)) return {"444alpha", AV_PIX_FMT_YUVA444P};
+  return {"444", AV_PIX_FMT_YUV444P};
+}
+
+class Y4mSink : public FrameSink {
+ public:
+  Y4mSink(const std::string& path, std::pair<int, int> frameRate) : mStream(path), mFrameRate(frameRate) {}
+
+  // RGB goes to BT.709. Y4M has no straight or premultiplied alpha beyond 8 bits.
+  VX_PixelFormat StorageFormat(VX_PixelFormat format) const override {
+    if (Is420(format) && !IsBiplanar420(format)) return format;
+    const uint32_t matrix = !IsYuv(format) || (Bits(format) & 0x600) ? 0x200 : 0;
+    const auto with = [&](VX_PixelFormat base) { return static_cast<VX_PixelFormat>(Bits(base) | matrix); };
+    if (Is420(format)) return with(Is8Bit(format) ? VX_PixelFormat::VUYX_4444_8u : VX_PixelFormat::V210_422_10u);
+    if (!IsRaster(format)) return with(VX_PixelFormat::UYVY_422_8u);
+    if (IsPacked422(format)) return with(Is8Bit(format) ? VX_PixelFormat::UYVY_422_8u : VX_PixelFormat::V210_422_10u);
+    if (!Is8Bit(format)) return with(VX_PixelFormat::VUYX_4444_32f);
+    return with(HasAlpha(format) ? VX_PixelFormat::VUYA_4444_8u : VX_PixelFormat::VUYX_4444_8u);
+  }
+
+  std::vector<uint8_t> Encode(const Picture& picture) const override {
+    if (Is420(picture.Format())) return RawBytes(picture);
+    const AVPixelFormat frameFormat = Y4mCodingOf(picture.Format()).frameFormat;
+    const Frame frame = ExportFrame(picture, frameFormat, false);
+    const AVPixFmtDescriptor* d = av_pix_fmt_desc_get(frameFormat);
+    std::vector<uint8_t> bytes;
+    for (int p = 0; p < av_pix_fmt_count_planes(frameFormat); ++p) {
+      const bool chroma = p == 1 || p == 2;
+      const int columns = chroma ? AV_CEIL_RSHIFT(picture.Width(), d->log2_chroma_w) : picture.Width();
+      const size_t rowBytes = static_cast<size_t>(columns) * (d->comp[0].depth > 8 ? 2 : 1);
+      for (int y = 0; y < picture.Height(); ++y) {
+        const uint8_t* row = frame->data[p] + static_cast<ptrdiff_t>(y) * frame->linesize[p];
+        bytes.insert(bytes.end(), row, row + rowBytes);
+      }
+    }
+    return bytes;
+  }
+
+  void Append(const Picture& picture, const std::vector<uint8_t>& encoded) override {
+    if (!mHeaderWritten) WriteHeader(picture);
+    mStream.Write("FRAME\n", 6);
+    mStream.Write(encoded.data(), encoded.size());
+  }
+  bool TakesManyFrames() const override { return true; }
+  void Close() override { mStream.Close(); }
+
+ private:
+  void WriteHeader(const Picture& picture) {
+    const bool field = FrameKind(picture.Format()) == 9 || FrameKind(picture.Format()) == 11;
+    const char* range = IsFullRangeYuv(picture.Format()) ? "FULL" : "LIMITED";
+    char header[160];
+    const int length = std::snprintf(header, sizeof header, "YUV4MPEG2 W%d H%d F%d:%d I%c A1:1 C%s XCOLORRANGE=%s\n",
+                                     picture.Width(), picture.Height(), mFrameRate.first, mFrameRate.second,
+                                     field ? 't' : 'p', Y4mCodingOf(picture.Format()).name, range);
+    mStream.Write(header, static_cast<size_t>(length));
+    mHeaderWritten = true;
+  }
+
+  ByteStream mStream;
+  std::pair<int, int> mFrameRate;
+  bool mHeaderWritten = false;
+};
+
+}  // namespace
+
+std::unique_ptr<FrameSink> OpenStreamSink(const std::string& path, Container container, std::pair<int, int> frameRate) {
+  if (container == Container::Raw) return std::make_unique<RawSink>(path);
+  return std::make_unique<Y4mSink>(path, frameRate);
+}
+
+}  // namespace tool
