@@ -41,8 +41,13 @@ extern const RowKernelSet kUyvy32fToVuyx32f, kUyvy32fToVuyx32fNearest;
 // last. The fourth channel is ignored.
 extern const RowKernelSet kVuyx32fToUyvy32f;
 
-// V210: 6 pixels in 16 bytes, 10-bit studio codes (V210Kernels.cpp).
+// V210: 6 pixels in 16 bytes; 10-bit studio codes, which are those of 8 bits times 4 (V210Kernels.cpp). Packing writes
+// whole groups, black (64, 512) where the last one holds more than the row's pairs. Codes take the whole range 0..1023,
+// those that SDI reserves for its timing included, so that bytes come back from V210 as they were; the way to bytes
+// rounds to nearest and saturates.
 extern const RowKernelSet kUyvy8ToV210, kV210ToUyvy8, kUyvy32fToV210, kV210ToUyvy32f;
+// Chroma of an odd pixel is the mean of its two neighbours, at the row's end the last sample. Everything is computed from
+// 10-bit codes and rounded once to 8; fixed point deviates from the exact value by less than 1/16 of a code before that.
 extern const RowKernelSet kV210ToBgrx8_601, kV210ToBgrx8_709, kV210ToVuyx8, kV210_709ToVuyx8_601;
 
 }  // namespace vexel

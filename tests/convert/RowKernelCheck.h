@@ -113,13 +113,13 @@ inline size_t FirstDifference(const RowShape& shape, const uint8_t* a, const uin
   return bytes;
 }
 
-// All variants give the plain kernel's bytes for rows of 0 to `most` pixels, without a step outside of the rows.
-inline void ExpectVariantsAgree(const KernelCase& kernelCase, size_t most) {
+// All variants give the plain kernel's bytes for rows of `least` to `most` pixels, without a step outside of the rows.
+inline void ExpectVariantsAgree(const KernelCase& kernelCase, size_t most, size_t least = 0) {
   const size_t sourceMost = kernelCase.source.Bytes(most), destinationMost = kernelCase.destination.Bytes(most);
   GuardedBytes source(sourceMost), destination(destinationMost);
   std::vector<uint8_t> expected(destinationMost);
   Random random(most);
-  for (size_t count = 0; count <= most; ++count) {
+  for (size_t count = least; count <= most; ++count) {
     const bool atEnd = count % 2 != 0 || count > most / 2;
     const size_t sourceBytes = kernelCase.source.Bytes(count), bytes = kernelCase.destination.Bytes(count);
     uint8_t* in = source.Row(sourceBytes, atEnd);
