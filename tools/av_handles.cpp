@@ -3,6 +3,7 @@
 #include <cstdarg>
 #include <mutex>
 #include <new>
+#include <utility>
 
 #include "tool_error.h"
 
@@ -39,15 +40,17 @@ Packet NewPacket() {
 
 void CollectAvMessages() { av_log_set_callback(KeepLastError); }
 
+std::string TakeAvMessage() {
+  const std::lock_guard lock(gLastMessageMutex);
+  const std::string message = std::exchange(gLastMessage, {});
+  return message.empty() ? message : " (" + message + ")";
+}
+
 void CheckAv(int code, const std::string& what) {
   if (code >= 0) return;
   char reason[AV_ERROR_MAX_STRING_SIZE] = "";
   av_strerror(code, reason, sizeof reason);
-  std::string text = what + ": " + reason;
-  const std::lock_guard lock(gLastMessageMutex);
-  if (!gLastMessage.empty()) text += " (" + gLastMessage + ")";
-  gLastMessage.clear();
-  throw ToolError(text);
+  throw ToolError(what + ": " + reason + TakeAvMessage());
 }
 
 }  // namespace tool

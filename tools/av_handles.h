@@ -28,6 +28,9 @@ Packet NewPacket();
 // Keeps libav from writing to the terminal; its last error line explains a failure instead.
 void CollectAvMessages();
 
+// Libav's last error line in parentheses, with a space before it, or nothing; it is told once.
+std::string TakeAvMessage();
+
 // Throws ToolError "WHAT: REASON" with libav's text for the code and its last error line. Does nothing for codes >= 0.
 void CheckAv(int code, const std::string& what);
 

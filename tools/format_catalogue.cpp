@@ -1,12 +1,9 @@
 #include "format_catalogue.h"
 
-#include <algorithm>
-#include <array>
-#include <cctype>
 #include <cstdio>
-#include <numeric>
 #include <vector>
 
+#include "nearest_name.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -24,34 +21,6 @@ constexpr CatalogueEntry kEntries[] = {VX_PIXEL_FORMATS(TOOL_NAMED) VX_UNNAMED_P
 #undef TOOL_NAMED
 #undef TOOL_UNNAMED
 
-// The number of insertions, deletions and replacements that turn one text into the other, ignoring case.
-int EditDistance(const std::string& a, const std::string& b) {
-  std::vector<int> row(b.size() + 1);
-  std::iota(row.begin(), row.end(), 0);
-  for (size_t i = 0; i < a.size(); ++i) {
-    int diagonal = row[0];
-    row[0] = static_cast<int>(i) + 1;
-    for (size_t j = 0; j < b.size(); ++j) {
-      const bool same =
-          std::tolower(static_cast<unsigned char>(a[i])) == std::tolower(static_cast<unsigned char>(b[j]));
-      const int replaced = diagonal + (same ? 0 : 1);
-      diagonal = row[j + 1];
-      row[j + 1] = std::min({replaced, row[j] + 1, diagonal + 1});
-    }
-  }
-  return row.back();
-}
-
-// The few names that are nearest, best first.
-std::string NearestNames(const std::string& name) {
-  std::vector<std::pair<int, const char*>> ranked;
-  for (const CatalogueEntry& entry : Catalogue()) ranked.emplace_back(EditDistance(name, entry.name), entry.name);
-  std::stable_sort(ranked.begin(), ranked.end(), [](auto& a, auto& b) { return a.first < b.first; });
-  std::string text = ranked[0].second;
-  for (size_t i = 1; i < 3 && ranked[i].first <= ranked[0].first + 1; ++i) text += std::string(", ") + ranked[i].second;
-  return text;
-}
-
 }  // namespace
 
 std::span<const CatalogueEntry> Catalogue() { return std::span(kEntries).subspan(1); }
@@ -67,7 +36,9 @@ std::string FormatName(VX_PixelFormat format) {
 VX_PixelFormat ParseFormat(const std::string& name) {
   for (const CatalogueEntry& entry : Catalogue())
     if (name == entry.name) return entry.format;
-  throw ToolError("unknown format \"" + name + "\"; did you mean " + NearestNames(name) +
+  std::vector<std::string> names;
+  for (const CatalogueEntry& entry : Catalogue()) names.push_back(entry.name);
+  throw ToolError("unknown format \"" + name + "\"; did you mean " + NearestNames(name, names) +
                   "? (\"vexel formats\" lists all)");
 }
 

@@ -21,6 +21,24 @@ void Export420(const Picture& picture, const AVFrame& frame) {
   }
 }
 
+// Writes `count` samples of a component: whole bytes, 16-bit words of either order, or 32-bit floats.
+void WriteComponent(const uint32_t* in, const AVPixFmtDescriptor& d, int component, int y, int count, AVFrame& frame) {
+  const AVComponentDescriptor& c = d.comp[component];
+  uint8_t* out = frame.data[c.plane] + static_cast<ptrdiff_t>(y) * frame.linesize[c.plane] + c.offset;
+  const bool bigEndian = d.flags & AV_PIX_FMT_FLAG_BE;
+  for (int x = 0; x < count; ++x, out += c.step) {
+    if (c.depth <= 8) {
+      *out = static_cast<uint8_t>(in[x]);
+    } else if (c.depth <= 16) {
+      const uint8_t low = static_cast<uint8_t>(in[x]), high = static_cast<uint8_t>(in[x] >> 8);
+      out[0] = bigEndian ? high : low;
+      out[1] = bigEndian ? low : high;
+    } else {
+      std::memcpy(out, &in[x], 4);
+    }
+  }
+}
+
 void ExportRows(const Picture& picture, const AVPixFmtDescriptor& d, bool fullRange, AVFrame& frame) {
   const SampleCoding coding{d.comp[0].depth, (d.flags & AV_PIX_FMT_FLAG_FLOAT) != 0, fullRange};
   const UnpackRow unpack = RowUnpackerFor(picture.Format());
@@ -30,7 +48,7 @@ void ExportRows(const Picture& picture, const AVPixFmtDescriptor& d, bool fullRa
     for (int c = 0; c < d.nb_components; ++c) {
       const bool chroma = c == 1 || c == 2;
       const int columns = chroma ? AV_CEIL_RSHIFT(picture.Width(), d.log2_chroma_w) : picture.Width();
-      av_write_image_line2(samples.components[c].data(), frame.data, frame.linesize, &d, 0, y, c, columns, 4);
+      WriteComponent(samples.components[c].data(), d, c, y, columns, frame);
     }
   }
 }

@@ -16,6 +16,9 @@
 //   linear-light float RGB (EXR)                     BGRX_4444_32f_Linear, BGRP_4444_32f_Linear (its alpha is
 //                                                    premultiplied)
 //
+// The library's 4:2:0 chroma is co-sited with every second column; that of JPEG pictures, which lies between the
+// columns, is taken as if it were.
+//
 // YUV formats end in _709 where the coding is BT.709. A frame that does not say is taken as BT.709 from 720 lines on
 // and as BT.601 below, as players do.
 #pragma once

@@ -1,10 +1,12 @@
-#include <clocale>
+#include <algorithm>
 #include <csignal>
 #include <exception>
 #include <iostream>
 #include <string>
+#include <vector>
 
 #include "commands.h"
+#include "nearest_name.h"
 #include "tool_error.h"
 #include "vexel/vexel.h"
 
@@ -17,6 +19,15 @@ void AddCommands(CLI::App& app) {
   tool::AddFormatsCommand(app);
   tool::AddInfoCommand(app);
   tool::AddConvertCommand(app);
+}
+
+// A word that is no command deserves better than "a command is required".
+std::string ExplainUsageError(const CLI::App& app, const CLI::ParseError& error, int argc, char** argv) {
+  if (argc < 2 || argv[1][0] == '-') return error.what();
+  std::vector<std::string> names;
+  for (const CLI::App* command : app.get_subcommands({})) names.push_back(command->get_name());
+  if (std::find(names.begin(), names.end(), argv[1]) != names.end()) return error.what();
+  return std::string("unknown command \"") + argv[1] + "\"; did you mean " + tool::NearestNames(argv[1], names) + "?";
 }
 
 struct Library {
@@ -39,7 +50,8 @@ int main(int argc, char** argv) {
   } catch (const CLI::Success& success) {
     return app.exit(success);
   } catch (const CLI::ParseError& error) {
-    std::cerr << "vexel: " << error.what() << "\nRun \"vexel --help\" or \"vexel COMMAND --help\" for usage.\n";
+    std::cerr << "vexel: " << ExplainUsageError(app, error, argc, argv)
+              << "\nRun \"vexel --help\" or \"vexel COMMAND --help\" for usage.\n";
     return kExitUsage;
   } catch (const tool::ToolError& error) {
     std::cerr << "vexel: " << error.what() << '\n';

@@ -1,6 +1,5 @@
 // Frames of pictures and video files, read by libavformat and libavcodec.
-#include <cstdio>
-#include <map>
+#include <string_view>
 
 extern "C" {
 #include <libavutil/pixdesc.h>
@@ -46,8 +45,11 @@ class StreamDecoder {
   bool Next(AVFrame* frame) {
     for (;;) {
       const int received = avcodec_receive_frame(mCodec.get(), frame);
-      if (received >= 0) return true;
-      if (received == AVERROR_EOF) return false;
+      if (received >= 0) return mFoundFrame = true;
+      if (received == AVERROR_EOF) {
+        if (!mFoundFrame) throw ToolError("cannot decode \"" + mPath + "\": it holds no whole frame" + TakeAvMessage());
+        return false;
+      }
       if (received != AVERROR(EAGAIN)) CheckAv(received, "cannot decode \"" + mPath + "\"");
       FeedPacket();
     }
@@ -78,6 +80,7 @@ class StreamDecoder {
   std::string mPath;
   Packet mPacket;
   CodecContext mCodec;
+  bool mFoundFrame = false;
 };
 
 int64_t FrameCountOf(const AVFormatContext* input, const AVStream* stream) {
@@ -132,13 +135,19 @@ std::string ColourOf(const AVFrame& frame) {
          (frame.interlaced_frame ? ", interlaced" : "");
 }
 
+// Single pictures and numbered ones; libav gives them a frame rate all the same.
+bool IsPictureFormat(const AVInputFormat* format) {
+  const std::string_view name = format->name;
+  return name == "image2" || name.ends_with("_pipe");
+}
+
 // The first frame tells what the decoder really gives. A stream that cannot be decoded is described all the same.
 void DescribeFirstFrame(const std::string& path, const SourceOptions& options, StreamDescription& description) {
   try {
     const InputContext input = OpenInput(path);
     StreamDecoder decoder(input.get(), description.index, options.threads, path);
     const Frame frame = NewFrame();
-    if (!decoder.Next(frame.get())) throw ToolError("it holds no frame");
+    decoder.Next(frame.get());
     description.width = frame->width;
     description.height = frame->height;
     description.fileFormat = NameOr(av_get_pix_fmt_name(static_cast<AVPixelFormat>(frame->format)), "unknown");
@@ -159,8 +168,9 @@ FileDescription DescribeFile(const std::string& path, const SourceOptions& optio
   if (path == "-") throw ToolError("info needs a file: it reads it more than once");
   const InputContext input = OpenInput(path);
   FileDescription file;
-  file.container = NameOr(input->iformat->long_name, input->iformat->name);
-  file.seconds = input->duration > 0 ? static_cast<double>(input->duration) / AV_TIME_BASE : 0;
+  const bool picture = IsPictureFormat(input->iformat);
+  file.container = picture ? "picture" : NameOr(input->iformat->long_name, input->iformat->name);
+  file.seconds = input->duration > 0 && !picture ? static_cast<double>(input->duration) / AV_TIME_BASE : 0;
   for (unsigned i = 0; i < input->nb_streams; ++i) {
     const AVStream* stream = input->streams[i];
     StreamDescription description;
@@ -168,7 +178,7 @@ FileDescription DescribeFile(const std::string& path, const SourceOptions& optio
     description.kind = NameOr(av_get_media_type_string(stream->codecpar->codec_type), "data");
     description.codec = avcodec_get_name(stream->codecpar->codec_id);
     if (stream->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
-      description.frameRate = stream->avg_frame_rate.den ? av_q2d(stream->avg_frame_rate) : 0;
+      description.frameRate = stream->avg_frame_rate.den && !picture ? av_q2d(stream->avg_frame_rate) : 0;
       description.frameCount = FrameCountOf(input.get(), stream);
       DescribeFirstFrame(path, options, description);
     }

@@ -163,20 +163,17 @@ void Unpack422_32f(const std::byte* row, VX_PixelFormat format, const SampleCodi
 
 // ---- 10-bit words -------------------------------------------------------------------------------------------------
 
-// V210: three samples to a word, lowest bits first, in the order U Y V Y; six pixels are four words.
+// V210: three samples to a word, lowest bits first, in the order U Y V Y; six pixels are four words. What the last
+// group has no pixels for is 0.
 void PackV210(const SampleRow& samples, const SampleCoding&, VX_PixelFormat, std::byte* row, int width) {
   const uint32_t* y = samples.components[0].data();
-  const int pairs = (width + 1) / 2;
-  uint32_t group[12];
   for (int x = 0, word = 0; x < width; x += 6, word += 4) {
-    for (int pair = 0; pair < 3; ++pair) {
-      const int p = x / 2 + pair;
-      const int chroma = std::min(p, pairs - 1), first = std::min(2 * p, width - 1),
-                second = std::min(2 * p + 1, width - 1);
-      group[4 * pair] = samples.components[1][chroma];
-      group[4 * pair + 1] = y[first];
-      group[4 * pair + 2] = samples.components[2][chroma];
-      group[4 * pair + 3] = y[second];
+    uint32_t group[12] = {};
+    for (int i = 0; i < 6 && x + i < width; i += 2) {
+      group[2 * i] = samples.components[1][(x + i) / 2];
+      group[2 * i + 1] = y[x + i];
+      group[2 * i + 2] = samples.components[2][(x + i) / 2];
+      group[2 * i + 3] = x + i + 1 < width ? y[x + i + 1] : 0;
     }
     for (int i = 0; i < 4; ++i)
       StoreWord(row, static_cast<size_t>(word + i), group[3 * i] | group[3 * i + 1] << 10 | group[3 * i + 2] << 20);

@@ -65,10 +65,7 @@ struct Y4mCoding {
 };
 
 Y4mCoding Y4mCodingOf(VX_PixelFormat format) {
-  if (Is420(format)) {
-    const bool mpeg2Siting = true;  // co-sited columns in both families
-    return {mpeg2Siting ? "420mpeg2" : "420jpeg", AV_PIX_FMT_YUV420P};
-  }
+  if (Is420(format)) return {"420mpeg2", AV_PIX_FMT_YUV420P};  // chroma is co-sited with every second column
   if (IsV210(format)) return {"422p10", AV_PIX_FMT_YUV422P10LE};
   if (IsPacked422(format)) return {"422", AV_PIX_FMT_YUV422P};
   if (IsFloat(format)) return {"444p16", AV_PIX_FMT_YUV444P16LE};

@@ -1,0 +1,40 @@
+#include "nearest_name.h"
+
+#include <algorithm>
+#include <cctype>
+#include <numeric>
+
+namespace tool {
+namespace {
+
+// The number of insertions, deletions and replacements that turn one text into the other, ignoring case.
+int EditDistance(const std::string& a, const std::string& b) {
+  std::vector<int> row(b.size() + 1);
+  std::iota(row.begin(), row.end(), 0);
+  for (size_t i = 0; i < a.size(); ++i) {
+    int diagonal = row[0];
+    row[0] = static_cast<int>(i) + 1;
+    for (size_t j = 0; j < b.size(); ++j) {
+      const bool same =
+          std::tolower(static_cast<unsigned char>(a[i])) == std::tolower(static_cast<unsigned char>(b[j]));
+      const int replaced = diagonal + (same ? 0 : 1);
+      diagonal = row[j + 1];
+      row[j + 1] = std::min({replaced, row[j] + 1, diagonal + 1});
+    }
+  }
+  return row.back();
+}
+
+}  // namespace
+
+std::string NearestNames(const std::string& name, const std::vector<std::string>& names) {
+  std::vector<std::pair<int, std::string>> ranked;
+  for (const std::string& candidate : names) ranked.emplace_back(EditDistance(name, candidate), candidate);
+  std::stable_sort(ranked.begin(), ranked.end(), [](auto& a, auto& b) { return a.first < b.first; });
+  std::string text = ranked.at(0).second;
+  for (size_t i = 1; i < std::min<size_t>(3, ranked.size()) && ranked[i].first <= ranked[0].first + 1; ++i)
+    text += ", " + ranked[i].second;
+  return text;
+}
+
+}  // namespace tool

@@ -1,0 +1,12 @@
+// Suggestions for mistyped names.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace tool {
+
+// The few of `names` that are nearest to `name` by edit distance, ignoring case, best first: "a, b, c".
+std::string NearestNames(const std::string& name, const std::vector<std::string>& names);
+
+}  // namespace tool
