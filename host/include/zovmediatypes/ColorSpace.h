@@ -14,7 +14,11 @@ struct ColorSpace {
   bool mIsFullRange;
   bool mIsRGB;
 
-  friend constexpr bool operator==(const ColorSpace&, const ColorSpace&) = default;
+  friend constexpr bool operator==(const ColorSpace& a, const ColorSpace& b) {
+    return a.mPrimaries == b.mPrimaries && a.mTransfer == b.mTransfer && a.mMatrix == b.mMatrix &&
+           a.mBitDepth == b.mBitDepth && a.mIsFullRange == b.mIsFullRange && a.mIsRGB == b.mIsRGB;
+  }
+  friend constexpr bool operator!=(const ColorSpace& a, const ColorSpace& b) { return !(a == b); }
 };
 
 }  // namespace zovmediatypes::color

@@ -14,7 +14,10 @@ struct PixelFormat {
   uint32_t mFirst;
   uint32_t mSecond;
 
-  friend constexpr bool operator==(const PixelFormat&, const PixelFormat&) = default;
+  friend constexpr bool operator==(const PixelFormat& a, const PixelFormat& b) {
+    return a.mFirst == b.mFirst && a.mSecond == b.mSecond;
+  }
+  friend constexpr bool operator!=(const PixelFormat& a, const PixelFormat& b) { return !(a == b); }
 };
 
 namespace detail {
