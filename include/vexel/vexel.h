@@ -184,6 +184,20 @@ VX_API VX_Result VX_CopyBiPlanar_8u(const void* const srcPlanes[2], const int32_
 
 /* ---- Transpose and rotation -------------------------------------------------------------------------------------- */
 
+/* Mirrors about the main diagonal: destination element (row x, column y) = source element (row y, column x). `width` and
+ * `height` describe the source; the destination has `height` elements per row and `width` rows. Elements have 1 to 16
+ * bytes, any other size is VX_ErrUnsupportedFormat; strides are rounded toward zero to whole elements. The areas must not
+ * overlap. A size below 1 does nothing. */
+VX_API VX_Result VX_Transpose(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes, int32_t width,
+                              int32_t height, uint8_t elementSize) VX_NOEXCEPT;
+/* Rotates stored rows by a multiple of 90 degrees: for 90 the destination's first stored row is the source's last column
+ * read from its first row on. Angles 0, +-90, +-180, +-270, others are VX_ErrFormatNotHandled. `flip` reads the source from
+ * its last row first. 4:4:4:4 formats with a fourth channel only, others are VX_ErrUnsupportedFormat. `width` and `height`
+ * describe the source. Every pixel is copied bit for bit; the areas must not overlap. */
+VX_API VX_Result VX_RotateImageAndFlip(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
+                                       int32_t width, int32_t height, VX_PixelFormat format, int32_t angle,
+                                       bool flip) VX_NOEXCEPT;
+
 #ifdef __cplusplus
 } /* extern "C" */
 #endif

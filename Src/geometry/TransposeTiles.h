@@ -1,0 +1,23 @@
+// Transposes square tiles of 64 bytes by 64 bytes' worth of elements, which stay in registers and whole cache lines.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "frame/KernelVariant.h"
+
+namespace vexel {
+
+inline constexpr int kTileBytes = 64;
+
+// One full tile of kTileBytes / size elements each way.
+using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes);
+
+// For element sizes 1, 2, 4, 8 and 16; index is the logarithm of the size.
+extern const KernelVariants<TransposeTile> kTransposeTiles[5];
+
+// Reverses the order of `count` pixels of 4, 8 or 16 bytes; index is the logarithm of the size less 2.
+using ReversePixels = void (*)(const uint8_t* src, uint8_t* dst, size_t count);
+extern const KernelVariants<ReversePixels> kReversePixels[3];
+
+}  // namespace vexel
