@@ -15,6 +15,9 @@ inline constexpr YuvMatrix kBt601 = {0.5,   -0.418688, -0.081312, -0.168736, -0.
                                      0.587, 0.114,     1.772,     -0.344136, -0.714136, 1.402};
 inline constexpr YuvMatrix kBt709 = {0.5,    -0.454153, -0.045847, -0.114572,   -0.385428,   0.5,   0.2126,
                                      0.7152, 0.0722,    1.8556,    -0.18732427, -0.46812427, 1.5748};
+// Non-constant luminance.
+inline constexpr YuvMatrix kBt2020 = {0.5,    -0.459786, -0.040214, -0.139630,   -0.360370,   0.5,   0.2627,
+                                      0.6780, 0.0593,    1.8814,    -0.16455313, -0.57135313, 1.4746};
 
 // Y'CbCr of one colorimetry to that of another: the product of the two matrices. Every row of a matrix that makes
 // chroma sums to 0 and that of luma to 1, so the luma column is (0, 0, 1): grey stays what it is.

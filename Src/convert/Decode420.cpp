@@ -1,0 +1,159 @@
+// Decoding of whole 4:2:0 pictures into rasters.
+#include "convert/Decode420.h"
+
+#include <algorithm>
+#include <sstream>
+
+#include "convert/RowConverter.h"
+#include "frame/FpModeGuard.h"
+#include "frame/Scratch.h"
+#include "frame/StreamCopy.h"
+#include "frame/Trace.h"
+#include "vexel/host_types.h"
+
+namespace vexel {
+namespace {
+
+// A raster by its top line.
+struct TopDown {
+  uint8_t* top;
+  ptrdiff_t rowBytes;
+  int32_t width, height;
+  VX_PixelFormat format;
+};
+
+// Pixels decoded at a time on the way past the cache: with the samples they are made of they stay in the first level.
+constexpr int32_t kStreamPixels = 1024;
+static_assert(kStreamPixels % 2 == 0);
+
+bool GoesPastCache(const TopDown& dst) noexcept {
+  const uint32_t cache = VX_GetCacheSize();
+  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= static_cast<int64_t>(cache / 2);
+}
+
+// What the decoder makes for a destination: its own format if it can, else one on the way that loses least. 8-bit RGB
+// is best made in one step; anything else takes the format that the plan names, which keeps whiter than white.
+VX_PixelFormat WorkingFormat(VX_PixelFormat src, VX_PixelFormat dst) noexcept {
+  if (Rows420::CanMake(dst)) return dst;
+  if (!IsYuv(dst) && Layout(dst) == kLayout4444 && Depth(dst) == kDepth8u) return VX_PixelFormat::BGRX_4444_8u;
+  return PlanDecode420(src, 0, 0, dst, 0, 0, 0).format;
+}
+
+void TraceFullSize(const Picture420& src) noexcept try {
+  static TraceSite site("Vexel", 5);
+  if (!site.Enabled()) return;
+  constexpr const char* kFunction = "<unnamed>::ConvertFromYUV_420_8u_full";
+  std::ostringstream text;
+  text << kFunction << ": inSrcWidth =" << src.width << ", inSrcHeight =" << src.height
+       << ", inSrcRowBytes[3]:" << src.rowBytes[0] << " " << src.rowBytes[1] << " " << src.rowBytes[2];
+  site.Line(text.str());
+  // The rows are made with 8 bits: what a deeper destination could hold of the rest is dropped.
+  if (HasWideSamples(src.format)) site.Line(std::string(kFunction) + ": TODO for BiPlanar 10u");
+} catch (...) {
+  // no memory for the text
+}
+
+VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
+  for (int i = 0; i < (IsBiplanar(src.format) ? 2 : 3); ++i)
+    if (!src.planes[i]) return VX_ErrNullSource;
+  return dst ? VX_Success : VX_ErrNullDestination;
+}
+
+// Rows straight into the destination's memory, or by way of the cache past it.
+void WriteRows(Rows420& rows, const TopDown& dst, uint8_t* staging) noexcept {
+  const KernelVariant variant = ActiveKernelVariant();
+  for (int32_t y = 0; y < dst.height; ++y) {
+    uint8_t* const row = dst.top + y * dst.rowBytes;
+    rows.BeginRow(y);
+    if (!staging) {
+      rows.Pixels(0, dst.width, row);
+      continue;
+    }
+    for (int32_t x = 0; x < dst.width; x += kStreamPixels) {
+      const int32_t count = std::min(kStreamPixels, dst.width - x);
+      rows.Pixels(x, count, staging);
+      StreamCopy(row + ptrdiff_t{4} * x, staging, static_cast<size_t>(count) * 4, variant);
+    }
+  }
+}
+
+void ConvertRows(Rows420& rows, const TopDown& dst, const RowConverter& converter, uint8_t* decoded) noexcept {
+  for (int32_t y = 0; y < dst.height; ++y) {
+    rows.BeginRow(y);
+    rows.Pixels(0, dst.width, decoded);
+    converter.Convert(decoded, dst.top + y * dst.rowBytes);
+  }
+}
+
+VX_Result Decode(const Picture420& src, const TopDown& dst, int32_t field, int32_t quality) noexcept {
+  const uint32_t depth = Depth(src.format);
+  if (!Is420(src.format) || (depth != kDepth8u && depth != kDepth10u)) return VX_ErrUnsupportedFormat;
+  if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
+  const VX_PixelFormat working = WorkingFormat(src.format, dst.format);
+  Rows420 rows;
+  if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) return result;
+  RowConverter converter;
+  const bool converts = working != dst.format;
+  if (converts)
+    if (const VX_Result result = converter.Prepare(working, dst.format, quality, dst.width)) return result;
+  if (dst.width < 1 || dst.height < 1) return VX_Success;
+  if (const VX_Result result = CheckPlanes(src, dst.top)) return result;
+
+  const bool streams = GoesPastCache(dst);
+  if (streams && converts) converter.StreamOutput();
+  const auto pad = [](size_t bytes) { return (bytes + 63) & ~size_t{63}; };
+  const size_t rowsBytes = pad(rows.ScratchBytes()), converterBytes = converts ? pad(converter.ScratchBytes()) : 0;
+  const size_t pixels = converts ? static_cast<size_t>(dst.width) : streams ? kStreamPixels : 0;
+  VX_SCRATCH(scratch, rowsBytes + converterBytes + pixels * 4);
+  if (!scratch) return VX_ErrOutOfMemory;
+  rows.UseScratch(scratch.get());
+  uint8_t* const decoded = scratch.get() + rowsBytes + converterBytes;
+
+  if (dst.width == src.width && dst.height == src.height) TraceFullSize(src);
+  if (converts) {
+    converter.UseScratch(scratch.get() + rowsBytes);
+    ConvertRows(rows, dst, converter, decoded);
+  } else {
+    WriteRows(rows, dst, streams ? decoded : nullptr);
+  }
+  if (streams) StreamFence();
+  return VX_Success;
+}
+
+}  // namespace
+
+VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t srcWidth, int32_t srcHeight, void* dst,
+                    int32_t dstRowBytes, int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat, int32_t field,
+                    int32_t quality) noexcept {
+  if (!src && Is420(srcFormat) && !IsSpecial(dstFormat)) return VX_ErrNullSource;
+  TopDown raster{static_cast<uint8_t*>(dst), dstRowBytes, dstWidth, dstHeight, dstFormat};
+  if (dst && VX_IsOriginBottomLeft(dstFormat)) {
+    raster.top += (ptrdiff_t{dstHeight} - 1) * dstRowBytes;
+    raster.rowBytes = -raster.rowBytes;
+  }
+  return Decode(PictureFromBlock(src, srcFormat, srcWidth, srcHeight), raster, field, quality);
+}
+
+VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t width, int32_t height, void* dst,
+                    int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t quality) noexcept {
+  return Decode420(src, srcFormat, width, height, dst, dstRowBytes, width, height, dstFormat, 0, quality);
+}
+
+}  // namespace vexel
+
+VX_Result VX::DecompressYUV_420_8u(const void* const* srcPlanes, const int32_t* srcRowBytes, int32_t srcWidth,
+                                   int32_t srcHeight, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
+                                   int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat,
+                                   zovmediatypes::FieldType field, zovmediatypes::RenderQuality quality) noexcept {
+  using namespace vexel;
+  const FpModeGuard fpMode;
+  Picture420 picture{{}, {}, srcWidth, srcHeight, srcFormat};
+  const int planes = !Is420(srcFormat) ? 0 : IsBiplanar(srcFormat) ? 2 : 3;
+  if (srcPlanes && srcRowBytes)
+    for (int i = 0; i < planes; ++i) {
+      picture.planes[i] = static_cast<const uint8_t*>(srcPlanes[i]);
+      picture.rowBytes[i] = srcRowBytes[i];
+    }
+  return Decode(picture, {static_cast<uint8_t*>(dst), dstRowBytes, dstWidth, dstHeight, dstFormat},
+                static_cast<int32_t>(field), static_cast<int32_t>(quality));
+}

@@ -1,0 +1,63 @@
+// The stages of 4:2:0 decoding. Between them samples are 16-bit, 8-bit codes times 256 (65,280 = 255), so that 10-bit
+// words in the top bits fit in as they are, and fractions survive until the one rounding at the end.
+//
+// Rows between stages are scratch memory of kRowSlack samples more than they hold on either side: kernels read and
+// write whole vectors there. Rows of pictures are read and written exactly.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "frame/KernelVariant.h"
+
+namespace vexel::decode420 {
+
+inline constexpr size_t kRowSlack = 128;
+
+// Weighted sums of two picture rows: out = weightA a + weightB b, or added to what `out` holds. All weights that meet
+// in one output row total kMixTotal8 or kMixTotal10 (10-bit words; their low six bits are not read).
+inline constexpr uint32_t kMixTotal8 = 256, kMixTotal10 = 64;
+struct MixRows {
+  const uint8_t *a, *b;
+  uint32_t weightA, weightB;
+  bool add;
+};
+using MixSamples = void (*)(const MixRows& rows, uint16_t* out, uint16_t* outSecond, size_t count);
+extern const KernelVariants<MixSamples> kMixPlane8, kMixPlane10;  // samples one after another, all into `out`
+extern const KernelVariants<MixSamples> kMixPairs8, kMixPairs10;  // `count` pairs of samples, taken apart
+
+// Sums of any number of rows: weights of 16 fraction bits that total 65,536. `first` starts a new sum.
+using AddWeighted = void (*)(const uint16_t* row, uint32_t weight, bool first, uint32_t* sums, size_t count);
+using FinishSums = void (*)(const uint32_t* sums, uint16_t* out, size_t count);
+extern const KernelVariants<AddWeighted> kAddWeighted;
+extern const KernelVariants<FinishSums> kFinishSums;
+
+// Row to row, out == in allowed for the first two. `count` is the number of samples written.
+using ResampleRow = void (*)(const uint16_t* in, uint16_t* out, size_t count);
+extern const KernelVariants<ResampleRow> kHalveRow;       // means of pairs
+extern const KernelVariants<ResampleRow> kMeanOfPairs;    // (3 c[i] + c[i + 1]) / 4: co-sited samples at pair centres
+extern const KernelVariants<ResampleRow> kDoubleNearest;  // c[i] twice
+extern const KernelVariants<ResampleRow> kDoubleLinear;   // c[i], then the mean of c[i] and c[i + 1]
+extern const KernelVariants<ResampleRow>
+    kFourThirds;  // bicubic, pixel centres aligned; reads 2 samples beyond the ends
+extern const KernelVariants<ResampleRow> kThreeHalves;  // the same
+
+// Luma code, chroma code - 128 -> three channels of a pixel in memory order (B, G, R or V, U, Y), each rounded and
+// clamped to 0..255. Factors are scaled for the kernels' fixed point (Decode420Rows.cpp).
+struct Matrix {
+  int16_t luma;          // the same for all channels that have luma: B, G and R, or Y
+  int16_t lumaBias;      // with half a unit for rounding
+  int16_t chroma[3][2];  // of each channel, for (U, V)
+};
+
+// `count` pixels from samples at the pixels' resolution ("Full") or chroma at half of it, interpolated or nearest. The
+// fourth channel is written opaque. `y` is bytes, or 16-bit samples ("Wide", "Full"); interpolation reads one chroma
+// sample more than there are pairs.
+using MakePixels = void (*)(const void* y, const uint16_t* u, const uint16_t* v, const Matrix& matrix, uint8_t* dst,
+                            size_t count);
+struct PixelKernels {
+  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full;
+};
+extern const PixelKernels kToBgrx, kToVuyx;
+
+}  // namespace vexel::decode420

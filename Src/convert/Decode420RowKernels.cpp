@@ -1,0 +1,303 @@
+// Sums, means and resampling of rows of 4:2:0 samples.
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+
+#include "convert/Decode420Kernels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "convert/Decode420RowKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "convert/PixelVectors-inl.h"
+#include "frame/KernelTable.h"
+
+#ifndef VEXEL_CONVERT_DECODE420ROWKERNELS_TAPS
+#define VEXEL_CONVERT_DECODE420ROWKERNELS_TAPS
+namespace vexel::decode420 {
+namespace {
+
+// Catmull-Rom weights of the four samples about a position `phase` past the second, in 1/32768; they total 32768.
+struct CubicTaps {
+  int16_t w[4];
+};
+constexpr int16_t RoundWeight(double weight) {
+  return static_cast<int16_t>(weight * 32768 + (weight < 0 ? -0.5 : 0.5));
+}
+constexpr CubicTaps CatmullRom(double t) {
+  const int16_t before = RoundWeight(t * (-0.5 + t * (1 - 0.5 * t)));
+  const int16_t first = RoundWeight(1 + t * t * (-2.5 + 1.5 * t));
+  const int16_t after = RoundWeight(t * t * (-0.5 + 0.5 * t));
+  return {{before, first, static_cast<int16_t>(32768 - before - first - after), after}};
+}
+
+// Output sample o of a group lies at (o + 0.5) in / out - 0.5; `start` is the first of its four input samples.
+struct CubicPhase {
+  int start;
+  CubicTaps taps;
+};
+inline constexpr CubicPhase kFourThirdsPhases[4] = {
+    {-2, CatmullRom(7 / 8.0)}, {-1, CatmullRom(5 / 8.0)}, {0, CatmullRom(3 / 8.0)}, {1, CatmullRom(1 / 8.0)}};
+inline constexpr CubicPhase kThreeHalvesPhases[3] = {
+    {-2, CatmullRom(5 / 6.0)}, {-1, CatmullRom(1 / 2.0)}, {0, CatmullRom(1 / 6.0)}};
+
+}  // namespace
+}  // namespace vexel::decode420
+#endif
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel::decode420 {
+namespace HWY_NAMESPACE {
+namespace {
+using namespace vexel::HWY_NAMESPACE;
+
+constexpr size_t kN = kLanes<uint16_t>;
+
+HWY_INLINE U16 Load(const uint16_t* p) { return hn::LoadU(hn::ScalableTag<uint16_t>(), p); }
+HWY_INLINE void Store(U16 v, uint16_t* p) { hn::StoreU(v, hn::ScalableTag<uint16_t>(), p); }
+HWY_INLINE U16 Set(uint32_t value) { return hn::Set(hn::ScalableTag<uint16_t>(), static_cast<uint16_t>(value)); }
+
+// Calls body(a, b, i) for each vector of outputs; the last one gets its input from padded copies of the rows' ends.
+template <size_t kBytes, class Body>
+HWY_INLINE void MixLoop(const MixRows& rows, size_t count, const Body& body) {
+  size_t i = 0;
+  for (; i + kN <= count; i += kN) body(rows.a + i * kBytes, rows.b + i * kBytes, i);
+  if (const size_t rest = count - i) {
+    alignas(64) uint8_t a[kN * kBytes] = {};
+    alignas(64) uint8_t b[kN * kBytes] = {};
+    std::memcpy(a, rows.a + i * kBytes, rest * kBytes);
+    std::memcpy(b, rows.b + i * kBytes, rest * kBytes);
+    body(a, b, i);
+  }
+}
+
+struct Mixer {
+  U16 weightA, weightB;
+  bool add;
+  explicit HWY_INLINE Mixer(const MixRows& rows)
+      : weightA(Set(rows.weightA)), weightB(Set(rows.weightB)), add(rows.add) {}
+  HWY_INLINE void operator()(U16 a, U16 b, uint16_t* out) const {
+    U16 sum = hn::Add(hn::Mul(a, weightA), hn::Mul(b, weightB));
+    if (add) sum = hn::Add(sum, Load(out));
+    Store(sum, out);
+  }
+};
+
+HWY_INLINE U16 LowBytes(U16 v) { return hn::And(v, Set(255)); }
+
+void MixPlane8(const MixRows& rows, uint16_t* out, uint16_t*, size_t count) {
+  const Mixer mix(rows);
+  MixLoop<1>(rows, count, [&](const uint8_t* a, const uint8_t* b, size_t i) HWY_ATTR {
+    mix(LoadPromoted<uint16_t, uint8_t>(a), LoadPromoted<uint16_t, uint8_t>(b), out + i);
+  });
+}
+
+void MixPlane10(const MixRows& rows, uint16_t* out, uint16_t*, size_t count) {
+  const Mixer mix(rows);
+  MixLoop<2>(rows, count, [&](const uint8_t* a, const uint8_t* b, size_t i) HWY_ATTR {
+    mix(hn::ShiftRight<6>(LoadVector<uint16_t>(a)), hn::ShiftRight<6>(LoadVector<uint16_t>(b)), out + i);
+  });
+}
+
+void MixPairs8(const MixRows& rows, uint16_t* outFirst, uint16_t* outSecond, size_t count) {
+  const Mixer mix(rows);
+  MixLoop<2>(rows, count, [&](const uint8_t* a, const uint8_t* b, size_t i) HWY_ATTR {
+    const U16 pairsA = LoadVector<uint16_t>(a), pairsB = LoadVector<uint16_t>(b);
+    mix(LowBytes(pairsA), LowBytes(pairsB), outFirst + i);
+    mix(hn::ShiftRight<8>(pairsA), hn::ShiftRight<8>(pairsB), outSecond + i);
+  });
+}
+
+void MixPairs10(const MixRows& rows, uint16_t* outFirst, uint16_t* outSecond, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  const Mixer mix(rows);
+  MixLoop<4>(rows, count, [&](const uint8_t* a, const uint8_t* b, size_t i) HWY_ATTR {
+    const U16 a0 = LoadVector<uint16_t>(a, 0), a1 = LoadVector<uint16_t>(a, 1);
+    const U16 b0 = LoadVector<uint16_t>(b, 0), b1 = LoadVector<uint16_t>(b, 1);
+    mix(hn::ShiftRight<6>(hn::ConcatEven(d, a1, a0)), hn::ShiftRight<6>(hn::ConcatEven(d, b1, b0)), outFirst + i);
+    mix(hn::ShiftRight<6>(hn::ConcatOdd(d, a1, a0)), hn::ShiftRight<6>(hn::ConcatOdd(d, b1, b0)), outSecond + i);
+  });
+}
+
+void AddWeighted(const uint16_t* row, uint32_t weight, bool first, uint32_t* sums, size_t count) {
+  const hn::ScalableTag<uint32_t> d;
+  const hn::Rebind<uint16_t, decltype(d)> d16;
+  const U32 w = hn::Set(d, weight);
+  for (size_t i = 0; i < count; i += kLanes<uint32_t>) {
+    const U32 sum = first ? hn::Set(d, 0x8000) : hn::LoadU(d, sums + i);
+    hn::StoreU(hn::Add(sum, hn::Mul(hn::PromoteTo(d, hn::LoadU(d16, row + i)), w)), d, sums + i);
+  }
+}
+
+void FinishSums(const uint32_t* sums, uint16_t* out, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  const hn::ScalableTag<uint32_t> d32;
+  for (size_t i = 0; i < count; i += kN) {
+    const U16 low = hn::BitCast(d, hn::LoadU(d32, sums + i));
+    const U16 high = hn::BitCast(d, hn::LoadU(d32, sums + i + kLanes<uint32_t>));
+    Store(hn::ConcatOdd(d, high, low), out + i);
+  }
+}
+
+void HalveRow(const uint16_t* in, uint16_t* out, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  for (size_t i = 0; i < count; i += kN) {
+    const U16 low = Load(in + 2 * i), high = Load(in + 2 * i + kN);
+    Store(hn::AverageRound(hn::ConcatEven(d, high, low), hn::ConcatOdd(d, high, low)), out + i);
+  }
+}
+
+void MeanOfPairs(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; i += kN) {
+    const U16 sample = Load(in + i);
+    Store(hn::AverageRound(sample, hn::AverageRound(sample, Load(in + i + 1))), out + i);
+  }
+}
+
+template <bool kLinear>
+HWY_INLINE void Double(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; 2 * i < count; i += kN) {
+    const U16 even = Load(in + i);
+    const U16 odd = kLinear ? hn::AverageRound(even, Load(in + i + 1)) : even;
+    hn::StoreInterleaved2(even, odd, hn::ScalableTag<uint16_t>(), out + 2 * i);
+  }
+}
+void DoubleNearest(const uint16_t* in, uint16_t* out, size_t count) { Double<false>(in, out, count); }
+void DoubleLinear(const uint16_t* in, uint16_t* out, size_t count) { Double<true>(in, out, count); }
+
+// Samples lose their lowest bit here: the products need a sign.
+HWY_INLINE I16 ToSigned(U16 v) { return hn::BitCast(hn::ScalableTag<int16_t>(), hn::ShiftRight<1>(v)); }
+
+// The outer pairs are summed first, so that saturation only ever meets the result. `s` begins at input sample -3 or -2.
+template <class Samples>
+HWY_INLINE U16 Cubic(const Samples& s, const CubicPhase& phase, int firstSample) {
+  const hn::ScalableTag<int16_t> d;
+  I16 terms[4];
+  for (int k = 0; k < 4; ++k)
+    terms[k] = hn::MulFixedPoint15(s[phase.start + k - firstSample], hn::Set(d, phase.taps.w[k]));
+  const I16 sum = hn::SaturatedAdd(hn::Add(terms[0], terms[1]), hn::Add(terms[2], terms[3]));
+  return hn::ShiftLeft<1>(hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Max(sum, hn::Zero(d))));
+}
+
+void FourThirds(const uint16_t* in, uint16_t* out, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  for (size_t group = 0; 4 * group < count; group += kN) {
+    I16 s[9];
+    for (int k = 0; k < 3; ++k) {
+      U16 a, b, c;
+      hn::LoadInterleaved3(d, in + 3 * group + 3 * k - 3, a, b, c);
+      s[3 * k] = ToSigned(a), s[3 * k + 1] = ToSigned(b), s[3 * k + 2] = ToSigned(c);
+    }
+    const auto& phases = kFourThirdsPhases;
+    hn::StoreInterleaved4(Cubic(s, phases[0], -3), Cubic(s, phases[1], -3), Cubic(s, phases[2], -3),
+                          Cubic(s, phases[3], -3), d, out + 4 * group);
+  }
+}
+
+void ThreeHalves(const uint16_t* in, uint16_t* out, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  for (size_t group = 0; 3 * group < count; group += kN) {
+    I16 s[6];
+    for (int k = 0; k < 3; ++k) {
+      U16 a, b;
+      hn::LoadInterleaved2(d, in + 2 * group + 2 * k - 2, a, b);
+      s[2 * k] = ToSigned(a), s[2 * k + 1] = ToSigned(b);
+    }
+    const auto& phases = kThreeHalvesPhases;
+    hn::StoreInterleaved3(Cubic(s, phases[0], -2), Cubic(s, phases[1], -2), Cubic(s, phases[2], -2), d,
+                          out + 3 * group);
+  }
+}
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel::decode420
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#if HWY_ONCE
+namespace vexel::decode420 {
+namespace plain {
+namespace {
+
+uint32_t Byte(const uint8_t* row, size_t i) { return row[i]; }
+uint32_t Code10(const uint8_t* row, size_t i) { return (row[2 * i] | uint32_t{row[2 * i + 1]} << 8) >> 6; }
+
+// Every `step`-th sample from `first` on.
+template <uint32_t (&kSample)(const uint8_t*, size_t)>
+void Mix(const MixRows& rows, size_t first, size_t step, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    const size_t at = first + step * i;
+    const uint32_t sum = rows.weightA * kSample(rows.a, at) + rows.weightB * kSample(rows.b, at);
+    out[i] = static_cast<uint16_t>(rows.add ? out[i] + sum : sum);
+  }
+}
+
+void MixPlane8(const MixRows& rows, uint16_t* out, uint16_t*, size_t count) { Mix<Byte>(rows, 0, 1, out, count); }
+void MixPlane10(const MixRows& rows, uint16_t* out, uint16_t*, size_t count) { Mix<Code10>(rows, 0, 1, out, count); }
+void MixPairs8(const MixRows& rows, uint16_t* outFirst, uint16_t* outSecond, size_t count) {
+  Mix<Byte>(rows, 0, 2, outFirst, count);
+  Mix<Byte>(rows, 1, 2, outSecond, count);
+}
+void MixPairs10(const MixRows& rows, uint16_t* outFirst, uint16_t* outSecond, size_t count) {
+  Mix<Code10>(rows, 0, 2, outFirst, count);
+  Mix<Code10>(rows, 1, 2, outSecond, count);
+}
+
+void AddWeighted(const uint16_t* row, uint32_t weight, bool first, uint32_t* sums, size_t count) {
+  for (size_t i = 0; i < count; ++i) sums[i] = (first ? 0x8000 : sums[i]) + row[i] * weight;
+}
+void FinishSums(const uint32_t* sums, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) out[i] = static_cast<uint16_t>(sums[i] >> 16);
+}
+
+uint16_t Mean(uint32_t a, uint32_t b) { return static_cast<uint16_t>((a + b + 1) >> 1); }
+
+void HalveRow(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) out[i] = Mean(in[2 * i], in[2 * i + 1]);
+}
+void MeanOfPairs(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) out[i] = Mean(in[i], Mean(in[i], in[i + 1]));
+}
+void DoubleNearest(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) out[i] = in[i / 2];
+}
+void DoubleLinear(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i) out[i] = i % 2 == 0 ? in[i / 2] : Mean(in[i / 2], in[i / 2 + 1]);
+}
+
+// Products rounded to samples of 15 bits, then a sum that saturates at both ends.
+uint16_t Cubic(const uint16_t* in, const CubicTaps& taps) {
+  int32_t sum = 0;
+  for (int k = 0; k < 4; ++k) sum += ((in[k] >> 1) * taps.w[k] + 0x4000) >> 15;
+  return static_cast<uint16_t>(2 * (sum < 0 ? 0 : sum > INT16_MAX ? INT16_MAX : sum));
+}
+void FourThirds(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i)
+    out[i] = Cubic(in + i / 4 * 3 + kFourThirdsPhases[i % 4].start, kFourThirdsPhases[i % 4].taps);
+}
+void ThreeHalves(const uint16_t* in, uint16_t* out, size_t count) {
+  for (size_t i = 0; i < count; ++i)
+    out[i] = Cubic(in + i / 3 * 2 + kThreeHalvesPhases[i % 3].start, kThreeHalvesPhases[i % 3].taps);
+}
+
+}  // namespace
+}  // namespace plain
+
+const KernelVariants<MixSamples> kMixPlane8 = VX_KERNEL_VARIANTS(MixPlane8);
+const KernelVariants<MixSamples> kMixPlane10 = VX_KERNEL_VARIANTS(MixPlane10);
+const KernelVariants<MixSamples> kMixPairs8 = VX_KERNEL_VARIANTS(MixPairs8);
+const KernelVariants<MixSamples> kMixPairs10 = VX_KERNEL_VARIANTS(MixPairs10);
+const KernelVariants<AddWeighted> kAddWeighted = VX_KERNEL_VARIANTS(AddWeighted);
+const KernelVariants<FinishSums> kFinishSums = VX_KERNEL_VARIANTS(FinishSums);
+const KernelVariants<ResampleRow> kHalveRow = VX_KERNEL_VARIANTS(HalveRow);
+const KernelVariants<ResampleRow> kMeanOfPairs = VX_KERNEL_VARIANTS(MeanOfPairs);
+const KernelVariants<ResampleRow> kDoubleNearest = VX_KERNEL_VARIANTS(DoubleNearest);
+const KernelVariants<ResampleRow> kDoubleLinear = VX_KERNEL_VARIANTS(DoubleLinear);
+const KernelVariants<ResampleRow> kFourThirds = VX_KERNEL_VARIANTS(FourThirds);
+const KernelVariants<ResampleRow> kThreeHalves = VX_KERNEL_VARIANTS(ThreeHalves);
+
+}  // namespace vexel::decode420
+#endif

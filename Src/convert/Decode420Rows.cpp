@@ -1,0 +1,247 @@
+#include <algorithm>
+
+#include "convert/Decode420.h"
+
+namespace vexel {
+
+using namespace decode420;
+
+namespace {
+
+// Weights of one line's chroma rows are in eighths.
+constexpr uint32_t kLineWeight = 8;
+
+// A block one pixel wide has no chroma bytes.
+constexpr uint16_t kNoChroma = 128 << 8;
+
+size_t RowSamples(size_t samples) { return (samples + 2 * kRowSlack + 31) & ~size_t{31}; }
+
+void RepeatEdges(uint16_t* row, size_t samples, size_t left, size_t right) {
+  std::fill_n(row - left, left, row[0]);
+  std::fill_n(row + samples, right, row[samples - 1]);
+}
+
+}  // namespace
+
+bool Rows420::CanMake(VX_PixelFormat format) noexcept {
+  const uint32_t bits = Bits(format) & ~kAlphaMask;
+  if (AlphaKind(format) == kAlphaNone) return false;
+  return bits == 0 || bits == (kVideoRangeBit | kYuvBit) || bits == (kVideoRangeBit | kYuvBit | kColorimetry709);
+}
+
+VX_Result Rows420::Prepare(const Picture420& src, VX_PixelFormat format, int32_t width, int32_t height, int32_t field,
+                           int32_t quality, KernelVariant variant) noexcept {
+  *this = Rows420();
+  mSrc = src;
+  mWidth = width;
+  mHeight = height;
+  mLinear = quality >= 2;
+  mVariant = variant;
+  if (const VX_Result result = ChooseLines(field, quality)) return result;
+  ChooseKernels(format);
+  return VX_Success;
+}
+
+VX_Result Rows420::ChooseLines(int32_t field, int32_t quality) noexcept {
+  const int32_t w = mSrc.width, h = mSrc.height;
+  if (w < 0 || h < 0 || mWidth < 0 || mHeight < 0) return VX_ErrUnsupportedConversion;
+  mRatio = AnamorphicRatio(w, h, mWidth, mHeight);
+  const bool isWide = mRatio != HorizontalRatio::None;
+  const bool oneField = IsFieldPicture(mSrc.format);
+  if ((isWide || mWidth == w) && mHeight == h) return VX_Success;
+  if ((isWide || mWidth == w) && mHeight == h / 2) {
+    const bool isField = field == 1 || field == 2;
+    mAdvance = 2;
+    mFirstLine = isField ? field - 1 : 0;
+    mLines = isField || oneField ? 1 : 2;
+    return VX_Success;
+  }
+  const bool isHalfSize = w == 2 * int64_t{mWidth} && mHeight == h / 2;
+  if (!isHalfSize && (quality >= 3 || !IsReduction(w, h, mWidth, mHeight))) return VX_ErrUnsupportedConversion;
+  mColumns = isHalfSize ? 2 : w / mWidth;
+  mAdvance = isHalfSize ? 2 : h / mHeight;
+  mLineStep = oneField ? 2 : 1;
+  mLines = mAdvance / mLineStep;
+  return VX_Success;
+}
+
+void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
+  const bool wide = HasWideSamples(mSrc.format), pairs = IsBiplanar(mSrc.format);
+  mMixLuma = (wide ? kMixPlane10 : kMixPlane8)[mVariant];
+  mMixChroma = (pairs ? wide ? kMixPairs10 : kMixPairs8 : wide ? kMixPlane10 : kMixPlane8)[mVariant];
+  mHalfChroma = mColumns == 1 && mRatio == HorizontalRatio::None;
+  mLumaFromSource = mHalfChroma && mLines == 1;
+  if (mRatio != HorizontalRatio::None)
+    mResample = (mRatio == HorizontalRatio::FourThirds ? kFourThirds : kThreeHalves)[mVariant];
+  const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
+  const bool wideLuma = wide || !mLumaFromSource;
+  mMakePixels = (!mHalfChroma ? pixels.full
+                 : wideLuma   ? mLinear ? pixels.wideLinear : pixels.wideNearest
+                 : mLinear    ? pixels.linear
+                              : pixels.nearest)[mVariant];
+  mMatrix = MakeMatrix420(mSrc.format, format);
+}
+
+size_t Rows420::PlaceRows(uint8_t* scratch) noexcept {
+  size_t used = 0;
+  const auto place = [&](auto*& row, size_t elements) {
+    using Element = std::remove_reference_t<decltype(*row)>;
+    row = scratch ? reinterpret_cast<Element*>(scratch + used) : nullptr;
+    used += (elements * sizeof(Element) + 63) & ~size_t{63};
+  };
+  const auto placeRow = [&](uint16_t*& row, size_t samples) {
+    place(row, RowSamples(samples));
+    if (row) row += kRowSlack;
+  };
+  const auto width = static_cast<size_t>(mSrc.width), chroma = width / 2 + 1;
+  if (!mLumaFromSource) placeRow(mY, width);
+  placeRow(mU, chroma);
+  placeRow(mV, chroma);
+  if (mResample)
+    for (uint16_t** row : {&mWideY, &mWideU, &mWideV}) placeRow(*row, static_cast<size_t>(mWidth));
+  if (mResample || mLines > 1) {
+    for (uint16_t*& row : mTemp) placeRow(row, width);
+    place(mSums, RowSamples(width));
+  }
+  place(mTaps, 2 * static_cast<size_t>(mLines));
+  return used;
+}
+
+size_t Rows420::ScratchBytes() const noexcept { return Rows420(*this).PlaceRows(nullptr); }
+void Rows420::UseScratch(uint8_t* scratch) noexcept { PlaceRows(scratch); }
+
+// Lines come in order, so a row that is already there is among the last few.
+void Rows420::AddTap(int32_t row, uint32_t weight) noexcept {
+  for (int32_t i = mTapCount - 1; i >= 0 && i >= mTapCount - 4; --i)
+    if (mTaps[i].row == row) {
+      mTaps[i].weight += weight;
+      return;
+    }
+  mTaps[mTapCount++] = {row, weight};
+}
+
+// The two chroma rows about a line. Within the rows of the picture, or of one field, row k lies `offset` quarters of a
+// line past line 2k: 2 in frame pictures, 1 in the upper field and 3 in the lower one.
+void Rows420::AddChromaTaps(int32_t line) noexcept {
+  const bool oneField = IsFieldPicture(mSrc.format);
+  const int32_t parity = oneField ? line % 2 : 0, step = oneField ? 2 : 1;
+  const int32_t rows = (ChromaHeight(mSrc) - parity + step - 1) / step;
+  if (rows < 1) return AddTap(0, kLineWeight);  // a picture of one or two lines has chroma of the upper field only
+  const int32_t ownLine = line / step, own = std::min(ownLine / 2, rows - 1);
+  if (!mLinear) return AddTap(own * step + parity, kLineWeight);
+  const int32_t offset = oneField ? 1 + 2 * parity : 2;
+  const bool above = ownLine % 2 == 0;  // the line lies above its chroma row
+  const auto otherWeight = static_cast<uint32_t>(above ? offset : 4 - offset);
+  const int32_t other = std::clamp(above ? own - 1 : own + 1, 0, rows - 1);
+  AddTap(own * step + parity, kLineWeight - otherWeight);
+  AddTap(other * step + parity, otherWeight);
+}
+
+void Rows420::MeanOfRows(const Plane& plane, uint32_t total) const noexcept {
+  const uint32_t mixTotal = HasWideSamples(mSrc.format) ? kMixTotal10 : kMixTotal8;
+  const auto row = [&](int32_t tap) { return plane.base + mTaps[tap].row * plane.rowBytes; };
+  if (mixTotal % total == 0) {
+    const uint32_t scale = mixTotal / total;
+    for (int32_t i = 0; i < mTapCount; i += 2) {
+      const int32_t next = i + 1 < mTapCount ? i + 1 : i;
+      const MixRows rows = {row(i), row(next), scale * mTaps[i].weight, next == i ? 0 : scale * mTaps[next].weight,
+                            i > 0};
+      plane.mix(rows, plane.out[0], plane.out[1], plane.samples);
+    }
+    return;
+  }
+  // One plane after the other: they share the sums. Weights are differences of a running total, so that they add up.
+  for (int k = 0; k < 2; ++k) {
+    if (!plane.out[k]) continue;
+    uint64_t seen = 0, given = 0;
+    for (int32_t i = 0; i < mTapCount; ++i) {
+      plane.mix({row(i), row(i), mixTotal, 0, false}, mTemp[0], mTemp[1], plane.samples);
+      seen += mTaps[i].weight;
+      const uint64_t upTo = seen * 65536 / total;
+      kAddWeighted[mVariant](mTemp[k], static_cast<uint32_t>(upTo - given), i == 0, mSums, plane.samples);
+      given = upTo;
+    }
+    kFinishSums[mVariant](mSums, plane.out[k], plane.samples);
+  }
+}
+
+const uint16_t* Rows420::ResampleLuma() noexcept {
+  const auto width = static_cast<size_t>(mSrc.width);
+  if (mResample) {
+    RepeatEdges(mY, width, 2, 2);
+    mResample(mY, mWideY, static_cast<size_t>(mWidth));
+    return mWideY;
+  }
+  for (int32_t columns = mColumns; columns > 1; columns /= 2)
+    kHalveRow[mVariant](mY, mY, width * static_cast<size_t>(columns) / 2 / static_cast<size_t>(mColumns));
+  return mY;
+}
+
+void Rows420::MakeLuma(int32_t row) noexcept {
+  if (mLumaFromSource) {
+    mRowY = mSrc.planes[0] + LineOf(row, 0) * mSrc.rowBytes[0];
+    return;
+  }
+  mTapCount = 0;
+  for (int32_t i = 0; i < mLines; ++i) mTaps[mTapCount++] = {LineOf(row, i), 1};
+  MeanOfRows({mSrc.planes[0], mSrc.rowBytes[0], mMixLuma, {mY, nullptr}, static_cast<size_t>(mSrc.width)},
+             static_cast<uint32_t>(mLines));
+  mRowY = reinterpret_cast<const uint8_t*>(ResampleLuma());
+}
+
+const uint16_t* Rows420::ResampleChroma(uint16_t* samples, uint16_t* resampled) noexcept {
+  const auto width = static_cast<size_t>(mSrc.width), chroma = (width + 1) / 2;
+  const auto readable = static_cast<size_t>(ChromaWidth(mSrc));
+  if (readable == 0)
+    std::fill_n(samples, chroma + 1, kNoChroma);
+  else
+    RepeatEdges(samples, readable, 0, chroma - readable + 1);
+  if (mResample) {
+    uint16_t* const doubled = mTemp[0];
+    (mLinear ? kDoubleLinear : kDoubleNearest)[mVariant](samples, doubled, width);
+    RepeatEdges(doubled, width, 2, 2);
+    mResample(doubled, resampled, static_cast<size_t>(mWidth));
+    return resampled;
+  }
+  if (mColumns == 1) return samples;
+  if (mLinear) kMeanOfPairs[mVariant](samples, samples, chroma);
+  for (int32_t columns = mColumns / 2; columns > 1; columns /= 2)
+    kHalveRow[mVariant](samples, samples, width * static_cast<size_t>(columns) / 2 / static_cast<size_t>(mColumns));
+  return samples;
+}
+
+void Rows420::MakeChroma(int32_t row) noexcept {
+  mTapCount = 0;
+  for (int32_t i = 0; i < mLines; ++i) AddChromaTaps(LineOf(row, i));
+  if (mLines == 1) {
+    const Tap taps[2] = {mTaps[0], mTapCount > 1 ? mTaps[1] : Tap{mTaps[0].row, 0}};
+    if (std::equal(taps, taps + 2, mHeld)) return;
+    std::copy(taps, taps + 2, mHeld);
+  }
+  const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
+  uint16_t* const out[2] = {reversed ? mV : mU, reversed ? mU : mV};
+  const auto samples = static_cast<size_t>(ChromaWidth(mSrc));
+  const uint32_t total = kLineWeight * static_cast<uint32_t>(mLines);
+  if (pairs) {
+    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], out[1]}, samples}, total);
+  } else {
+    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], nullptr}, samples}, total);
+    MeanOfRows({mSrc.planes[2], mSrc.rowBytes[2], mMixChroma, {out[1], nullptr}, samples}, total);
+  }
+  mRowU = ResampleChroma(mU, mWideU);
+  mRowV = ResampleChroma(mV, mWideV);
+}
+
+void Rows420::BeginRow(int32_t row) noexcept {
+  MakeLuma(row);
+  MakeChroma(row);
+}
+
+void Rows420::Pixels(int32_t first, int32_t count, uint8_t* dst) const noexcept {
+  const bool wideLuma = HasWideSamples(mSrc.format) || !mLumaFromSource;
+  const ptrdiff_t chroma = mHalfChroma ? first / 2 : first;
+  mMakePixels(mRowY + (wideLuma ? 2 * ptrdiff_t{first} : first), mRowU + chroma, mRowV + chroma, mMatrix, dst,
+              static_cast<size_t>(count));
+}
+
+}  // namespace vexel
