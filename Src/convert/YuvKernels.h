@@ -1,6 +1,6 @@
-// Row kernels that know Y'CbCr: matrices, ranges, 4:2:2 and V210. Names carry the colorimetry where it matters: _601 and
-// _709. "Vuyx"/"Bgrx" kernels ignore the source's fourth channel and write it opaque; "Vuya"/"Bgra" kernels copy it,
-// which serves straight and premultiplied pixels alike (premultiplied Y'CbCr is scaled about black).
+// Row kernels that know Y'CbCr: matrices, ranges, 4:2:2 and V210. Names carry the colorimetry where it matters: _601
+// and _709. "Vuyx"/"Bgrx" kernels ignore the source's fourth channel and write it opaque; "Vuya"/"Bgra" kernels copy
+// it, which serves straight and premultiplied pixels alike (premultiplied Y'CbCr is scaled about black).
 #pragma once
 
 #include "convert/RowKernel.h"
@@ -35,10 +35,10 @@ extern const RowKernelSet kUyvy8To32f, kYuyv8To32f, kUyvy32fTo8, kYuyv32fTo8;
 // Chroma is co-sited with the even pixel. Interpolation makes that of the odd ones with the taps (-1, 9, 9, -1) / 16,
 // which repeat the last sample beyond the row's ends; "Nearest" repeats the pair's. Alpha is written opaque.
 extern const RowKernelSet kUyvy32fToVuyx32f, kUyvy32fToVuyx32fNearest;
-// The way back low-passes chroma as the lifting partner of the interpolation: with d[i] what the interpolation gets wrong
-// at the odd pixel of pair i, chroma is even[i] - (d[i - 1] + d[i]) / 4, that is (1, 0, -8, 16, 46, 16, -8, 0, 1) / 64.
-// An interpolated row comes back bit for bit. Beyond the ends d is 0, and the luma that an odd width lacks repeats the
-// last. The fourth channel is ignored.
+// The way back low-passes chroma as the lifting partner of the interpolation: with d[i] what the interpolation gets
+// wrong at the odd pixel of pair i, chroma is even[i] - (d[i - 1] + d[i]) / 4, that is (1, 0, -8, 16, 46, 16, -8, 0, 1)
+// / 64. An interpolated row comes back bit for bit. Beyond the ends d is 0, and the luma that an odd width lacks
+// repeats the last. The fourth channel is ignored.
 extern const RowKernelSet kVuyx32fToUyvy32f;
 
 // V210: 6 pixels in 16 bytes; 10-bit studio codes, which are those of 8 bits times 4 (V210Kernels.cpp). Packing writes
@@ -46,8 +46,9 @@ extern const RowKernelSet kVuyx32fToUyvy32f;
 // those that SDI reserves for its timing included, so that bytes come back from V210 as they were; the way to bytes
 // rounds to nearest and saturates.
 extern const RowKernelSet kUyvy8ToV210, kV210ToUyvy8, kUyvy32fToV210, kV210ToUyvy32f;
-// Chroma of an odd pixel is the mean of its two neighbours, at the row's end the last sample. Everything is computed from
-// 10-bit codes and rounded once to 8; fixed point deviates from the exact value by less than 1/16 of a code before that.
+// Chroma of an odd pixel is the mean of its two neighbours, at the row's end the last sample. Everything is computed
+// from 10-bit codes and rounded once to 8; fixed point deviates from the exact value by less than 1/16 of a code before
+// that.
 extern const RowKernelSet kV210ToBgrx8_601, kV210ToBgrx8_709, kV210ToVuyx8, kV210_709ToVuyx8_601;
 
 }  // namespace vexel
