@@ -5,8 +5,10 @@
 
 #include <gtest/gtest.h>
 
+#include "convert/RgbKernels.h"
 #include "convert/RowKernelCheck.h"
 #include "convert/YuvKernels.h"
+#include "convert/YuvReference.h"
 #include "support/Random.h"
 
 namespace vexel::testing {
@@ -44,24 +46,14 @@ TEST(YuvFloatKernels, VariantsAgreeAndStayInTheRow) {
   for (const KernelCase& kernelCase : kCases) ExpectVariantsAgree(kernelCase, 70);
 }
 
-// R'G'B' of one pixel by the matrix equations, from luma coefficients alone; the published tables round them to six or
-// seven digits.
-struct Luma {
-  double r, b;
-  double g() const { return 1 - r - b; }
-};
-constexpr Luma k601{0.299, 0.114}, k709{0.2126, 0.0722};
-
-struct Pixel {
-  double c[4];
-};
-Pixel ToYuv(const Luma& k, const Pixel& bgra) {
-  const double y = k.r * bgra.c[2] + k.g() * bgra.c[1] + k.b * bgra.c[0];
-  return {{(bgra.c[2] - y) / (2 - 2 * k.r), (bgra.c[0] - y) / (2 - 2 * k.b), y, bgra.c[3]}};
+// The equations hold for codes; floats go there and back.
+Triple ToYuv(const Luma& k, const Triple& bgr) {
+  const Triple codes = BgrToVuy(k, {{bgr.c[0] * 255, bgr.c[1] * 255, bgr.c[2] * 255}});
+  return {{(codes.c[0] - 128) / 224, (codes.c[1] - 128) / 224, (codes.c[2] - 16) / 219}};
 }
-Pixel ToBgr(const Luma& k, const Pixel& vuya) {
-  const double r = vuya.c[2] + (2 - 2 * k.r) * vuya.c[0], b = vuya.c[2] + (2 - 2 * k.b) * vuya.c[1];
-  return {{b, (vuya.c[2] - k.r * r - k.b * b) / k.g(), r, vuya.c[3]}};
+Triple ToBgr(const Luma& k, const Triple& vuy) {
+  const Triple codes = VuyToBgr(k, {{vuy.c[0] * 224 + 128, vuy.c[1] * 224 + 128, vuy.c[2] * 219 + 16}});
+  return {{codes.c[0] / 255, codes.c[1] / 255, codes.c[2] / 255}};
 }
 
 std::vector<float> RandomPixels(size_t count, float least, float most) {
@@ -74,21 +66,21 @@ std::vector<float> RandomPixels(size_t count, float least, float most) {
 TEST(YuvFloatKernels, MatricesFollowTheEquations) {
   struct {
     const RowKernelSet* kernels;
-    Pixel (*expected)(const Pixel&);
+    Triple (*expected)(const Triple&);
     bool opaque;
   } const kMatrices[] = {
-      {&kBgra32fToVuya32f_601, [](const Pixel& p) { return ToYuv(k601, p); }, false},
-      {&kBgra32fToVuya32f_709, [](const Pixel& p) { return ToYuv(k709, p); }, false},
-      {&kBgrx32fToVuyx32f_601, [](const Pixel& p) { return ToYuv(k601, p); }, true},
-      {&kBgrx32fToVuyx32f_709, [](const Pixel& p) { return ToYuv(k709, p); }, true},
-      {&kVuya32fToBgra32f_601, [](const Pixel& p) { return ToBgr(k601, p); }, false},
-      {&kVuya32fToBgra32f_709, [](const Pixel& p) { return ToBgr(k709, p); }, false},
-      {&kVuyx32fToBgrx32f_601, [](const Pixel& p) { return ToBgr(k601, p); }, true},
-      {&kVuyx32fToBgrx32f_709, [](const Pixel& p) { return ToBgr(k709, p); }, true},
-      {&kVuya32f_601To709, [](const Pixel& p) { return ToYuv(k709, ToBgr(k601, p)); }, false},
-      {&kVuya32f_709To601, [](const Pixel& p) { return ToYuv(k601, ToBgr(k709, p)); }, false},
-      {&kVuyx32f_601To709, [](const Pixel& p) { return ToYuv(k709, ToBgr(k601, p)); }, true},
-      {&kVuyx32f_709To601, [](const Pixel& p) { return ToYuv(k601, ToBgr(k709, p)); }, true},
+      {&kBgra32fToVuya32f_601, [](const Triple& p) { return ToYuv(k601, p); }, false},
+      {&kBgra32fToVuya32f_709, [](const Triple& p) { return ToYuv(k709, p); }, false},
+      {&kBgrx32fToVuyx32f_601, [](const Triple& p) { return ToYuv(k601, p); }, true},
+      {&kBgrx32fToVuyx32f_709, [](const Triple& p) { return ToYuv(k709, p); }, true},
+      {&kVuya32fToBgra32f_601, [](const Triple& p) { return ToBgr(k601, p); }, false},
+      {&kVuya32fToBgra32f_709, [](const Triple& p) { return ToBgr(k709, p); }, false},
+      {&kVuyx32fToBgrx32f_601, [](const Triple& p) { return ToBgr(k601, p); }, true},
+      {&kVuyx32fToBgrx32f_709, [](const Triple& p) { return ToBgr(k709, p); }, true},
+      {&kVuya32f_601To709, [](const Triple& p) { return ToYuv(k709, ToBgr(k601, p)); }, false},
+      {&kVuya32f_709To601, [](const Triple& p) { return ToYuv(k601, ToBgr(k709, p)); }, false},
+      {&kVuyx32f_601To709, [](const Triple& p) { return ToYuv(k709, ToBgr(k601, p)); }, true},
+      {&kVuyx32f_709To601, [](const Triple& p) { return ToYuv(k601, ToBgr(k709, p)); }, true},
   };
   constexpr size_t kCount = 1000;
   const std::vector<float> source = RandomPixels(kCount, -0.5f, 1.5f);
@@ -96,7 +88,7 @@ TEST(YuvFloatKernels, MatricesFollowTheEquations) {
     const auto got = RunKernel<float>(*kMatrices[m].kernels, source, kCount, 4 * kCount);
     for (size_t i = 0; i < kCount; ++i) {
       const float* p = &source[4 * i];
-      const Pixel expected = kMatrices[m].expected({{p[0], p[1], p[2], p[3]}});
+      const Triple expected = kMatrices[m].expected({{p[0], p[1], p[2]}});
       for (size_t c = 0; c < 3; ++c)
         ASSERT_NEAR(got[4 * i + c], expected.c[c], 2.5e-6) << "matrix " << m << " channel " << c;
       ASSERT_EQ(got[4 * i + 3], kMatrices[m].opaque ? 1.0f : p[3]) << "matrix " << m;
@@ -138,14 +130,12 @@ TEST(YuvFloatKernels, EveryCodeWidensAndComesBack) {
   const std::vector<uint8_t> codes = AllCodes();
   const auto wide = RunKernel<float>(kVuya8To32f, codes, 256, 1024);
   const auto opaque = RunKernel<float>(kVuyx8To32f, codes, 256, 1024);
-  const auto premultiplied = RunKernel<float>(kVuya8ToVuyp32f, codes, 256, 1024);
   for (int code = 0; code < 256; ++code) {
     const double expected[4] = {(code - 128) / 224.0, (code - 128) / 224.0, (code - 16) / 219.0, code / 255.0};
     for (int c = 0; c < 4; ++c) {
       const size_t i = static_cast<size_t>(4 * code + c);
       EXPECT_NEAR(wide[i], expected[c], 1.2e-7 * std::abs(expected[c]));
       EXPECT_EQ(opaque[i], c == 3 ? 1.0f : wide[i]);
-      EXPECT_EQ(premultiplied[i], c == 3 ? wide[i] : wide[i] * wide[static_cast<size_t>(4 * code + 3)]);
     }
   }
   EXPECT_EQ(wide[4 * 16 + 2], 0.0f);
@@ -173,7 +163,8 @@ TEST(YuvFloatKernels, NarrowingSaturates) {
 TEST(YuvFloatKernels, MixedDepthsAreTheirTwoSteps) {
   struct {
     const RowKernelSet *direct, *first, *second;
-  } const kWidening[] = {{&kVuya8ToBgra32f_601, &kVuya8To32f, &kVuya32fToBgra32f_601},
+  } const kWidening[] = {{&kVuya8ToVuyp32f, &kVuya8To32f, &kPremultiplyLast32f},
+                         {&kVuya8ToBgra32f_601, &kVuya8To32f, &kVuya32fToBgra32f_601},
                          {&kVuya8ToBgra32f_709, &kVuya8To32f, &kVuya32fToBgra32f_709},
                          {&kVuyx8ToBgrx32f_601, &kVuyx8To32f, &kVuyx32fToBgrx32f_601},
                          {&kVuyx8ToBgrx32f_709, &kVuyx8To32f, &kVuyx32fToBgrx32f_709}},
