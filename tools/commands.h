@@ -8,5 +8,6 @@ namespace tool {
 void AddFormatsCommand(CLI::App& app);
 void AddInfoCommand(CLI::App& app);
 void AddConvertCommand(CLI::App& app);
+void AddDemoCommand(CLI::App& app);
 
 }  // namespace tool

@@ -19,6 +19,7 @@ void AddCommands(CLI::App& app) {
   tool::AddFormatsCommand(app);
   tool::AddInfoCommand(app);
   tool::AddConvertCommand(app);
+  tool::AddDemoCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".
