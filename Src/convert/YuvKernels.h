@@ -18,16 +18,28 @@ extern const RowKernelSet kVuya32f_601To709, kVuya32f_709To601, kVuyx32f_601To70
 extern const RowKernelSet kVuya8ToBgra32f_601, kVuya8ToBgra32f_709, kVuyx8ToBgrx32f_601, kVuyx8ToBgrx32f_709;
 extern const RowKernelSet kBgra32fToVuya8_601, kBgra32fToVuya8_709;
 
-// Matrices in 8u fixed point (YuvMatrix8Kernels.cpp).
+// Matrices in 8u fixed point, within 0.515 code values of the exact ones (YuvMatrix8Kernels.cpp).
 extern const RowKernelSet kBgra8ToVuya8_601, kBgra8ToVuya8_709, kBgrx8ToVuyx8_601, kBgrx8ToVuyx8_709;
 extern const RowKernelSet kVuya8ToBgra8_601, kVuya8ToBgra8_709, kVuyx8ToBgrx8_601, kVuyx8ToBgrx8_709;
 extern const RowKernelSet kVuya8_601To709, kVuya8_709To601, kVuyx8_601To709, kVuyx8_709To601;
 
-// Packed 4:2:2, 8u (Packed422Kernels8.cpp).
+// Packed 4:2:2, 8u. A row of an odd width ends with a whole pair whose second luma repeats the first; kSwap422_8u moves
+// it as it is. Chroma is co-sited with the even pixel. All but kSwap422_8u take whole rows.
+//
+// Upwards, the odd pixel takes the mean of the chroma before and after it; the last one repeats the last sample. The
+// matrices use the mean unrounded, and an even pixel comes out as from the 4:4:4 kernel (Packed422Kernels8.cpp).
 extern const RowKernelSet kUyvy8ToBgrx8_601, kUyvy8ToBgrx8_709, kYuyv8ToBgrx8_601, kYuyv8ToBgrx8_709;
-extern const RowKernelSet kUyvy8ToVuyx8, kYuyv8ToVuyx8, kVuyx8ToUyvy8;
+extern const RowKernelSet kUyvy8ToVuyx8, kYuyv8ToVuyx8;
 extern const RowKernelSet kSwap422_8u;  // UYVY <-> YUYV
 extern const RowKernelSet kUyvy8_601To709, kUyvy8_709To601, kYuyv8_601To709, kYuyv8_709To601;
+// Downwards, chroma is low-passed with (-1, 2, 6, 2, -1) / 8 about the even pixel, in the form that undoes the
+// interpolation exactly: with d[i] = odd[i] - ((even[i] + even[i + 1] + 1) >> 1), chroma is the clamped
+// even[i] + ((d[i - 1] + d[i] + 2) >> 2). An interpolated row has d = 0 and comes back byte for byte, in odd widths too.
+// Beyond either end the row repeats its end pixel (d = 0 before the first pair). The fourth channel is ignored, so that
+// premultiplied pixels are served as well (Subsample422Kernels8.cpp).
+extern const RowKernelSet kVuyx8ToUyvy8;
+// In one pass the same bytes as kBgrx8ToVuyx8 then kVuyx8ToUyvy8, and as kPremultiplyLast8u before these.
+extern const RowKernelSet kBgrx8ToUyvy8_601, kBgrx8ToUyvy8_709, kBgra8ToUyvy8_601, kBgra8ToUyvy8_709;
 
 // Packed 4:2:2, 32f (Packed422Kernels32f.cpp). A row of an odd width ends with a whole pair.
 extern const RowKernelSet kSwap422_32f;

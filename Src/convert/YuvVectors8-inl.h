@@ -65,19 +65,20 @@ HWY_INLINE U8 SelectBytes(U8 mask, U8 yes, U8 no) {
 
 // Shuffle table that moves bytes within each group of four. The hexadecimal digits of kOrder name the source bytes,
 // from the highest result byte to the lowest, 8 for zero: 0x8280 makes words of bytes 2 and 0.
+// The table fills a vector: compilers repeat the broadcast of a shorter one in every pass of a loop.
 struct ByteOrderTable {
   constexpr explicit ByteOrderTable(uint32_t order) : bytes() {
-    for (uint32_t i = 0; i < 16; ++i) {
+    for (uint32_t i = 0; i < HWY_MAX_BYTES; ++i) {
       const uint32_t digit = order >> (4 * (i % 4)) & 15;
-      bytes[i] = static_cast<uint8_t>(digit >= 8 ? 0x80 : digit + i / 4 * 4);
+      bytes[i] = static_cast<uint8_t>(digit >= 8 ? 0x80 : digit + i % 16 / 4 * 4);
     }
   }
-  alignas(16) uint8_t bytes[16];
+  alignas(HWY_MAX_BYTES) uint8_t bytes[HWY_MAX_BYTES];
 };
 template <uint32_t kOrder>
 HWY_INLINE U8 ByteOrder() {
   static constexpr ByteOrderTable kTable(kOrder);
-  return hn::LoadDup128(hn::ScalableTag<uint8_t>(), kTable.bytes);
+  return hn::Load(hn::ScalableTag<uint8_t>(), kTable.bytes);
 }
 
 // A vector whose fourth bytes are those of the pixels, or opaque; its other bytes are anything.
@@ -113,19 +114,26 @@ struct VectorYuvToRgb8 {
       : luma(AsU16(WordPair(f.luma, f.luma))),
         lumaBias(WordPair(f.lumaBias, f.lumaBias)),
         blueRed(WordPair(f.blueU, f.redV)),
+        blue(WordPair(f.blueU, f.blueU)),
+        red(WordPair(f.redV, f.redV)),
         green(WordPair(f.greenU, f.greenV)) {}
 
   // Of words 256 Y.
   HWY_INLINE I16 Luma(U16 y) const { return hn::Add(AsI16(hn::MulHigh(y, luma)), lumaBias); }
   // B and R in the low and high word of each pixel, from its luma in both and the pair (u, v).
-  HWY_INLINE I16 BlueRed(I16 y, I16 uv) const {
-    return hn::SaturatedAdd(hn::Add(y, hn::MulFixedPoint15(uv, blueRed)), uv);
-  }
+  HWY_INLINE I16 BlueRed(I16 y, I16 uv) const { return AddChroma(y, uv, blueRed); }
+  // The same for words of one kind.
+  HWY_INLINE I16 Blue(I16 y, I16 u) const { return AddChroma(y, u, blue); }
+  HWY_INLINE I16 Red(I16 y, I16 v) const { return AddChroma(y, v, red); }
   // What chroma adds to G, in the high word of each pixel.
   HWY_INLINE I16 GreenChroma(I16 uv) const { return AsI16(MultiplyPairs(uv, green)); }
 
+  static HWY_INLINE I16 AddChroma(I16 y, I16 c, I16 factor) {
+    return hn::SaturatedAdd(hn::Add(y, hn::MulFixedPoint15(c, factor)), c);
+  }
+
   U16 luma;
-  I16 lumaBias, blueRed, green;
+  I16 lumaBias, blueRed, blue, red, green;
 };
 
 // Doubles with saturation: the upper byte of each word is then the 8-bit result less 128.
