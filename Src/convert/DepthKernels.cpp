@@ -84,16 +84,9 @@ struct Narrow32fTo8uBody {
 
 template <AlphaWrite kAlpha>
 struct Narrow32fTo15uBody {
-  // 0..32768 saturates as -32768..0, which the signed packing of every target has room for.
-  HWY_INLINE I32 LoadBiased(const uint8_t* in, size_t index) const {
-    const hn::ScalableTag<int32_t> d;
-    return hn::Sub(hn::Max(LoadConverted(in, index, k32fTo15u), hn::Zero(d)), hn::Set(d, 32768));
-  }
   HWY_INLINE U16 Narrow(const uint8_t* in, size_t index) const {
-    const hn::ScalableTag<int16_t> d;
-    const auto biased = hn::Min(PackTo16(LoadBiased(in, index), LoadBiased(in, index + 1)), hn::Zero(d));
-    return WriteAlpha<kAlpha, uint16_t>(
-        hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Xor(biased, hn::Set(d, INT16_MIN))));
+    const auto v = PackToU16(LoadConverted(in, index, k32fTo15u), LoadConverted(in, index + 1, k32fTo15u));
+    return WriteAlpha<kAlpha, uint16_t>(hn::Min(v, hn::Set(hn::ScalableTag<uint16_t>(), 32768)));
   }
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
     const auto v0 = Narrow(in, 0), v1 = Narrow(in, 2);
@@ -209,7 +202,7 @@ void Narrow15uTo8u(const uint8_t* src, uint8_t* dst, size_t count) {
 void Bgra8ToBgrp32f(const uint8_t* src, uint8_t* dst, size_t count) {
   MapPixels<uint8_t, float>(src, dst, count, [](const uint8_t* in, float* out) {
     out[3] = in[3] * k8uTo32f;
-    for (int k = 0; k < 3; ++k) out[k] = in[k] * k8uTo32f * out[3];
+    ForChannels<3>([&](size_t k) { out[k] = in[k] * k8uTo32f * out[3]; });
   });
 }
 

@@ -75,21 +75,29 @@ struct EachVector {
   }
 };
 
-// A vector with `value` in channel kIndex of each pixel and `other` in the rest.
+// 128 bits with `value` in channel `index` of each pixel and 0 in the rest. Constants made of it must be static: not
+// all of them become constants by themselves.
+template <class T>
+struct ChannelLanes {
+  constexpr ChannelLanes(size_t index, T value) {
+    for (size_t i = index; i < 16 / sizeof(T); i += 4) lanes[i] = value;
+  }
+  alignas(16) T lanes[16 / sizeof(T)] = {};
+};
+
+// Opaque alpha in channel kIndex, 0 in the others.
 template <size_t kIndex, class T>
-HWY_INLINE Full<T> ChannelVector(T value, T other) {
-  constexpr size_t kIn128 = 16 / sizeof(T);
-  alignas(16) T lanes[kIn128];
-  for (size_t i = 0; i < kIn128; ++i) lanes[i] = i % 4 == kIndex ? value : other;
-  return hn::LoadDup128(hn::ScalableTag<T>(), lanes);
+HWY_INLINE Full<T> OpaqueVector() {
+  static constexpr ChannelLanes<T> kOpaque(kIndex, kFullScale<T>);
+  return hn::LoadDup128(hn::ScalableTag<T>(), kOpaque.lanes);
 }
 
 // All bits of channel kIndex.
 template <size_t kIndex, class T>
 HWY_INLINE Full<T> ChannelMask() {
-  const hn::ScalableTag<T> d;
   using TU = hwy::MakeUnsigned<T>;
-  return hn::BitCast(d, ChannelVector<kIndex, TU>(static_cast<TU>(~TU{0}), TU{0}));
+  static constexpr ChannelLanes<TU> kMask(kIndex, static_cast<TU>(~TU{0}));
+  return hn::BitCast(hn::ScalableTag<T>(), hn::LoadDup128(hn::ScalableTag<TU>(), kMask.lanes));
 }
 
 // The vector with its alpha channel opaque, if kAlpha says so.
@@ -99,7 +107,7 @@ HWY_INLINE Full<T> WriteAlpha(Full<T> v) {
     return v;
   } else {
     constexpr size_t kIndex = AlphaIndex(kAlpha);
-    const auto opaque = ChannelVector<kIndex, T>(kFullScale<T>, T{0});
+    const auto opaque = OpaqueVector<kIndex, T>();
     if constexpr (sizeof(T) == 1) return hn::Or(v, opaque);
     return hn::Or(hn::AndNot(ChannelMask<kIndex, T>(), v), opaque);
   }
@@ -113,6 +121,25 @@ HWY_INLINE U8 PackBlocks(I16 a, I16 b) {
   return U8{_mm256_packus_epi16(a.raw, b.raw)};
 #else
   return U8{_mm_packus_epi16(a.raw, b.raw)};
+#endif
+}
+
+// int32 -> uint16, saturating, within each 128-bit block.
+HWY_INLINE U16 PackBlocks(I32 a, I32 b) {
+#if HWY_TARGET == HWY_AVX3
+  return U16{_mm512_packus_epi32(a.raw, b.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return U16{_mm256_packus_epi32(a.raw, b.raw)};
+#elif HWY_TARGET == HWY_SSE4
+  return U16{_mm_packus_epi32(a.raw, b.raw)};
+#else
+  // 0..65535 as -32768..32767, which packs signed.
+  const auto biased = [](I32 v) HWY_ATTR {
+    return hn::Sub(hn::AndNot(hn::ShiftRight<31>(v), v), hn::Set(hn::ScalableTag<int32_t>(), 32768));
+  };
+  const hn::ScalableTag<int16_t> d;
+  const auto packed = hn::ReorderDemote2To(d, biased(a), biased(b));
+  return hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Xor(packed, hn::Set(d, INT16_MIN)));
 #endif
 }
 
@@ -151,7 +178,12 @@ HWY_INLINE I32 Truncate(F32 v) {
 }
 
 // int32 -> int16, saturating, in memory order.
-HWY_INLINE I16 PackTo16(I32 a, I32 b) { return OrderPacked2(hn::ReorderDemote2To(hn::ScalableTag<int16_t>(), a, b)); }
+HWY_INLINE I16 PackTo16(I32 a, I32 b) {
+  return OrderPacked2(hn::ReorderDemote2To(hn::ScalableTag<int16_t>(), a, b));
+}
+
+// int32 -> uint16, saturating, in memory order.
+HWY_INLINE U16 PackToU16(I32 a, I32 b) { return OrderPacked2(PackBlocks(a, b)); }
 
 // int32 -> uint8, saturating, in memory order.
 HWY_INLINE U8 PackTo8(I32 a, I32 b, I32 c, I32 d) {

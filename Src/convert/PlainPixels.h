@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <utility>
 #include <xmmintrin.h>
 
 namespace vexel {
@@ -25,6 +26,13 @@ inline constexpr size_t AlphaIndex(AlphaWrite alpha) { return alpha == AlphaWrit
 
 namespace plain {
 
+// Calls channel(0) to channel(kChannels - 1), unrolled.
+template <size_t kChannels = 4, class Channel>
+inline void ForChannels(const Channel& channel) {
+  [&]<size_t... k>(std::index_sequence<k...>) { (channel(k), ...); }
+  (std::make_index_sequence<kChannels>());
+}
+
 // Calls pixel(in, out) for each pixel of a row, with its channels of type From and To. Rows need no alignment.
 template <class From, class To, size_t kFromChannels = 4, size_t kToChannels = 4, class Pixel>
 inline void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Pixel& pixel) {
@@ -33,7 +41,8 @@ inline void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Pixe
     To out[kToChannels];
     std::memcpy(in, src + i * sizeof in, sizeof in);
     pixel(in, out);
-    std::memcpy(dst + i * sizeof out, out, sizeof out);
+    ForChannels<kToChannels>(
+        [&](size_t k) { std::memcpy(dst + i * sizeof out + k * sizeof(To), out + k, sizeof(To)); });
   }
 }
 
@@ -41,7 +50,7 @@ inline void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Pixe
 template <class From, class To, AlphaWrite kAlpha, class Channel>
 inline void MapChannels(const uint8_t* src, uint8_t* dst, size_t count, const Channel& channel) {
   MapPixels<From, To>(src, dst, count, [&](const From* in, To* out) {
-    for (int k = 0; k < 4; ++k) out[k] = channel(in[k]);
+    ForChannels([&](size_t k) { out[k] = channel(in[k]); });
     if constexpr (kAlpha != AlphaWrite::Keep) out[AlphaIndex(kAlpha)] = kFullScale<To>;
   });
 }

@@ -89,7 +89,7 @@ template <class To>
 void Reverse(const uint8_t* src, uint8_t* dst, size_t count) {
   using T = typename To::Type;
   MapPixels<T, T>(src, dst, count, [](const T* in, T* out) {
-    for (int k = 0; k < 4; ++k) out[k] = in[3 - k];
+    ForChannels([&](size_t k) { out[k] = in[3 - k]; });
     if constexpr (To::kAlpha != AlphaWrite::Keep) out[AlphaIndex(To::kAlpha)] = kFullScale<T>;
   });
 }

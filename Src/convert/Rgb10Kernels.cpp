@@ -179,7 +179,7 @@ namespace {
 template <class To, class Channel>
 void MapFromRgb10(const uint8_t* src, uint8_t* dst, size_t count, const Channel& channel) {
   MapPixels<uint32_t, To, 1, 4>(src, dst, count, [&](const uint32_t* word, To* out) {
-    for (int k = 0; k < 3; ++k) out[k] = channel((*word >> (22 - 10 * k)) & 1023);
+    ForChannels<3>([&](size_t k) { out[k] = channel((*word >> (22 - 10 * k)) & 1023); });
     out[3] = kFullScale<To>;
   });
 }
@@ -188,7 +188,7 @@ template <class From, class Code>
 void MapToRgb10(const uint8_t* src, uint8_t* dst, size_t count, const Code& code) {
   MapPixels<From, uint32_t, 4, 1>(src, dst, count, [&](const From* in, uint32_t* word) {
     *word = 0;
-    for (int k = 0; k < 3; ++k) *word |= static_cast<uint32_t>(code(in[k])) << (22 - 10 * k);
+    ForChannels<3>([&](size_t k) { *word |= static_cast<uint32_t>(code(in[k])) << (22 - 10 * k); });
   });
 }
 
