@@ -24,21 +24,22 @@ namespace hn = hwy::HWY_NAMESPACE;
 namespace power_detail {
 using V = hn::Vec<hn::ScalableTag<float>>;
 }
-template <PowerCore kCore>
-HWY_INLINE power_detail::V Power(power_detail::V x, const PowerExponent& y) {
-  return power_detail::V(vexel::Power(x.raw, y));
+namespace power_detail {
+template <PowerCore kCore, bool kSigned>
+HWY_INLINE V Power1(V x, const PowerExponent& y) {
+  return V(kSigned ? vexel::SignedPower(x.raw, y) : vexel::Power(x.raw, y));
 }
+template <PowerCore kCore, bool kSigned>
+HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
+  a = Power1<kCore, kSigned>(a, y);
+  b = Power1<kCore, kSigned>(b, y);
+  c = Power1<kCore, kSigned>(c, y);
+}
+}  // namespace power_detail
 HWY_INLINE power_detail::V Log(power_detail::V x) { return power_detail::V(vexel::Log(x.raw)); }
 HWY_INLINE power_detail::V Log10(power_detail::V x) { return power_detail::V(vexel::Log10(x.raw)); }
 HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::V(vexel::Exp(x.raw)); }
 HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::V(vexel::Exp10(x.raw)); }
-
-template <PowerCore kCore>
-HWY_INLINE void Power3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  a = Power<kCore>(a, y);
-  b = Power<kCore>(b, y);
-  c = Power<kCore>(c, y);
-}
 
 #else
 
@@ -227,29 +228,32 @@ HWY_INLINE V PowerCoreOf(V x, const PowerExponent& y) {
   return PowerDouble<kAll>(x, y);
 }
 
-// Any argument at all.
-template <PowerCore kCore>
+// Any argument at all. kSigned: sign(x) * |x|^y, NaN without a sign.
+template <PowerCore kCore, bool kSigned>
 HWY_NOINLINE V PowerAll(V x, const PowerExponent& y) {
   const D d;
   const DI di;
-  const VI bits = hn::BitCast(di, x);
+  const VI given = hn::BitCast(di, kSigned ? hn::Abs(x) : x);
+  const auto isZero = hn::Eq(hn::Add(given, given), hn::Zero(di));
+  const VI bits = hn::IfThenZeroElse(isZero, given);
   const VI infinity = hn::Set(di, 0x7f800000);
-  VI result = hn::BitCast(di, PowerCoreOf<true, kCore>(x, y));
-  result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, result);
+  VI result = hn::BitCast(di, PowerCoreOf<true, kCore>(hn::BitCast(d, bits), y));
+  result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, hn::IfThenZeroElse(isZero, result));
+  if constexpr (kSigned) result = hn::Or(result, hn::BitCast(di, hn::And(x, hn::SignBit(d))));
   result = hn::IfThenElse(hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, hn::Zero(di))), hn::Set(di, 0x7fc00000), result);
-  result = hn::IfThenZeroElse(hn::Eq(hn::Add(bits, bits), hn::Zero(di)), result);
   return hn::BitCast(d, result);
 }
 
-HWY_NOINLINE V PowerScalar(V x, const PowerExponent& y) {
+template <bool kSigned>
+HWY_NOINLINE V PowerLaneByLane(V x, const PowerExponent& y) {
   const D d;
   HWY_ALIGN float lanes[hn::MaxLanes(D())];
   hn::Store(x, d, lanes);
-  for (float& lane : lanes) lane = vexel::Power(lane, y);
+  for (float& lane : lanes) lane = kSigned ? vexel::SignedPower(lane, y) : vexel::Power(lane, y);
   return hn::Load(d, lanes);
 }
 
-// Lanes that the fast form does not cover; zero, which is common, it does.
+// Lanes that the fast form does not cover; zero, which is common, it does. `bits` of a magnitude or of any float.
 HWY_INLINE hn::Mask<DI> OutsideFastRange(VI bits, hn::Mask<DI> isZero, const PowerExponent& y) {
   const DI di;
   const uint32_t flip = 0x80000000;  // Unsigned comparison by a signed one.
@@ -258,52 +262,53 @@ HWY_INLINE hn::Mask<DI> OutsideFastRange(VI bits, hn::Mask<DI> isZero, const Pow
   return hn::AndNot(isZero, hn::Gt(above, span));
 }
 
-}  // namespace power_detail
+template <PowerCore kCore, bool kSigned>
+struct FastPower {
+  HWY_INLINE FastPower(V x, const PowerExponent& y)
+      : argument(kSigned ? hn::Abs(x) : x),
+        isZero(hn::Eq(hn::BitCast(DI(), argument), hn::Zero(DI()))),
+        outside(OutsideFastRange(hn::BitCast(DI(), argument), isZero, y)) {}
+  // x again, so that it need not be kept.
+  HWY_INLINE V Result(V x, const PowerExponent& y) const {
+    const V power = hn::IfThenZeroElse(hn::RebindMask(D(), isZero), PowerCoreOf<false, kCore>(argument, y));
+    return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(D()))) : power;
+  }
+  V argument;
+  hn::Mask<DI> isZero, outside;
+};
 
-// Three vectors at once (the colour channels of pixels): a, b, c <- their powers, arguments as for Power(float).
-template <PowerCore kCore>
-HWY_INLINE void Power3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  namespace pd = power_detail;
+template <PowerCore kCore, bool kSigned>
+HWY_INLINE V Power1(V x, const PowerExponent& y) {
   if constexpr (kCore == PowerCore::Scalar) {
-    a = pd::PowerScalar(a, y);
-    b = pd::PowerScalar(b, y);
-    c = pd::PowerScalar(c, y);
+    return PowerLaneByLane<kSigned>(x, y);
   } else {
-    const pd::D d;
-    const pd::DI di;
-    const pd::VI zero = hn::Zero(di);
-    const auto zeroA = hn::Eq(hn::BitCast(di, a), zero);
-    const auto zeroB = hn::Eq(hn::BitCast(di, b), zero);
-    const auto zeroC = hn::Eq(hn::BitCast(di, c), zero);
-    const auto outside = hn::Or(
-        hn::Or(pd::OutsideFastRange(hn::BitCast(di, a), zeroA, y), pd::OutsideFastRange(hn::BitCast(di, b), zeroB, y)),
-        pd::OutsideFastRange(hn::BitCast(di, c), zeroC, y));
-    if (HWY_UNLIKELY(!hn::AllFalse(di, outside))) {
-      a = pd::PowerAll<kCore>(a, y);
-      b = pd::PowerAll<kCore>(b, y);
-      c = pd::PowerAll<kCore>(c, y);
-      return;
+    const FastPower<kCore, kSigned> fast(x, y);
+    if (HWY_UNLIKELY(!hn::AllFalse(DI(), fast.outside))) return PowerAll<kCore, kSigned>(x, y);
+    return fast.Result(x, y);
+  }
+}
+
+template <PowerCore kCore, bool kSigned>
+HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
+  if constexpr (kCore == PowerCore::Scalar) {
+    a = PowerLaneByLane<kSigned>(a, y);
+    b = PowerLaneByLane<kSigned>(b, y);
+    c = PowerLaneByLane<kSigned>(c, y);
+  } else {
+    const FastPower<kCore, kSigned> fastA(a, y), fastB(b, y), fastC(c, y);
+    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Or(hn::Or(fastA.outside, fastB.outside), fastC.outside)))) {
+      a = PowerAll<kCore, kSigned>(a, y);
+      b = PowerAll<kCore, kSigned>(b, y);
+      c = PowerAll<kCore, kSigned>(c, y);
+    } else {
+      a = fastA.Result(a, y);
+      b = fastB.Result(b, y);
+      c = fastC.Result(c, y);
     }
-    a = hn::IfThenZeroElse(hn::RebindMask(d, zeroA), pd::PowerCoreOf<false, kCore>(a, y));
-    b = hn::IfThenZeroElse(hn::RebindMask(d, zeroB), pd::PowerCoreOf<false, kCore>(b, y));
-    c = hn::IfThenZeroElse(hn::RebindMask(d, zeroC), pd::PowerCoreOf<false, kCore>(c, y));
   }
 }
 
-// One vector; kCore must be y.core.
-template <PowerCore kCore>
-HWY_INLINE power_detail::V Power(power_detail::V x, const PowerExponent& y) {
-  namespace pd = power_detail;
-  if constexpr (kCore == PowerCore::Scalar) {
-    return pd::PowerScalar(x, y);
-  } else {
-    const pd::DI di;
-    const auto isZero = hn::Eq(hn::BitCast(di, x), hn::Zero(di));
-    if (HWY_UNLIKELY(!hn::AllFalse(di, pd::OutsideFastRange(hn::BitCast(di, x), isZero, y))))
-      return pd::PowerAll<kCore>(x, y);
-    return hn::IfThenZeroElse(hn::RebindMask(pd::D(), isZero), pd::PowerCoreOf<false, kCore>(x, y));
-  }
-}
+}  // namespace power_detail
 
 namespace power_detail {
 
@@ -345,25 +350,40 @@ HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::ExpOf
 
 #endif  // HWY_TARGET
 
-// sign(x) * |x|^y on three vectors: a power law kept odd-symmetric.
+// Arguments and results as for the scalar functions; kCore must be y.core.
 template <PowerCore kCore>
-HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  const hn::ScalableTag<float> d;
-  const auto sign = hn::SignBit(d);
-  const auto signA = hn::And(a, sign), signB = hn::And(b, sign), signC = hn::And(c, sign);
-  a = hn::Abs(a);
-  b = hn::Abs(b);
-  c = hn::Abs(c);
-  Power3<kCore>(a, b, c, y);
-  a = hn::Or(a, signA);
-  b = hn::Or(b, signB);
-  c = hn::Or(c, signC);
+HWY_INLINE power_detail::V Power(power_detail::V x, const PowerExponent& y) {
+  return power_detail::Power1<kCore, false>(x, y);
 }
-
 template <PowerCore kCore>
 HWY_INLINE power_detail::V SignedPower(power_detail::V x, const PowerExponent& y) {
-  const auto sign = hn::And(x, hn::SignBit(hn::ScalableTag<float>()));
-  return hn::Or(Power<kCore>(hn::Abs(x), y), sign);
+  return power_detail::Power1<kCore, true>(x, y);
+}
+
+// Three vectors at once, the colour channels of pixels: a, b, c <- their powers.
+template <PowerCore kCore>
+HWY_INLINE void Power3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
+  power_detail::Power3<kCore, false>(a, b, c, y);
+}
+template <PowerCore kCore>
+HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
+  power_detail::Power3<kCore, true>(a, b, c, y);
+}
+
+// For exponents whose core is known only at run time.
+HWY_INLINE power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
+  if (y.core == PowerCore::Float) return Power<PowerCore::Float>(x, y);
+  if (y.core == PowerCore::Double) return Power<PowerCore::Double>(x, y);
+  return Power<PowerCore::Scalar>(x, y);
+}
+HWY_INLINE void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
+  if (y.core == PowerCore::Float) {
+    SignedPower3<PowerCore::Float>(a, b, c, y);
+  } else if (y.core == PowerCore::Double) {
+    SignedPower3<PowerCore::Double>(a, b, c, y);
+  } else {
+    SignedPower3<PowerCore::Scalar>(a, b, c, y);
+  }
 }
 
 }  // namespace HWY_NAMESPACE

@@ -128,6 +128,7 @@ float Power(float x, const PowerExponent& y) noexcept {
 float Power(float x, float y) noexcept { return Power(x, PowerExponent(y)); }
 
 float SignedPower(float x, const PowerExponent& y) noexcept {
+  if (IsNaN(x)) return kQuietNaN;
   const uint32_t sign = std::bit_cast<uint32_t>(x) & 0x80000000;
   const float magnitude = Power(std::bit_cast<float>(std::bit_cast<uint32_t>(x) ^ sign), y);
   return std::bit_cast<float>(std::bit_cast<uint32_t>(magnitude) | sign);

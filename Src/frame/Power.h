@@ -121,7 +121,7 @@ struct PowerExponent {
 float Power(float x, const PowerExponent& y) noexcept;
 float Power(float x, float y) noexcept;
 
-// sign(x) * |x|^y: a power law kept odd-symmetric.
+// sign(x) * |x|^y: a power law kept odd-symmetric. NaN gives NaN without a sign.
 float SignedPower(float x, const PowerExponent& y) noexcept;
 
 // Natural and decimal logarithm: -inf for 0, NaN for negative x.

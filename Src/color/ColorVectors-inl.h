@@ -1,0 +1,140 @@
+// Pixels of four floats as one vector per channel, and the linear-light steps on them. Scalar forms: PlainPixels.h.
+#if defined(VEXEL_COLOR_COLORVECTORS_INL_H_) == defined(HWY_TARGET_TOGGLE)
+#ifdef VEXEL_COLOR_COLORVECTORS_INL_H_
+#undef VEXEL_COLOR_COLORVECTORS_INL_H_
+#else
+#define VEXEL_COLOR_COLORVECTORS_INL_H_
+#endif
+
+#include <cstddef>
+#include <cstring>
+
+#include <hwy/highway.h>
+
+#include "color/PixelKernels.h"
+#include "frame/Power-inl.h"
+
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace hn = hwy::HWY_NAMESPACE;
+
+using ColorTag = hn::ScalableTag<float>;
+using ColorVector = hn::Vec<ColorTag>;
+
+struct RgbVectors {
+  ColorVector r, g, b;
+};
+
+// change(RgbVectors&) on whole blocks; the last pixels go through the same body on a copy padded with zeros.
+template <class Change>
+HWY_INLINE void ForEachPixelBlock(const float* src, float* dst, size_t count, const Change& change) {
+  const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
+  HWY_ALIGN float block[4 * hn::MaxLanes(ColorTag())];
+  for (size_t i = 0; i < count; i += lanes) {
+    const float* from = src + 4 * i;
+    float* to = dst + 4 * i;
+    const size_t rest = count - i;
+    if (HWY_UNLIKELY(rest < lanes)) {
+      std::memset(block, 0, sizeof block);
+      std::memcpy(block, from, rest * 4 * sizeof(float));
+      from = to = block;
+    }
+    RgbVectors c;
+    ColorVector a;
+    hn::LoadInterleaved4(d, from, c.b, c.g, c.r, a);
+    change(c);
+    hn::StoreInterleaved4(c.b, c.g, c.r, a, d, to);
+    if (HWY_UNLIKELY(rest < lanes)) std::memcpy(dst + 4 * i, block, rest * 4 * sizeof(float));
+  }
+}
+
+// A matrix spread over vectors once per call.
+struct MatrixVectors {
+  HWY_INLINE explicit MatrixVectors(const Matrix3& matrix) {
+    for (int i = 0; i < 9; ++i) m[i] = matrix.m[i];
+  }
+  HWY_INLINE ColorVector Row(int row, const RgbVectors& c) const {
+    const ColorTag d;
+    const float* w = m + 3 * row;
+    return hn::Add(hn::Add(hn::Mul(hn::Set(d, w[0]), c.r), hn::Mul(hn::Set(d, w[1]), c.g)),
+                   hn::Mul(hn::Set(d, w[2]), c.b));
+  }
+  HWY_INLINE void operator()(RgbVectors& c) const {
+    const RgbVectors in = c;
+    c.r = Row(0, in);
+    c.g = Row(1, in);
+    c.b = Row(2, in);
+  }
+  float m[9];
+};
+
+HWY_INLINE ColorVector WithSignOf(ColorVector magnitude, ColorVector c) {
+  const ColorTag d;
+  const auto negative = hn::VecFromMask(d, hn::Lt(c, hn::Zero(d)));
+  return hn::Xor(magnitude, hn::And(negative, hn::SignBit(d)));
+}
+
+HWY_INLINE ColorVector Luma(const RgbVectors& c, const LumaWeights& luma) {
+  const ColorTag d;
+  return hn::Add(hn::Add(hn::Mul(hn::Set(d, luma.r), c.r), hn::Mul(hn::Set(d, luma.g), c.g)),
+                 hn::Mul(hn::Set(d, luma.b), c.b));
+}
+
+HWY_NOINLINE void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
+  const ColorTag d;
+  const auto zero = hn::Zero(d);
+  const auto one = hn::Set(d, 1.0f);
+  const ColorVector y = Luma(c, luma);
+  const auto negR = hn::Lt(c.r, zero), negG = hn::Lt(c.g, zero), negB = hn::Lt(c.b, zero);
+  const ColorVector downR = hn::Sub(y, c.r), downG = hn::Sub(y, c.g), downB = hn::Sub(y, c.b);
+  const auto stuck = hn::Or(hn::Or(hn::And(negR, hn::Eq(downR, zero)), hn::And(negG, hn::Eq(downG, zero))),
+                            hn::And(negB, hn::Eq(downB, zero)));
+  const auto pull = hn::AndNot(stuck, hn::Or(hn::Or(negR, negG), negB));
+  const ColorVector t =
+      hn::Min(hn::Min(hn::IfThenElse(negR, hn::Div(y, downR), one), hn::IfThenElse(negG, hn::Div(y, downG), one)),
+              hn::IfThenElse(negB, hn::Div(y, downB), one));
+  const auto holds = hn::Ge(y, zero);
+  const auto move = [&](ColorVector v) HWY_ATTR {
+    const ColorVector pulled = hn::Add(y, hn::Mul(hn::Sub(v, y), t));
+    return hn::IfThenElse(pull, hn::IfThenElse(holds, hn::Max(pulled, zero), pulled), v);
+  };
+  c = {move(c.r), move(c.g), move(c.b)};
+}
+
+HWY_NOINLINE void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
+  const ColorTag d;
+  const auto one = hn::Set(d, 1.0f);
+  const auto over = hn::Or(hn::Or(hn::Gt(c.r, one), hn::Gt(c.g, one)), hn::Gt(c.b, one));
+  const ColorVector least = hn::Min(hn::Min(c.r, c.g), c.b);
+  const ColorVector most = hn::Max(hn::Max(c.r, c.g), c.b);
+  const ColorVector s = hn::Div(one, hn::Sub(most, least));
+  const auto part = [&](float weight, ColorVector v)
+                        HWY_ATTR { return hn::Mul(hn::Mul(hn::Set(d, weight), hn::Sub(v, least)), s); };
+  const ColorVector weighted = hn::Add(hn::Add(part(luma.r, c.r), part(luma.g, c.g)), part(luma.b, c.b));
+  const ColorVector pivot = hn::Min(hn::Max(weighted, hn::Set(d, 0.15f)), hn::Set(d, 0.9f));
+  const ColorVector k = hn::Div(hn::Sub(one, pivot), hn::Sub(most, pivot));
+  const auto move = [&](ColorVector v) HWY_ATTR {
+    const ColorVector scaled = hn::Min(one, hn::Add(hn::Mul(hn::Sub(v, pivot), k), pivot));
+    return hn::IfThenElse(over, hn::IfThenElse(hn::Eq(v, most), one, scaled), v);
+  };
+  c = {move(c.r), move(c.g), move(c.b)};
+}
+
+// Most pixels lie inside the gamut: the divisions wait for one that does not.
+HWY_INLINE void CompressGamut(RgbVectors& c, const LumaWeights& luma) {
+  const ColorTag d;
+  const auto zero = hn::Zero(d);
+  const auto one = hn::Set(d, 1.0f);
+  const auto negative = hn::Or(hn::Or(hn::Lt(c.r, zero), hn::Lt(c.g, zero)), hn::Lt(c.b, zero));
+  if (!hn::AllFalse(d, negative)) PullNegatives(c, luma);
+  const auto over = hn::Or(hn::Or(hn::Gt(c.r, one), hn::Gt(c.g, one)), hn::Gt(c.b, one));
+  if (!hn::AllFalse(d, over)) ScaleOver(c, luma);
+}
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+
+#endif
