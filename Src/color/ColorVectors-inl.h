@@ -82,6 +82,14 @@ HWY_INLINE ColorVector Luma(const RgbVectors& c, const LumaWeights& luma) {
                  hn::Mul(hn::Set(d, luma.b), c.b));
 }
 
+HWY_INLINE ColorVector LookupUnit(ColorVector v, const float* table, int size) {
+  const ColorTag d;
+  const hn::RebindToSigned<ColorTag> di;
+  const auto unit = hn::Min(hn::Max(v, hn::Zero(d)), hn::Set(d, 1.0f));
+  const auto index = hn::ConvertTo(di, hn::Mul(unit, hn::Set(d, static_cast<float>(size - 1))));
+  return hn::GatherIndex(d, table, index);
+}
+
 HWY_NOINLINE void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
   const ColorTag d;
   const auto zero = hn::Zero(d);

@@ -43,6 +43,11 @@ inline float Most(float a, float b) { return a > b ? a : b; }
 
 inline float WithSignOf(float magnitude, float c) { return c < 0.0f ? -magnitude : magnitude; }
 
+// Looks up a value of [0, 1] in a table without interpolation; values outside are held at the ends, NaN at the first.
+inline float LookupUnit(float v, const float* table, int size) {
+  return table[static_cast<int>(Least(Most(v, 0.0f), 1.0f) * static_cast<float>(size - 1))];
+}
+
 // Brings a colour outside [0, 1] inside. Rounding could leave a channel just outside; it is held at the bound, because
 // the encoding that follows makes 1e-9 visible.
 inline void CompressGamut(LinearRgb& c, const LumaWeights& luma) {

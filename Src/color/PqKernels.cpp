@@ -1,0 +1,147 @@
+// SMPTE ST 2084 from and to the Rec.709 working space.
+#include <cmath>
+#include <cstddef>
+#include <cstring>
+
+#include "color/HdrConstants.h"
+#include "color/PixelKernels.h"
+#include "color/PlainPixels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "color/PqKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "color/ColorVectors-inl.h"
+
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+
+void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
+  const PqJob local = job;
+  const MatrixVectors matrix(local.matrix);
+  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
+    const ColorTag d;
+    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4);
+    matrix(c);
+    const RgbVectors linear = c;
+    const auto scaled = [&](ColorVector v) HWY_ATTR { return hn::Mul(hn::Abs(v), hn::Set(d, 0.01f)); };
+    c = {scaled(c.r), scaled(c.g), scaled(c.b)};
+    Power3<PowerCore::Float>(c.r, c.g, c.b, kPqM1);
+    const auto ratio = [&](ColorVector y) HWY_ATTR {
+      return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
+                     hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
+    };
+    c = {ratio(c.r), ratio(c.g), ratio(c.b)};
+    Power3<PowerCore::Double>(c.r, c.g, c.b, kPqM2);
+    const auto scale = hn::Set(d, local.scale);
+    c = {WithSignOf(hn::Mul(c.r, scale), linear.r), WithSignOf(hn::Mul(c.g, scale), linear.g),
+         WithSignOf(hn::Mul(c.b, scale), linear.b)};
+  });
+}
+
+void PqTableToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
+  const PqJob local = job;
+  const MatrixVectors matrix(local.matrix);
+  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
+    c = {LookupUnit(c.r, local.table, kPqTableSize), LookupUnit(c.g, local.table, kPqTableSize),
+         LookupUnit(c.b, local.table, kPqTableSize)};
+    matrix(c);
+    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
+  });
+}
+
+template <bool kCompressed>
+HWY_INLINE void PqToRec709Loop(const float* src, float* dst, size_t count, const PqJob& job) {
+  const PqJob local = job;
+  const MatrixVectors matrix(local.matrix);
+  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
+    const ColorTag d;
+    const RgbVectors in = c;
+    const auto scale = hn::Set(d, local.scale);
+    c = {hn::Mul(hn::Abs(c.r), scale), hn::Mul(hn::Abs(c.g), scale), hn::Mul(hn::Abs(c.b), scale)};
+    Power3<PowerCore::Float>(c.r, c.g, c.b, kPqInverseM2);
+    const auto ratio = [&](ColorVector e) HWY_ATTR {
+      return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)))),
+                     hn::Zero(d));
+    };
+    c = {ratio(c.r), ratio(c.g), ratio(c.b)};
+    Power3<PowerCore::Double>(c.r, c.g, c.b, kPqInverseM1);
+    const auto light = [&](ColorVector v, ColorVector signal)
+                           HWY_ATTR { return WithSignOf(hn::Mul(v, hn::Set(d, 100.0f)), signal); };
+    c = {light(c.r, in.r), light(c.g, in.g), light(c.b, in.b)};
+    if (local.applyMatrix) matrix(c);
+    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
+    if constexpr (kCompressed) CompressGamut(c, local.luma);
+  });
+}
+
+void PqToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
+  PqToRec709Loop<false>(src, dst, count, job);
+}
+void PqToRec709Compressed(const float* src, float* dst, size_t count, const PqJob& job) {
+  PqToRec709Loop<true>(src, dst, count, job);
+}
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+
+#if HWY_ONCE
+
+#include "frame/KernelTable.h"
+
+namespace vexel {
+namespace plain {
+
+void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
+  ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
+    ForEachChannel(c, [](float v) { return SignedPower(v, kPower2_4); });
+    c = Apply(job.matrix, c);
+    ForEachChannel(c, [&](float v) {
+      const float y = Power(std::fabs(v) * 0.01f, kPqM1);
+      return WithSignOf(Power((kPqC2 * y + kPqC1) / (kPqC3 * y + 1.0f), kPqM2) * job.scale, v);
+    });
+  });
+}
+
+void PqTableToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
+  ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
+    ForEachChannel(c, [&](float v) { return LookupUnit(v, job.table, kPqTableSize); });
+    c = Apply(job.matrix, c);
+    ForEachChannel(c, [](float v) { return SignedPower(v, kPower1Over2_4); });
+  });
+}
+
+LinearRgb PqPixelToRec709(LinearRgb c, const PqJob& job) {
+  ForEachChannel(c, [&](float v) {
+    const float e = Power(std::fabs(v) * job.scale, kPqInverseM2);
+    const float ratio = Most((e - kPqC1) / (kPqC2 - kPqC3 * e), 0.0f);
+    return WithSignOf(Power(ratio, kPqInverseM1) * 100.0f, v);
+  });
+  if (job.applyMatrix) c = Apply(job.matrix, c);
+  ForEachChannel(c, [](float v) { return SignedPower(v, kPower1Over2_4); });
+  return c;
+}
+
+void PqToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
+  ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) { c = PqPixelToRec709(c, job); });
+}
+void PqToRec709Compressed(const float* src, float* dst, size_t count, const PqJob& job) {
+  ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
+    c = PqPixelToRec709(c, job);
+    CompressGamut(c, job.luma);
+  });
+}
+
+}  // namespace plain
+
+const KernelVariants<PqKernel> kRec709ToPq = VX_KERNEL_VARIANTS(Rec709ToPq);
+const KernelVariants<PqKernel> kPqTableToRec709 = VX_KERNEL_VARIANTS(PqTableToRec709);
+const KernelVariants<PqKernel> kPqToRec709 = VX_KERNEL_VARIANTS(PqToRec709);
+const KernelVariants<PqKernel> kPqToRec709Compressed = VX_KERNEL_VARIANTS(PqToRec709Compressed);
+
+}  // namespace vexel
+
+#endif  // HWY_ONCE

@@ -1,0 +1,145 @@
+// Tone compression: luminance through a logarithmic curve with a soft shoulder at both ends, chromaticity kept.
+#include <cmath>
+#include <cstddef>
+#include <cstring>
+
+#include "color/PixelKernels.h"
+#include "color/PlainPixels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "color/ToneKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "color/ColorVectors-inl.h"
+
+namespace vexel {
+#ifndef VEXEL_COLOR_TONE_CONSTANTS_
+#define VEXEL_COLOR_TONE_CONSTANTS_
+constexpr float kDarkest = 1e-6f;         // Below it a pixel has no chromaticity of its own.
+constexpr float kLogScale = 99.99f;       // Linear 1 reaches log10(100.99 a).
+constexpr float kLogRange = 0.01010101f;  // 1 / 99
+#endif
+}  // namespace vexel
+
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+
+HWY_INLINE void DecodeTones(RgbVectors& c, const ToneCurve& curve) {
+  const ColorTag d;
+  const RgbVectors in = c;
+  const auto base = [&](ColorVector v) HWY_ATTR {
+    return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, curve.offset)), hn::Set(d, curve.scale));
+  };
+  c = {base(c.r), base(c.g), base(c.b)};
+  Power3<PowerCore::Float>(c.r, c.g, c.b, curve.exponent);
+  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
+    const auto magnitude = hn::Abs(v);
+    const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
+    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), power, straight), v);
+  };
+  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+}
+
+HWY_INLINE void EncodeTones(RgbVectors& c, const ToneCurve& curve) {
+  const ColorTag d;
+  const RgbVectors in = c;
+  c = {hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)};
+  Power3<PowerCore::Float>(c.r, c.g, c.b, curve.exponent);
+  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
+    const auto magnitude = hn::Abs(v);
+    const auto curved = hn::Add(hn::Mul(power, hn::Set(d, curve.scale)), hn::Set(d, curve.offset));
+    const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
+    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), curved, straight), v);
+  };
+  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+}
+
+// Luminance to compressed luminance.
+HWY_INLINE ColorVector CompressLuminance(ColorVector y, const ToneJob& job) {
+  const ColorTag d;
+  const auto one = hn::Set(d, 1.0f);
+  const auto scaled = hn::Mul(hn::Mul(hn::Max(y, hn::Zero(d)), hn::Set(d, job.a)), hn::Set(d, kLogScale));
+  const auto t = hn::Sub(hn::Mul(Log10(hn::Add(scaled, one)), hn::Set(d, 0.5f)), one);
+  const auto u = hn::Min(hn::Abs(t), one);
+  const auto s = hn::Div(hn::Sub(u, hn::Set(d, job.k)), hn::Set(d, 1.0f - job.k));
+  const auto rest = hn::Sub(one, PowerAny(hn::Sub(one, s), job.shape));
+  const auto curved = hn::Add(hn::Mul(rest, hn::Set(d, 1.0f - job.c)), hn::Set(d, job.c));
+  const auto straight = hn::Mul(u, hn::Set(d, job.b));
+  const auto w = WithSignOf(hn::IfThenElse(hn::Gt(u, hn::Set(d, job.k)), curved, straight), t);
+  // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
+  return hn::Mul(hn::Sub(Exp10(hn::Add(w, one)), one), hn::Set(d, kLogRange));
+}
+
+void CompressTones(const float* src, float* dst, size_t count, const ToneJob& job) {
+  const ToneJob local = job;
+  const MatrixVectors toXyz(local.toXyz), fromXyz(local.fromXyz);
+  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
+    const ColorTag d;
+    DecodeTones(c, local.decode);
+    toXyz(c);
+    const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
+    const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
+    const auto x = hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX));
+    const auto y = hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY));
+    const auto luminance = CompressLuminance(c.g, local);
+    const auto z = hn::Sub(hn::Sub(hn::Set(d, 1.0f), x), y);
+    c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
+    fromXyz(c);
+    EncodeTones(c, local.encode);
+  });
+}
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+
+#if HWY_ONCE
+
+#include "frame/KernelTable.h"
+
+namespace vexel {
+namespace plain {
+
+float CompressLuminance(float y, const ToneJob& job) {
+  const float t = 0.5f * Log10(Most(y, 0.0f) * job.a * kLogScale + 1.0f) - 1.0f;
+  const float u = Least(std::fabs(t), 1.0f);
+  float w = u * job.b;
+  if (u > job.k) {
+    const float s = (u - job.k) / (1.0f - job.k);
+    w = (1.0f - Power(1.0f - s, job.shape)) * (1.0f - job.c) + job.c;
+  }
+  return (Exp10(WithSignOf(w, t) + 1.0f) - 1.0f) * kLogRange;
+}
+
+void CompressTones(const float* src, float* dst, size_t count, const ToneJob& job) {
+  ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
+    ForEachChannel(c, [&curve = job.decode](float v) {
+      const float magnitude = std::fabs(v);
+      return WithSignOf(magnitude > curve.threshold ? Power((magnitude + curve.offset) * curve.scale, curve.exponent)
+                                                    : magnitude * curve.slope,
+                        v);
+    });
+    const LinearRgb xyz = Apply(job.toXyz, c);
+    const float sum = xyz.r + xyz.g + xyz.b;
+    const float x = sum > kDarkest ? xyz.r / sum : job.whiteX;
+    const float y = sum > kDarkest ? xyz.g / sum : job.whiteY;
+    const float luminance = CompressLuminance(xyz.g, job);
+    c = Apply(job.fromXyz, {x * luminance / y, luminance, (1.0f - x - y) * luminance / y});
+    ForEachChannel(c, [&curve = job.encode](float v) {
+      const float magnitude = std::fabs(v);
+      return WithSignOf(magnitude > curve.threshold ? Power(magnitude, curve.exponent) * curve.scale + curve.offset
+                                                    : magnitude * curve.slope,
+                        v);
+    });
+  });
+}
+
+}  // namespace plain
+
+const KernelVariants<ToneKernel> kCompressTones = VX_KERNEL_VARIANTS(CompressTones);
+
+}  // namespace vexel
+
+#endif  // HWY_ONCE

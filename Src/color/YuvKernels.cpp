@@ -1,0 +1,151 @@
+// BT.2020 non-constant-luminance Y'CbCr as floats and from P010.
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+
+#include "color/PixelKernels.h"
+#include "color/PlainPixels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "color/YuvKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "color/ColorVectors-inl.h"
+
+namespace vexel {
+#ifndef VEXEL_COLOR_YUV_CONSTANTS_
+#define VEXEL_COLOR_YUV_CONSTANTS_
+constexpr float kBlueFromCb = 1.8814f, kGreenFromCb = 0.1645f, kGreenFromCr = 0.5713f, kRedFromCr = 1.4746f;
+// Rows Cr, Cb, Y' of R, G, B.
+constexpr float kFromRgb[9] = {0.5f, 0.4598f, 0.0402f, -0.1396f, 0.3604f, 0.5f, 0.2627f, 0.6780f, 0.0593f};
+constexpr int kP010Black = 4096, kP010Neutral = 32768;
+constexpr float kP010LumaRange = 56065.0f, kP010ChromaRange = 57345.0f;
+#endif
+}  // namespace vexel
+
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+
+HWY_INLINE RgbVectors FromYuv(ColorVector y, ColorVector cb, ColorVector cr) {
+  const ColorTag d;
+  return {hn::Add(y, hn::Mul(cr, hn::Set(d, kRedFromCr))),
+          hn::Sub(hn::Sub(y, hn::Mul(cb, hn::Set(d, kGreenFromCb))), hn::Mul(cr, hn::Set(d, kGreenFromCr))),
+          hn::Add(y, hn::Mul(cb, hn::Set(d, kBlueFromCb)))};
+}
+
+// The pixel order V, U, Y, A stands where B, G, R, A stands otherwise.
+void Yuv2020ToRgb(const float* src, float* dst, size_t count) {
+  ForEachPixelBlock(src, dst, count, [](RgbVectors& c) HWY_ATTR { c = FromYuv(c.r, c.g, c.b); });
+}
+
+void RgbToYuv2020(const float* src, float* dst, size_t count) {
+  ForEachPixelBlock(src, dst, count, [](RgbVectors& c) HWY_ATTR {
+    const ColorTag d;
+    const auto product = [&](int i, ColorVector v) HWY_ATTR { return hn::Mul(v, hn::Set(d, kFromRgb[i])); };
+    const auto cr = hn::Sub(hn::Sub(product(0, c.r), product(1, c.g)), product(2, c.b));
+    const auto cb = hn::Add(hn::Sub(product(3, c.r), product(4, c.g)), product(5, c.b));
+    const auto y = hn::Add(hn::Add(product(6, c.r), product(7, c.g)), product(8, c.b));
+    c = {y, cb, cr};
+  });
+}
+
+void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, size_t count) {
+  const ColorTag d;
+  const hn::RebindToSigned<ColorTag> di;
+  const size_t lanes = hn::Lanes(d);
+  if constexpr (hn::MaxLanes(ColorTag()) >= 2) {
+    const hn::Rebind<uint16_t, ColorTag> d16;
+    const hn::Half<hn::RebindToUnsigned<ColorTag>> pairs;
+    const hn::Repartition<uint64_t, ColorTag> d64;
+    HWY_ALIGN uint16_t lumaBlock[hn::MaxLanes(ColorTag())], chromaBlock[hn::MaxLanes(ColorTag())];
+    HWY_ALIGN float rgbBlock[4 * hn::MaxLanes(ColorTag())];
+    for (size_t i = 0; i < count; i += lanes) {
+      const uint16_t *fromLuma = luma + i, *fromChroma = chroma + i;
+      float* to = dst + 4 * i;
+      const size_t rest = count - i;
+      if (HWY_UNLIKELY(rest < lanes)) {
+        std::memset(lumaBlock, 0, sizeof lumaBlock);
+        std::memset(chromaBlock, 0, sizeof chromaBlock);
+        std::memcpy(lumaBlock, fromLuma, rest * sizeof(uint16_t));
+        std::memcpy(chromaBlock, fromChroma, rest * sizeof(uint16_t));
+        fromLuma = lumaBlock;
+        fromChroma = chromaBlock;
+        to = rgbBlock;
+      }
+      // A pair U, V is the low and high half of 32 bits; each goes to both pixels.
+      const auto uv = hn::BitCast(pairs, hn::LoadU(d16, fromChroma));
+      const auto twice = [&](hn::Vec<decltype(pairs)> v) HWY_ATTR {
+        const auto wide = hn::PromoteTo(d64, v);
+        return hn::BitCast(di, hn::Or(wide, hn::ShiftLeft<32>(wide)));
+      };
+      const auto chromaOf = [&](hn::Vec<decltype(di)> code) HWY_ATTR {
+        const auto value =
+            hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Neutral))), hn::Set(d, kP010ChromaRange));
+        return hn::Min(hn::Max(value, hn::Set(d, -0.5f)), hn::Set(d, 0.5f));
+      };
+      const auto cb = chromaOf(twice(hn::And(uv, hn::Set(pairs, 0xffff))));
+      const auto cr = chromaOf(twice(hn::ShiftRight<16>(uv)));
+      const auto code = hn::PromoteTo(di, hn::LoadU(d16, fromLuma));
+      const auto y = hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Black))), hn::Set(d, kP010LumaRange));
+      const auto one = hn::Set(d, 1.0f);
+      const RgbVectors c = FromYuv(hn::Min(hn::Max(y, hn::Zero(d)), one), cb, cr);
+      hn::StoreInterleaved4(c.b, c.g, c.r, one, d, to);
+      if (HWY_UNLIKELY(rest < lanes)) std::memcpy(dst + 4 * i, rgbBlock, rest * 4 * sizeof(float));
+    }
+  }
+}
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+
+#if HWY_ONCE
+
+#include "frame/KernelTable.h"
+
+namespace vexel {
+namespace plain {
+
+LinearRgb FromYuv(float y, float cb, float cr) {
+  return {y + kRedFromCr * cr, y - kGreenFromCb * cb - kGreenFromCr * cr, y + kBlueFromCb * cb};
+}
+
+void Yuv2020ToRgb(const float* src, float* dst, size_t count) {
+  ForEachPlainPixel(src, dst, count, [](LinearRgb& c) { c = FromYuv(c.r, c.g, c.b); });
+}
+
+void RgbToYuv2020(const float* src, float* dst, size_t count) {
+  ForEachPlainPixel(src, dst, count, [](LinearRgb& c) {
+    const float* m = kFromRgb;
+    const float cr = m[0] * c.r - m[1] * c.g - m[2] * c.b;
+    const float cb = m[3] * c.r - m[4] * c.g + m[5] * c.b;
+    c = {m[6] * c.r + m[7] * c.g + m[8] * c.b, cb, cr};
+  });
+}
+
+void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, size_t count) {
+  const auto chromaOf = [](int code) {
+    return Least(Most(static_cast<float>(code - kP010Neutral) / kP010ChromaRange, -0.5f), 0.5f);
+  };
+  for (size_t i = 0; i < count; ++i, dst += 4) {
+    const size_t pair = i & ~size_t{1};
+    const float y = Least(Most(static_cast<float>(luma[i] - kP010Black) / kP010LumaRange, 0.0f), 1.0f);
+    const LinearRgb c = FromYuv(y, chromaOf(chroma[pair]), chromaOf(chroma[pair + 1]));
+    dst[0] = c.b;
+    dst[1] = c.g;
+    dst[2] = c.r;
+    dst[3] = 1.0f;
+  }
+}
+
+}  // namespace plain
+
+const KernelVariants<PixelKernel> kYuv2020ToRgb = VX_KERNEL_VARIANTS(Yuv2020ToRgb);
+const KernelVariants<PixelKernel> kRgbToYuv2020 = VX_KERNEL_VARIANTS(RgbToYuv2020);
+const KernelVariants<P010Kernel> kP010ToRgb2020 = VX_KERNEL_VARIANTS(P010ToRgb2020);
+
+}  // namespace vexel
+
+#endif  // HWY_ONCE
