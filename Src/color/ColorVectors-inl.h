@@ -90,7 +90,7 @@ HWY_INLINE ColorVector LookupUnit(ColorVector v, const float* table, int size) {
   return hn::GatherIndex(d, table, index);
 }
 
-HWY_NOINLINE void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
+HWY_NOINLINE inline void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
   const ColorTag d;
   const auto zero = hn::Zero(d);
   const auto one = hn::Set(d, 1.0f);
@@ -111,7 +111,7 @@ HWY_NOINLINE void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
   c = {move(c.r), move(c.g), move(c.b)};
 }
 
-HWY_NOINLINE void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
+HWY_NOINLINE inline void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
   const ColorTag d;
   const auto one = hn::Set(d, 1.0f);
   const auto over = hn::Or(hn::Or(hn::Gt(c.r, one), hn::Gt(c.g, one)), hn::Gt(c.b, one));

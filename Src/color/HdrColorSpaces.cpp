@@ -21,7 +21,7 @@ struct PqTable {
   PqTable() {
     for (int i = 0; i < kPqTableSize; ++i) {
       const float e = Power(static_cast<float>(i) * (1.0f / (kPqTableSize - 1)), kPqInverseM2);
-      light[i] = Power(Most((e - kPqC1) / (kPqC2 - kPqC3 * e), 0.0f), kPqInverseM1) * 100.0f;
+      light[i] = Power(plain::Most((e - kPqC1) / (kPqC2 - kPqC3 * e), 0.0f), kPqInverseM1) * 100.0f;
     }
   }
   float light[kPqTableSize];

@@ -8,6 +8,7 @@
 #include "color/PixelKernels.h"
 
 namespace vexel {
+namespace plain {
 
 struct LinearRgb {
   float r, g, b;
@@ -74,4 +75,5 @@ inline void CompressGamut(LinearRgb& c, const LumaWeights& luma) {
   }
 }
 
+}  // namespace plain
 }  // namespace vexel

@@ -371,12 +371,13 @@ HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detai
 }
 
 // For exponents whose core is known only at run time.
-HWY_NOINLINE power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
+HWY_NOINLINE inline power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
   if (y.core == PowerCore::Float) return Power<PowerCore::Float>(x, y);
   if (y.core == PowerCore::Double) return Power<PowerCore::Double>(x, y);
   return Power<PowerCore::Scalar>(x, y);
 }
-HWY_NOINLINE void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
+HWY_NOINLINE inline void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c,
+                                         const PowerExponent& y) {
   if (y.core == PowerCore::Float) {
     SignedPower3<PowerCore::Float>(a, b, c, y);
   } else if (y.core == PowerCore::Double) {

@@ -1,0 +1,146 @@
+#include "frame/Power.h"
+
+#include <cmath>
+#include <functional>
+#include <limits>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <xmmintrin.h>
+
+#include "color/power_kernels.h"
+#include "support/Random.h"
+#include "support/Ulp.h"
+
+namespace vexel::testing {
+namespace {
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
+
+// The exponents of the colour spaces, and the ends of the ranges of the two cores.
+const std::vector<float> kExponents = {2.4f,      1.0f / 2.4f,  2.6f,      1.0f / 2.6f, 0.1593017578125f,
+                                       78.84375f, 0.012683313f, 6.277395f, 0.2f,        1.0f / 6.0f,
+                                       2.2f,      1.0f / 2.2f,  0.5f,      1.0f,        0x1p-10f,
+                                       4.0f,      0.98f,        0.9801f,   4.0001f,     0.000976562f,
+                                       127.0f,    128.5f,       1000.0f,   1e-20f,      1e-42f,
+                                       1e8f,      -0.41666f,    -2.4f};
+
+std::vector<float> Grid(uint32_t firstBits, uint32_t lastBits, uint32_t step) {
+  std::vector<float> grid;
+  for (uint64_t bits = firstBits; bits <= lastBits; bits += step)
+    grid.push_back(std::bit_cast<float>(static_cast<uint32_t>(bits)));
+  grid.resize((grid.size() + kPowerBlock - 1) / kPowerBlock * kPowerBlock, grid.back());
+  return grid;
+}
+
+struct Domain {
+  const char* name;
+  uint32_t firstBits, lastBits, step;
+};
+
+// All exponents (denormals too) coarsely, the picture's range finely; the steps are primes, so that mantissas vary.
+const Domain kPositive[] = {{"all", 0, 0x7f800000, 60013}, {"pictures", 0x37800000, 0x41200000, 12007}};
+
+void ExpectWithinOneUlp(const std::string& what, const Domain& domain,
+                        const std::function<void(const float*, float*, size_t)>& f,
+                        const std::function<long double(long double)>& reference) {
+  const std::vector<float> in = Grid(domain.firstBits, domain.lastBits, domain.step);
+  std::vector<float> out(in.size());
+  f(in.data(), out.data(), in.size());
+  int failures = 0;
+  for (size_t i = 0; i < in.size() && failures < 3; ++i) {
+    const auto expected = static_cast<float>(reference(in[i]));
+    if (UlpDistance(expected, out[i]) <= 1) continue;
+    ++failures;
+    ADD_FAILURE() << what << " of " << in[i] << ": " << out[i] << " instead of " << expected;
+  }
+}
+
+TEST(Power, StaysWithinOneUlpOfTheCorrectlyRoundedResult) {
+  for (const Domain& domain : kPositive)
+    for (const float y : kExponents) {
+      const PowerExponent exponent(y);
+      ExpectWithinOneUlp(
+          "power " + std::to_string(y), domain,
+          [&](const float* s, float* d, size_t n) { kPowers[ActiveKernelVariant()](s, d, n, exponent); },
+          [y](long double x) { return std::pow(x, static_cast<long double>(y)); });
+    }
+}
+
+TEST(Power, LogarithmsAndExponentialsStayWithinOneUlp) {
+  const Domain both[] = {{"positive", 0, 0x7f800000, 40009}, {"negative", 0x80000000, 0xff800000, 40009}};
+  const auto run = [](const KernelVariants<FunctionArray>& f) {
+    return [&f](const float* s, float* d, size_t n) { f[ActiveKernelVariant()](s, d, n); };
+  };
+  const Domain nearOne{"near one", 0x3f000000, 0x40000000, 1009};
+  for (const Domain& domain : {kPositive[0], kPositive[1], nearOne}) {
+    ExpectWithinOneUlp("log", domain, run(kLogs), [](long double x) { return std::log(x); });
+    ExpectWithinOneUlp("log10", domain, run(kLog10s), [](long double x) { return std::log10(x); });
+  }
+  for (const Domain& domain : both) {
+    ExpectWithinOneUlp("exp", domain, run(kExps), [](long double x) { return std::exp(x); });
+    ExpectWithinOneUlp("exp10", domain, run(kExp10s), [](long double x) { return std::pow(10.0L, x); });
+  }
+}
+
+std::vector<float> AnyFloats(Random& random) {
+  std::vector<float> values(kPowerBlock * 100);
+  for (float& v : values) {
+    v = std::bit_cast<float>(random.Bits32());
+    if (random.OneIn(2)) v = random.Float(-0.5f, 1.5f);
+    if (random.OneIn(40)) v = std::bit_cast<float>(random.Bits32() & 0x807fffff);
+    if (random.OneIn(40)) v = 0;
+  }
+  const float special[] = {0.0f, -0.0f, 1.0f, -1.0f, kInfinity, -kInfinity, kNaN, 0x1p-149f, 0x1p-126f, 3.4028235e38f};
+  for (const float s : special) values[random.Next() % values.size()] = s;
+  return values;
+}
+
+TEST(Power, EveryVariantGivesTheSameBitsWithAndWithoutFlushToZero) {
+  Random random(5);
+  const uint32_t mode = _mm_getcsr();
+  const auto compare = [&](const std::vector<float>& in, const auto& kernels, const auto&... more) {
+    std::vector<float> expected(in.size()), got(in.size());
+    kernels[KernelVariant::Plain](in.data(), expected.data(), in.size(), more...);
+    for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v)
+      for (const uint32_t flush : {0u, 0x8000u}) {
+        _mm_setcsr(mode | flush);
+        kernels[static_cast<KernelVariant>(v)](in.data(), got.data(), in.size(), more...);
+        _mm_setcsr(mode);
+        for (size_t i = 0; i < in.size(); ++i)
+          ASSERT_TRUE(SameBits(expected[i], got[i])) << "variant " << v << " flush " << flush << " of " << in[i] << ": "
+                                                     << got[i] << " instead of " << expected[i];
+      }
+  };
+  std::vector<float> exponents = kExponents;
+  exponents.insert(exponents.end(), {0.0f, -0.0f, kInfinity, -kInfinity, kNaN});
+  for (const float y : exponents) {
+    SCOPED_TRACE(y);
+    const std::vector<float> in = AnyFloats(random);
+    compare(in, kPowers, PowerExponent(y));
+    compare(in, kSignedPowers, PowerExponent(y));
+  }
+  for (const auto* kernels : {&kLogs, &kLog10s, &kExps, &kExp10s}) compare(AnyFloats(random), *kernels);
+}
+
+TEST(Power, SpecialValuesFollowTheLanguage) {
+  for (const float y : {0.0f, -0.0f, 0.3f, 2.4f, 78.0f, -2.4f, kInfinity, -kInfinity, kNaN})
+    for (const float x : {0.0f, 1.0f, 0.5f, 2.0f, kInfinity, kNaN, 0x1p-140f})
+      EXPECT_EQ(UlpDistance(static_cast<float>(std::pow(static_cast<double>(x), static_cast<double>(y))), Power(x, y)),
+                0)
+          << x << " to the power of " << y;
+  EXPECT_EQ(Power(-0.0f, 2.4f), 0.0f);
+  EXPECT_TRUE(std::isnan(Power(-1.0f, 2.4f)));
+  EXPECT_TRUE(std::isnan(Power(-kInfinity, 2.4f)));
+  const PowerExponent gamma(2.4f);
+  for (const float x : {0.0f, 0.2f, 1.0f, 3.0f, kInfinity})
+    EXPECT_TRUE(SameBits(SignedPower(-x, gamma), -SignedPower(x, gamma))) << x;
+  EXPECT_EQ(Log(0.0f), -kInfinity);
+  EXPECT_TRUE(std::isnan(Log(-1.0f)));
+  EXPECT_EQ(Exp(1000.0f), kInfinity);
+  EXPECT_EQ(Exp10(-1000.0f), 0.0f);
+}
+
+}  // namespace
+}  // namespace vexel::testing
