@@ -108,7 +108,7 @@ void* MemoryCache::Allocate(size_t bytes, size_t* rawSize) noexcept {
 
 void MemoryCache::Recycle(void* memory, size_t rawSize) noexcept {
   Show(memory, rawSize);
-  const Clock::time_point now = Clock::now();
+  const int64_t now = system::CoarseMilliseconds();
   FreeBlock* evicted;
   {
     const std::lock_guard lock(mMutex);
@@ -120,14 +120,14 @@ void MemoryCache::Recycle(void* memory, size_t rawSize) noexcept {
     mNewest = block;
     mCached += rawSize;
     Hide(block + 1, rawSize - sizeof(FreeBlock));
-    evicted = EvictOldest(mLimit, now - kIdleLimit);
+    evicted = EvictOldest(mLimit, now - kIdleMilliseconds);
   }
   Release(evicted);
 }
 
 // Unlinks the oldest blocks until at most `limit` bytes are kept and none was freed before that time; gives them as a
 // chain through `colder`, to be released without the lock.
-MemoryCache::FreeBlock* MemoryCache::EvictOldest(size_t limit, Clock::time_point freedBefore) noexcept {
+MemoryCache::FreeBlock* MemoryCache::EvictOldest(size_t limit, int64_t freedBefore) noexcept {
   FreeBlock* chain = nullptr;
   while (mOldest && (mCached > limit || mOldest->freed < freedBefore)) {
     FreeBlock* const block = mOldest;
@@ -151,7 +151,7 @@ void MemoryCache::SetLimit(size_t bytes) noexcept {
   {
     const std::lock_guard lock(mMutex);
     mLimit = bytes;
-    evicted = EvictOldest(mLimit, Clock::time_point::min());
+    evicted = EvictOldest(mLimit, INT64_MIN);
   }
   Release(evicted);
 }
@@ -160,7 +160,7 @@ void MemoryCache::Trim() noexcept {
   FreeBlock* evicted;
   {
     const std::lock_guard lock(mMutex);
-    evicted = EvictOldest(0, Clock::time_point::min());
+    evicted = EvictOldest(0, INT64_MIN);
   }
   Release(evicted);
 }

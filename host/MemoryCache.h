@@ -2,7 +2,6 @@
 #pragma once
 
 #include <array>
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <mutex>
@@ -29,21 +28,20 @@ class MemoryCache {
   static size_t BlockSize(size_t bytes) noexcept;
 
  private:
-  using Clock = std::chrono::steady_clock;
   static constexpr int kClassCount = 304;
-  static constexpr std::chrono::seconds kIdleLimit{10};
+  static constexpr int64_t kIdleMilliseconds = 10000;
 
   struct FreeBlock {
     FreeBlock *warmer, *colder;  // in its class
     FreeBlock *newer, *older;    // among all
-    Clock::time_point freed;
+    int64_t freed;               // milliseconds
     size_t size;
   };
 
   static int ClassOf(size_t blockSize) noexcept;
   FreeBlock* Take(int sizeClass) noexcept;
   void Unlink(FreeBlock* block) noexcept;
-  FreeBlock* EvictOldest(size_t limit, Clock::time_point freedBefore) noexcept;
+  FreeBlock* EvictOldest(size_t limit, int64_t freedBefore) noexcept;
   static void Release(FreeBlock* chain) noexcept;
 
   mutable std::mutex mMutex;

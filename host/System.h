@@ -15,6 +15,8 @@ void* AlignedMalloc(size_t bytes, size_t alignment) noexcept;
 void AlignedFree(void* block) noexcept;
 uint64_t PhysicalMemory() noexcept;
 
+// Milliseconds of a clock that never goes back; coarse, but cheap to read.
+int64_t CoarseMilliseconds() noexcept;
 uint64_t CurrentThread() noexcept;
 bool IsDebuggerAttached() noexcept;
 

@@ -4,6 +4,7 @@
 #include <dlfcn.h>
 #include <sys/mman.h>
 #include <sys/syscall.h>
+#include <time.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -44,6 +45,12 @@ void AlignedFree(void* block) noexcept { std::free(block); }
 uint64_t PhysicalMemory() noexcept {
   const long pages = sysconf(_SC_PHYS_PAGES), pageBytes = sysconf(_SC_PAGESIZE);
   return pages > 0 && pageBytes > 0 ? static_cast<uint64_t>(pages) * static_cast<uint64_t>(pageBytes) : 0;
+}
+
+int64_t CoarseMilliseconds() noexcept {
+  timespec now;
+  clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
+  return int64_t{now.tv_sec} * 1000 + now.tv_nsec / 1000000;
 }
 
 uint64_t CurrentThread() noexcept { return static_cast<uint64_t>(syscall(SYS_gettid)); }

@@ -41,6 +41,8 @@ uint64_t PhysicalMemory() noexcept {
   return GlobalMemoryStatusEx(&status) ? status.ullTotalPhys : 0;
 }
 
+int64_t CoarseMilliseconds() noexcept { return static_cast<int64_t>(GetTickCount64()); }
+
 uint64_t CurrentThread() noexcept { return GetCurrentThreadId(); }
 bool IsDebuggerAttached() noexcept { return IsDebuggerPresent() != 0; }
 

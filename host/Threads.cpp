@@ -13,8 +13,6 @@
 #include "System.h"
 #include "vexel_host/host.h"
 
-namespace tbb = oneapi::tbb;
-
 namespace zovcore::threads {
 namespace {
 

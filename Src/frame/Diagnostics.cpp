@@ -16,7 +16,9 @@ VX_Result VX_SetDebugFlag(uint32_t index, int32_t value) noexcept {
   vexel::Switch* const switches[] = {&gSwitches.motionPath, nullptr,          &gSwitches.sse,         &gSwitches.sse2,
                                      &gSwitches.sse3,       &gSwitches.ssse3, &gSwitches.sse41,       &gSwitches.sse42,
                                      &gSwitches.avx,        &gSwitches.avx2,  &gSwitches.forceTopLeft};
-  if (index < std::size(switches) && switches[index]) switches[index]->Set(value != 0);
+  if (index >= std::size(switches) || !switches[index]) return VX_Success;
+  switches[index]->Set(value != 0);
+  vexel::ChooseKernelVariant();
   return VX_Success;
 }
 

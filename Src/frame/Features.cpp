@@ -50,15 +50,4 @@ KernelVariant DetectVariant(const Processor& processor) {
   return avx512 ? KernelVariant::Avx512 : KernelVariant::Avx2;
 }
 
-void SetFeatureSwitches(const Features& f) noexcept {
-  gSwitches.sse.Set(f.sse);
-  gSwitches.sse2.Set(f.sse2);
-  gSwitches.sse3.Set(f.sse3);
-  gSwitches.ssse3.Set(f.ssse3);
-  gSwitches.sse41.Set(f.sse41);
-  gSwitches.sse42.Set(f.sse42);
-  gSwitches.avx.Set(f.avx);
-  gSwitches.avx2.Set(f.avx2);
-}
-
 }  // namespace vexel

@@ -32,11 +32,12 @@ class Switch {
 
 struct Switches {
   Switch motionPath, sse, sse2, sse3, ssse3, sse41, sse42, avx, avx2, forceTopLeft;
-  // Not one of the switches that flags reach: AVX-512 kernels belong to the AVX2 switch.
+  // Out of reach of the debug flags: AVX-512 kernels belong to the AVX2 switch.
   Switch noAvx512;
 };
 extern Switches gSwitches;
 
-void SetFeatureSwitches(const Features& features) noexcept;
+// After any change of a switch: settles which kernels run from now on.
+void ChooseKernelVariant() noexcept;
 
 }  // namespace vexel

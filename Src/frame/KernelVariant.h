@@ -1,6 +1,7 @@
 // Kernel variants: which instruction set a call's kernels use.
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 
 namespace vexel {
@@ -11,8 +12,14 @@ namespace vexel {
 enum class KernelVariant : uint8_t { Plain, Ssse3, Sse41, Avx2, Avx512 };
 inline constexpr int kKernelVariantCount = 5;
 
+namespace detail {
+
+extern __attribute__((visibility("hidden"))) std::atomic<KernelVariant> gActiveVariant;
+
+}  // namespace detail
+
 // The best variant that the processor has and the feature switches allow. Read once per API call, then passed down.
-KernelVariant ActiveKernelVariant() noexcept;
+inline KernelVariant ActiveKernelVariant() noexcept { return detail::gActiveVariant.load(std::memory_order_relaxed); }
 
 // The best variant that the processor can run, whatever the switches say.
 KernelVariant ProcessorVariant() noexcept;

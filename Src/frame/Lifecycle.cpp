@@ -2,6 +2,8 @@
 
 #include "frame/DvModule.h"
 #include "frame/Features.h"
+#include "frame/ImagePrimitives.h"
+#include "frame/InitTrace.h"
 #include "frame/Platform.h"
 #include "vexel/vexel.h"
 #include "zovcore/Debug.h"
@@ -12,7 +14,6 @@ namespace {
 
 // Written by VX_Initialize and VX_Terminate only, which one thread calls.
 uint32_t gInitCount = 0;
-constinit CacheInfo gCache;
 
 // Never destroyed: host threads may still be busy while the process ends.
 boost::shared_ptr<zovcore::threads::AsyncExecutor>& Executor() noexcept {
@@ -26,10 +27,27 @@ bool IsKeyTrue(const char* key) noexcept try {
   return false;
 }
 
+void SetFeatureSwitches(const Features& f) noexcept {
+  gSwitches.sse.Set(f.sse);
+  gSwitches.sse2.Set(f.sse2);
+  gSwitches.sse3.Set(f.sse3);
+  gSwitches.ssse3.Set(f.ssse3);
+  gSwitches.sse41.Set(f.sse41);
+  gSwitches.sse42.Set(f.sse42);
+  gSwitches.avx.Set(f.avx);
+  gSwitches.avx2.Set(f.avx2);
+}
+
 void ApplyKeys() noexcept {
   if (IsKeyTrue("VX.disableAVX")) gSwitches.avx.Set(false);
   if (IsKeyTrue("VX.disableAVX2")) gSwitches.avx2.Set(false);
   gSwitches.noAvx512.Set(IsKeyTrue("VX.disableAVX512"));
+}
+
+void InitialisePrimitives() noexcept {
+  using primitives::Domain;
+  for (const Domain domain : {Domain::Channels, Domain::Fills, Domain::Arithmetic})
+    TraceInitWarning(primitives::Initialise(domain));
 }
 
 void CreateExecutor() noexcept try { Executor() = zovcore::threads::CreateCPUBoundExecutor(); } catch (...) {
@@ -37,6 +55,13 @@ void CreateExecutor() noexcept try { Executor() = zovcore::threads::CreateCPUBou
 }
 
 }  // namespace
+
+namespace detail {
+
+// Written by VX_Initialize only.
+constinit CacheInfo gUnifiedCache;
+
+}  // namespace detail
 
 CacheInfo FallbackCache(const Features& features) noexcept {
   if (features.avx || features.avx2) return {3u << 20, 3};
@@ -46,8 +71,6 @@ CacheInfo FallbackCache(const Features& features) noexcept {
 
 bool HasExecutor() noexcept { return Executor() != nullptr; }
 
-CacheInfo UnifiedCache() noexcept { return gCache; }
-
 }  // namespace vexel
 
 VX_Result VX_Initialize() noexcept {
@@ -55,8 +78,10 @@ VX_Result VX_Initialize() noexcept {
   if (++gInitCount != 1) return VX_Success;
   const Features features = DetectFeatures(platform::kProcessor);
   SetFeatureSwitches(features);
-  if (!platform::FindUnifiedCache(gCache)) gCache = FallbackCache(features);
+  if (!platform::FindUnifiedCache(detail::gUnifiedCache)) detail::gUnifiedCache = FallbackCache(features);
   ApplyKeys();
+  ChooseKernelVariant();
+  InitialisePrimitives();
   LoadDvModule();
   CreateExecutor();
   return VX_Success;

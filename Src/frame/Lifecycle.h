@@ -9,8 +9,14 @@ namespace vexel {
 // Whether the host's fan-out may be used.
 bool HasExecutor() noexcept;
 
+namespace detail {
+
+extern CacheInfo gUnifiedCache;
+
+}  // namespace detail
+
 // The cache found at start-up; zero before.
-CacheInfo UnifiedCache() noexcept;
+inline CacheInfo UnifiedCache() noexcept { return detail::gUnifiedCache; }
 
 // What is assumed where the cache cannot be found out.
 CacheInfo FallbackCache(const Features& features) noexcept;

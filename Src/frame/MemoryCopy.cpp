@@ -1,3 +1,5 @@
+#include <emmintrin.h>
+
 #include <cstdint>
 #include <cstring>
 
@@ -17,32 +19,102 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
-using D = hn::ScalableTag<uint8_t>;
+// 32-byte vectors at most: wider ones gain nothing here and lower the clock of some processors.
+using D = hn::CappedTag<uint8_t, 32>;
+using V = hn::VFromD<D>;
+constexpr size_t kLanes = hn::MaxLanes(D());
 constexpr size_t kLine = 64;
 
-// The caller has aligned dst to 64 bytes and counts whole lines.
-void StreamLines(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_t lines) {
-  const D d;
-  constexpr size_t n = hn::MaxLanes(D());
-  for (; lines != 0; --lines, dst += kLine, src += kLine) {
-    // All loads first: stores of one line that leave together fill one write-combining buffer.
-    if constexpr (n == 64) {
-      hn::Stream(hn::LoadU(d, src), d, dst);
-    } else if constexpr (n == 32) {
-      const auto a = hn::LoadU(d, src), b = hn::LoadU(d, src + 32);
-      hn::Stream(a, d, dst);
-      hn::Stream(b, d, dst + 32);
-    } else if constexpr (n == 16) {
-      const auto a = hn::LoadU(d, src), b = hn::LoadU(d, src + 16), c = hn::LoadU(d, src + 32),
-                 e = hn::LoadU(d, src + 48);
-      hn::Stream(a, d, dst);
-      hn::Stream(b, d, dst + 16);
-      hn::Stream(c, d, dst + 32);
-      hn::Stream(e, d, dst + 48);
-    } else {
-      std::memcpy(dst, src, kLine);
-    }
+// kCount vectors held in registers.
+template <size_t kCount>
+struct Block {
+  Block<kCount / 2> low, high;
+  HWY_INLINE explicit Block(const uint8_t* src) : low(src), high(src + kCount / 2 * kLanes) {}
+  HWY_INLINE void StoreU(uint8_t* dst) const {
+    low.StoreU(dst);
+    high.StoreU(dst + kCount / 2 * kLanes);
   }
+  HWY_INLINE void Store(uint8_t* dst) const {
+    low.Store(dst);
+    high.Store(dst + kCount / 2 * kLanes);
+  }
+  HWY_INLINE void Stream(uint8_t* dst) const {
+    low.Stream(dst);
+    high.Stream(dst + kCount / 2 * kLanes);
+  }
+};
+
+template <>
+struct Block<1> {
+  V v;
+  HWY_INLINE explicit Block(const uint8_t* src) : v(hn::LoadU(D(), src)) {}
+  HWY_INLINE void StoreU(uint8_t* dst) const { hn::StoreU(v, D(), dst); }
+  HWY_INLINE void Store(uint8_t* dst) const { hn::Store(v, D(), dst); }
+  HWY_INLINE void Stream(uint8_t* dst) const { hn::Stream(v, D(), dst); }
+};
+
+constexpr size_t kStep = 4 * kLanes;
+
+// The first and the last kCount vectors of an area of kCount to 2 kCount vectors, all read before any is written.
+template <size_t kCount>
+HWY_INLINE void CopyEnds(uint8_t* dst, const uint8_t* src, size_t n) {
+  const Block<kCount> head(src), tail(src + n - kCount * kLanes);
+  head.StoreU(dst);
+  tail.StoreU(dst + n - kCount * kLanes);
+}
+
+// The ends are copied as whole vectors and overlap the aligned middle.
+HWY_INLINE void CopyCached(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_t n) {
+  const Block<1> first(src);
+  const Block<4> last(src + n - kStep);
+  uint8_t* const lastDst = dst + n - kStep;
+  const size_t skip = kLanes - (reinterpret_cast<uintptr_t>(dst) & (kLanes - 1));
+  first.StoreU(dst);
+  src += skip;
+  for (dst += skip; dst < lastDst; dst += kStep, src += kStep) Block<4>(src).Store(dst);
+  last.StoreU(lastDst);
+}
+
+// See StreamCopy.
+void StreamAll(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_t n) {
+  const size_t head = -reinterpret_cast<uintptr_t>(dst) % kLine;
+  if (n < head + kLine) {
+    if (n != 0) std::memcpy(dst, src, n);
+    return;
+  }
+  if (head != 0) std::memcpy(dst, src, head);
+  const size_t tail = (n - head) % kLine, end = n - tail;
+  size_t i = head;
+  for (; i + kStep <= end; i += kStep) Block<4>(src + i).Stream(dst + i);
+  for (; i < end; i += kLanes) Block<1>(src + i).Stream(dst + i);
+  if (tail != 0) std::memcpy(dst + end, src + end, tail);
+}
+
+HWY_NOINLINE VX_Result CopyLong(uint8_t* dst, const uint8_t* src, size_t n) {
+  if (n < UnifiedCache().bytes / 2) {
+    CopyCached(dst, src, n);
+  } else {
+    StreamAll(dst, src, n);
+    StreamFence();
+  }
+  return VX_Success;
+}
+
+// Lengths that a caller may ask for in a tight loop come first: a taken branch more or less shows there.
+VX_Result CopyAll(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
+  if (n >= 2 * kLanes) {
+    if (n <= 4 * kLanes)
+      CopyEnds<2>(dst, src, n);
+    else if (n <= 8 * kLanes)
+      CopyEnds<4>(dst, src, n);
+    else
+      return CopyLong(dst, src, n);
+  } else if (n >= kLanes) {
+    CopyEnds<1>(dst, src, n);
+  } else if (n != 0) {
+    std::memcpy(dst, src, n);
+  }
+  return VX_Success;
 }
 
 }  // namespace HWY_NAMESPACE
@@ -55,35 +127,40 @@ namespace {
 
 namespace plain {
 
-void StreamLines(uint8_t* dst, const uint8_t* src, size_t lines) { std::memcpy(dst, src, lines * 64); }
+void StreamAll(uint8_t* dst, const uint8_t* src, size_t n) {
+  if (n != 0) std::memcpy(dst, src, n);
+}
+
+VX_Result CopyAll(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
+  if (n != 0) std::memcpy(dst, src, n);
+  return VX_Success;
+}
 
 }  // namespace plain
 
-constexpr size_t kLine = 64;
-const KernelVariants<void (*)(uint8_t*, const uint8_t*, size_t)> kStreamLines = VX_KERNEL_VARIANTS(StreamLines);
+constinit const KernelVariants<VX_Result (*)(uint8_t*, const uint8_t*, size_t) noexcept> kCopyAll =
+    VX_KERNEL_VARIANTS(CopyAll);
+constinit const KernelVariants<void (*)(uint8_t*, const uint8_t*, size_t)> kStreamAll = VX_KERNEL_VARIANTS(StreamAll);
 
 }  // namespace
 
 void StreamCopy(void* dst, const void* src, size_t bytes, KernelVariant variant) noexcept {
-  auto* to = static_cast<uint8_t*>(dst);
-  auto* from = static_cast<const uint8_t*>(src);
-  const size_t head = -reinterpret_cast<uintptr_t>(to) % kLine;
-  if (bytes < head + kLine) {
-    if (bytes != 0) std::memcpy(to, from, bytes);
-    return;
-  }
-  std::memcpy(to, from, head);
-  const size_t lines = (bytes - head) / kLine, tail = (bytes - head) % kLine;
-  kStreamLines[variant](to + head, from + head, lines);
-  std::memcpy(to + bytes - tail, from + bytes - tail, tail);
+  kStreamAll[variant](static_cast<uint8_t*>(dst), static_cast<const uint8_t*>(src), bytes);
 }
 
 void StreamFence() noexcept { _mm_sfence(); }
 
 }  // namespace vexel
 
+// Nothing but jumps (which they are only because the kernels cannot throw), the usual one direct: a call, or an indirect
+// jump, would cost as much as a short copy. The AVX-512 variant of the kernel is the same.
 VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) noexcept {
-  if (bytes != 0) std::memcpy(dst, src, bytes);
-  return VX_Success;
+  using namespace vexel;
+  auto* const to = static_cast<uint8_t*>(dst);
+  auto* const from = static_cast<const uint8_t*>(src);
+  const KernelVariant variant = ActiveKernelVariant();
+  if (variant >= KernelVariant::Avx2) [[likely]]
+    return N_AVX2::CopyAll(to, from, bytes);
+  return kCopyAll[variant](to, from, bytes);
 }
 #endif
