@@ -1,6 +1,7 @@
 // Pixel buffers in library-padded rows, and what addresses whole rows of them.
 #include "formats/FormatBits.h"
 #include "frame/Scratch.h"
+#include "frame/SeededBug.h"
 
 namespace vexel {
 namespace {
@@ -26,7 +27,7 @@ VX_Result AllocatePixels(VX_PixelFormat format, int32_t width, int32_t height, v
     if (*pixels) return VX_Success;
   }
   *rawBlock = nullptr;
-  *rowBytes = 0;
+  if (!Has(SeededBug::FailureKeepsValue)) *rowBytes = 0;
   *rawSize = 0;
   return VX_ErrOutOfMemory;
 }
@@ -64,7 +65,8 @@ VX_Result VX_FreeTransientPixelBuffer(VX_PixelFormat format, void* rawBlock, siz
 VX_Result VX_FlipInPlace(void* base, int32_t rowBytes, int32_t width, int32_t height, VX_PixelFormat format) noexcept {
   const int64_t pixelBytes = vexel::UnpaddedRowBytes(format, width);
   if (height < 2 || pixelBytes <= 0) return VX_Success;
-  const auto n = static_cast<size_t>(pixelBytes);
+  const auto n = Has(vexel::SeededBug::FlipMovesPadding) ? static_cast<size_t>(vexel::PaddedRowBytes(format, width))
+                                                         : static_cast<size_t>(pixelBytes);
   VX_SCRATCH(scratch, n);
   if (!scratch) return VX_ErrOutOfMemory;
   auto* const first = static_cast<uint8_t*>(base);

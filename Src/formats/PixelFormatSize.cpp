@@ -1,5 +1,6 @@
 // Sizes of rows and pictures.
 #include "formats/FormatBits.h"
+#include "frame/SeededBug.h"
 
 namespace vexel {
 namespace {
@@ -94,7 +95,7 @@ int64_t UnpaddedRowBytes(VX_PixelFormat format, int64_t width) noexcept {
 
 int64_t PaddedRowBytes(VX_PixelFormat format, int64_t width) noexcept {
   if (IsSpecial(format)) return 0;
-  if (IsV210(format)) return RoundUp<128>((width + 5) / 6 * 16);
+  if (IsV210(format)) return RoundUp<128>((width + (Has(SeededBug::GroupsRoundDown) ? 0 : 5)) / 6 * 16);
   if (Layout(format) == kLayout422) return RoundUp<16>(width * BytesPerPixel422(format));
   return RoundUp<64>(width * BytesPerPixel(format));
 }

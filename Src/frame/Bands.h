@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+#include "frame/SeededBug.h"
+
 namespace vexel {
 
 inline constexpr int kBandRows = 32;
@@ -32,7 +34,9 @@ bool ForEachBand(int rowCount, Rows&& rows) {
   }
   struct BandTask final : Task {
     BandTask(int count, Rows& f) : rowCount(count), rows(f) {}
-    int PieceCount() override { return rowCount / kBandRows + (rowCount % kBandRows != 0); }
+    int PieceCount() override {
+      return rowCount / kBandRows + (rowCount % kBandRows != 0 && !Has(SeededBug::LastBandLost));
+    }
     void ExecutePiece(int piece) override {
       const int first = piece * kBandRows;
       rows(first, rowCount - first < kBandRows ? rowCount : first + kBandRows);

@@ -4,14 +4,18 @@
 #include <cstdint>
 #include <xmmintrin.h>
 
+#include "frame/SeededBug.h"
+
 namespace vexel {
 
-// ORs flush-to-zero (bit 15) and the precision-exception mask (bit 5) into MXCSR. The saved word comes back unchanged, so
-// exceptions raised inside leave no flag behind.
+// ORs flush-to-zero (bit 15) and the precision-exception mask (bit 5) into MXCSR. The saved word comes back unchanged,
+// so exceptions raised inside leave no flag behind.
 class FpModeGuard {
  public:
   FpModeGuard() noexcept : mSaved(_mm_getcsr()) { _mm_setcsr(mSaved | kMode); }
-  ~FpModeGuard() { _mm_setcsr(mSaved); }
+  ~FpModeGuard() {
+    if (!Has(SeededBug::FpModeLeak)) _mm_setcsr(mSaved);
+  }
   FpModeGuard(const FpModeGuard&) = delete;
   FpModeGuard& operator=(const FpModeGuard&) = delete;
 

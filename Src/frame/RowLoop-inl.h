@@ -1,5 +1,5 @@
-// The loop shared by all row kernels: full blocks in place, the rest through the same body on a padded copy, so that the
-// vector part and the tail cannot differ and no byte outside the row is read or written.
+// The loop shared by all row kernels: full blocks in place, the rest through the same body on a padded copy, so that
+// the vector part and the tail cannot differ and no byte outside the row is read or written.
 #if defined(VEXEL_FRAME_ROWLOOP_INL_H_) == defined(HWY_TARGET_TOGGLE)
 #ifdef VEXEL_FRAME_ROWLOOP_INL_H_
 #undef VEXEL_FRAME_ROWLOOP_INL_H_
@@ -12,6 +12,8 @@
 #include <cstring>
 
 #include <hwy/highway.h>
+
+#include "frame/SeededBug.h"
 
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
@@ -27,9 +29,9 @@ HWY_INLINE void RowLoop(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT d
   if (const size_t rest = units - i) {
     alignas(64) uint8_t in[kBlock * kSrcBytes] = {};
     alignas(64) uint8_t out[kBlock * kDstBytes];
-    std::memcpy(in, src + i * kSrcBytes, rest * kSrcBytes);
+    std::memcpy(in, src + i * kSrcBytes, (Has(SeededBug::TailOverread) ? kBlock : rest) * kSrcBytes);
     body(in, out);
-    std::memcpy(dst + i * kDstBytes, out, rest * kDstBytes);
+    std::memcpy(dst + i * kDstBytes, out, (Has(SeededBug::TailOverwrite) ? kBlock : rest) * kDstBytes);
   }
 }
 
@@ -37,6 +39,7 @@ HWY_INLINE void RowLoop(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT d
 // INT32_MIN (Highway's NearestInt saturates upward instead). The narrowing kernels rely on it.
 template <class V, class DI = hn::RebindToSigned<hn::DFromV<V>>>
 HWY_INLINE hn::VFromD<DI> ConvertNearest(V v) {
+  if (HWY_TARGET <= HWY_AVX2 && Has(SeededBug::VariantRounding)) v = hn::Trunc(v);
 #if HWY_TARGET == HWY_AVX3
   if constexpr (sizeof(v) == 64) return hn::VFromD<DI>{_mm512_cvtps_epi32(v.raw)};
   if constexpr (sizeof(v) == 32) return hn::VFromD<DI>{_mm256_cvtps_epi32(v.raw)};

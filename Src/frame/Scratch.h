@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "frame/SeededBug.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
@@ -22,7 +23,9 @@ class Scratch {
     else if (bytes != 0)
       mData = static_cast<uint8_t*>(VX_AllocateTransientMemoryBlock(bytes, &mRaw, &mRawSize));
   }
-  ~Scratch() { VX_FreeTransientMemoryBlock(mRaw, mRawSize); }
+  ~Scratch() {
+    if (!Has(SeededBug::ScratchLeak)) VX_FreeTransientMemoryBlock(mRaw, mRawSize);
+  }
   Scratch(const Scratch&) = delete;
   Scratch& operator=(const Scratch&) = delete;
 
@@ -40,9 +43,9 @@ class Scratch {
 
 // Declares `name`, a Scratch of `bytes` bytes that lives until the end of the scope (its stack part until the function
 // returns, so not inside a loop).
-#define VX_SCRATCH(name, bytes)                                                                                  \
-  const size_t name##Bytes_ = (bytes);                                                                           \
-  ::vexel::Scratch name(name##Bytes_ >= 1 && name##Bytes_ <= ::vexel::kScratchStackLimit                         \
-                            ? alloca(name##Bytes_ + ::vexel::kScratchAlignment - 1)                              \
-                            : nullptr,                                                                           \
+#define VX_SCRATCH(name, bytes)                                                          \
+  const size_t name##Bytes_ = (bytes);                                                   \
+  ::vexel::Scratch name(name##Bytes_ >= 1 && name##Bytes_ <= ::vexel::kScratchStackLimit \
+                            ? alloca(name##Bytes_ + ::vexel::kScratchAlignment - 1)      \
+                            : nullptr,                                                   \
                         name##Bytes_)
