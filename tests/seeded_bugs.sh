@@ -22,7 +22,8 @@ for bug in $(seq "$count"); do
     echo "seeded bug $bug: NOT CAUGHT"
     missed=1
   else
-    echo "seeded bug $bug: caught ($(grep -cE '^\[  FAILED  \] .*[^:]$|^Arena: ' "$build/seeded_bug_$bug.log" || true) reports)"
+    log=$build/seeded_bug_$bug.log
+    echo "seeded bug $bug: caught: $(grep -m1 -E '^Arena: |: Failure$' "$log" || tail -n 1 "$log")"
   fi
 done
 exit $missed

@@ -22,6 +22,8 @@ namespace vexel::testing {
 namespace {
 
 constexpr int kMostSources = 4;
+// What a thread starts with: round to nearest, no flush to zero, all exceptions masked.
+constexpr uint32_t kCallerMode = 0x1F80;
 constexpr uint8_t kFirstPadding = 0x5A, kSecondPadding = 0xA5;
 
 const char* GuardName(Guard guard) {
@@ -162,15 +164,17 @@ std::string Arena::RunOnce(KernelVariant variant, Contents contents, uint64_t se
   if (mCase->expected != VX_Success) mDestination.CopyPixels(mPlain);
 
   LimitKernelVariant(variant);
-  const uint32_t controlWord = _mm_getcsr();
+  const uint32_t ownMode = _mm_getcsr();
+  _mm_setcsr(kCallerMode);
   const VX_Result result = mCase->run(mFrames, mDestination.Frame());
-  const uint32_t controlWordAfter = _mm_getcsr();
+  const uint32_t modeAfter = _mm_getcsr();
+  _mm_setcsr(ownMode);
   LimitKernelVariant(mActive);
 
   if (result != mCase->expected)
     return std::string("returned ") + VX_ResultName(result) + " instead of " + VX_ResultName(mCase->expected);
   // The lower six bits are the sticky exception flags, which row kernels of their own may raise.
-  if ((controlWord ^ controlWordAfter) & ~0x3Fu) return "left another floating-point control word";
+  if ((kCallerMode ^ modeAfter) & ~0x3Fu) return "left another floating-point mode";
   const std::string touched = mDestination.TouchedPadding(padding);
   if (!touched.empty()) return "wrote outside the picture: " + touched;
   mDestination.CopyPixels(pixels);

@@ -2,6 +2,7 @@
 #include "support/Arena.h"
 
 #include <gmock/gmock.h>
+#include <xmmintrin.h>
 
 #include <cmath>
 #include <cstring>
@@ -102,6 +103,13 @@ TEST(Arena, NamesWrongResults) {
   };
   EXPECT_THAT(FailureOf(floatCase(0, 0x80000000)), HasSubstr("wrong bits"));
   EXPECT_TRUE(RunArena(floatCase(0x7FC00000, 0xFFC00001)));
+}
+
+TEST(Arena, NamesALostFloatingPointMode) {
+  const uint32_t mode = _mm_getcsr();
+  EXPECT_THAT(FailureOf(CopyAnd([](uint8_t*, uint8_t*, size_t) { _mm_setcsr(_mm_getcsr() | 0x8000); })),
+              HasSubstr("left another floating-point mode"));
+  EXPECT_EQ(_mm_getcsr(), mode);
 }
 
 TEST(Arena, NamesWrongCodes) {
