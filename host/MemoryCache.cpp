@@ -3,15 +3,9 @@
 #include <bit>
 #include <new>
 
+#include "Sanitizers.h"
 #include "System.h"
 
-#if defined(__SANITIZE_ADDRESS__)
-#define VX_HOST_ASAN 1
-#elif defined(__has_feature)
-#if __has_feature(address_sanitizer)
-#define VX_HOST_ASAN 1
-#endif
-#endif
 #if defined(VX_HOST_ASAN)
 #include <sanitizer/asan_interface.h>
 #endif

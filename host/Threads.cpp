@@ -1,15 +1,18 @@
 #include "zovcore/Threads.h"
 
 #include <algorithm>
+#include <atomic>
 #include <memory>
 #include <mutex>
 #include <thread>
+#include <vector>
 
 #include <oneapi/tbb/global_control.h>
 #include <oneapi/tbb/parallel_for.h>
 #include <oneapi/tbb/partitioner.h>
 #include <oneapi/tbb/task_arena.h>
 
+#include "Sanitizers.h"
 #include "System.h"
 #include "vexel_host/host.h"
 
@@ -46,18 +49,40 @@ void RunInOrder(const boost::function<void(int)>& function, int count) {
   for (int i = 0; i < count; ++i) function(i);
 }
 
+#if defined(VX_HOST_TSAN)
+// oneTBB is not instrumented: ThreadSanitizer would not see how it hands pieces over and back. Plain threads do the
+// work.
+void RunParallel(const boost::function<void(int)>& function, int count, Crew* crew) {
+  std::atomic<int> next{0};
+  const auto work = [&] {
+    for (int i; (i = next.fetch_add(1)) < count;) function(i);
+  };
+  std::vector<std::thread> others;
+  for (int i = 1; i < std::min(crew ? crew->limit : 4, count); ++i) others.emplace_back(work);
+  work();
+  for (std::thread& other : others) other.join();
+}
+#else
 // Bands differ in cost, so each piece is handed out alone. Isolated: a thread that waits for its own pieces must not
 // pick up pieces of an unrelated call, whose stack and thread-local state would pile up on its own.
-void RunParallel(const boost::function<void(int)>& function, int count) {
-  tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(
-        tbb::blocked_range<int>(0, count, 1),
-        [&function](const tbb::blocked_range<int>& range) {
-          for (int i = range.begin(); i != range.end(); ++i) function(i);
-        },
-        tbb::simple_partitioner());
-  });
+void RunParallel(const boost::function<void(int)>& function, int count, Crew* crew) {
+  const auto run = [&function, count] {
+    tbb::this_task_arena::isolate([&function, count] {
+      tbb::parallel_for(
+          tbb::blocked_range<int>(0, count, 1),
+          [&function](const tbb::blocked_range<int>& range) {
+            for (int i = range.begin(); i != range.end(); ++i) function(i);
+          },
+          tbb::simple_partitioner());
+    });
+  };
+  // Without a limit the caller's own arena serves, and with it whatever limit the program has set there.
+  if (crew)
+    crew->arena.execute(run);
+  else
+    run();
 }
+#endif
 
 class TbbExecutor final : public AsyncExecutor {
  public:
@@ -65,10 +90,8 @@ class TbbExecutor final : public AsyncExecutor {
     const std::shared_ptr<Crew> crew = GetState().CurrentCrew();
     if (count <= 1 || (crew && crew->limit == 1))
       RunInOrder(function, count);
-    else if (crew)
-      crew->arena.execute([&] { RunParallel(function, count); });
     else
-      RunParallel(function, count);
+      RunParallel(function, count, crew.get());
   }
 };
 
