@@ -12,11 +12,11 @@ encode() {  # FILTERS PIXEL_FORMAT QUALITY OUT
 }
 
 # 8-bit 4:2:0: a zoom into the Mandelbrot set, fine detail and saturated colour.
-encode "mandelbrot=size=640x360:rate=12:start_scale=1.6:end_scale=0.8:end_pts=24:maxiter=800:inner=convergence" \
-  yuv420p 24 fractal_h264_420.mp4
+encode "mandelbrot=size=480x270:rate=12:start_scale=1.6:end_scale=0.8:end_pts=24:maxiter=800:inner=convergence" \
+  yuv420p 22 fractal_h264_420.mp4
 
 # 10-bit 4:2:2: slow waves of colour, which show every lost bit, and a strip of bars.
 waves="r='540+420*sin(X/190+T/2)*cos(Y/210-T/3)':g='470+330*sin(X/260+Y/170-T/2+1)':b='560+400*cos(X/330-Y/120+T/3+2)'"
-encode "nullsrc=size=640x288:rate=12,format=gbrp10,geq=$waves[waves];
-  smptehdbars=size=640x72:rate=12,format=gbrp10[bars];[waves][bars]vstack" \
+encode "nullsrc=size=480x216:rate=12,format=gbrp10,geq=$waves[waves];
+  smptehdbars=size=480x54:rate=12,format=gbrp10[bars];[waves][bars]vstack" \
   yuv422p10le 18 waves_h264_422_10bit.mp4

@@ -25,22 +25,30 @@ void Canvas::Fill(int x, int y, int width, int height, Colour colour) {
   }
 }
 
-void Canvas::Draw(const Picture& picture, int x, int y, int reduction) {
-  const int width = picture.Width() / reduction, height = picture.Height() / reduction;
-  const int samples = reduction * reduction;
-  for (int row = 0; row < height; ++row) {
-    for (int column = 0; column < width; ++column) {
-      if (!IsInside(x + column, y + row)) continue;
-      for (int c = 0; c < 3; ++c) {
-        int sum = samples / 2;
-        for (int j = 0; j < reduction; ++j) {
-          const uint8_t* in = reinterpret_cast<const uint8_t*>(picture.Row(row * reduction + j)) + c;
-          for (int i = 0; i < reduction; ++i) sum += in[4 * (column * reduction + i)];
-        }
-        Pixel(x + column, y + row)[c] = static_cast<uint8_t>(sum / samples);
-      }
+namespace {
+
+// One channel of a block of factor x factor pixels.
+uint8_t ReduceBlock(const Picture& picture, int column, int row, int channel, int factor, Canvas::Reduce reduce) {
+  int sum = factor * factor / 2, maximum = 0;
+  for (int j = 0; j < factor; ++j) {
+    const uint8_t* in = reinterpret_cast<const uint8_t*>(picture.Row(row * factor + j)) + channel;
+    for (int i = 0; i < factor; ++i) {
+      const int value = in[4 * (column * factor + i)];
+      sum += value;
+      maximum = std::max(maximum, value);
     }
   }
+  return static_cast<uint8_t>(reduce == Canvas::Reduce::Maximum ? maximum : sum / (factor * factor));
+}
+
+}  // namespace
+
+void Canvas::Draw(const Picture& picture, int x, int y, int factor, Reduce reduce) {
+  for (int row = 0; row < picture.Height() / factor; ++row)
+    for (int column = 0; column < picture.Width() / factor; ++column)
+      if (IsInside(x + column, y + row))
+        for (int c = 0; c < 3; ++c)
+          Pixel(x + column, y + row)[c] = ReduceBlock(picture, column, row, c, factor, reduce);
 }
 
 void Canvas::Blend(int x, int y, Colour colour, int coverage) {

@@ -24,8 +24,10 @@ class Canvas {
   const Picture& Result() const { return mPicture; }
 
   void Fill(int x, int y, int width, int height, Colour colour);
-  // A BGRA_4444_8u or BGRX_4444_8u picture, alpha ignored, averaged down by a whole factor in both directions.
-  void Draw(const Picture& picture, int x, int y, int reduction = 1);
+  // A BGRA_4444_8u or BGRX_4444_8u picture, alpha ignored, reduced by a whole factor in both directions: to the average
+  // of each block, or to its maximum, channel by channel.
+  enum class Reduce { Average, Maximum };
+  void Draw(const Picture& picture, int x, int y, int factor = 1, Reduce reduce = Reduce::Average);
   void Blend(int x, int y, Colour colour, int coverage);
 
  private:

@@ -105,13 +105,15 @@ class Conversion {
   }
 
   void Run() {
-    for (int64_t i = 0; i < mRange.first; ++i)
-      if (!mSource->Skip()) throw ToolError("\"" + mCommand.in + "\" has only " + std::to_string(i) + " frames");
+    int64_t skipped = 0;
+    while (skipped < mRange.first && mSource->Skip()) ++skipped;
     {
       Progress progress(ExpectedFrames());
       while (const int count = RunBatch()) progress.Show(mDone += count);
     }
-    if (mDone == 0) throw ToolError("cannot read \"" + mCommand.in + "\": it holds no frame");
+    if (mDone == 0)
+      throw ToolError(skipped == 0 ? "cannot read \"" + mCommand.in + "\": it holds no frame"
+                                   : "\"" + mCommand.in + "\" has only " + std::to_string(skipped) + " frames");
     mSink->Close();
     Report();
   }

@@ -19,8 +19,8 @@ namespace {
 
 constexpr VX_PixelFormat kRgb = VX_PixelFormat::BGRA_4444_8u;
 constexpr Colour kPaper{24, 26, 30}, kInk{235, 235, 235}, kFaintInk{150, 155, 165}, kFrame{70, 74, 82};
-constexpr int kTileWidth = 640, kMargin = 16, kLabelHeight = 52, kTitleHeight = 44, kColumns = 3;
-constexpr int kErrorGain = 16;
+constexpr int kTileWidth = 480, kMargin = 16, kLabelHeight = 52, kTitleHeight = 44, kColumns = 3;
+constexpr int kErrorGain = 32;
 
 struct DemoOptions {
   std::vector<std::string> files;
@@ -38,9 +38,10 @@ std::vector<Way> WaysFor(VX_PixelFormat source) {
   const bool bt601 = IsYuv(source) && (Bits(source) & 0x600) == 0;
   using F = VX_PixelFormat;
   const F uyvy = bt601 ? F::UYVY_422_8u : F::UYVY_422_8u_709, v210 = bt601 ? F::V210_422_10u : F::V210_422_10u_709;
+  const F yuv = bt601 ? F::VUYA_4444_32f : F::VUYA_4444_32f_709;
   return {{"direct", {}},
           {"through 8-bit 4:2:2", {uyvy}},
-          {"through 10-bit 4:2:2", {v210}},
+          source == v210 ? Way{"through float YUV", {yuv}} : Way{"through 10-bit 4:2:2", {v210}},
           {"through 15-bit RGB", {F::BGRA_4444_15u}},
           {"through linear float", {F::BGRA_4444_32f_Linear}},
           {"through all of them", {uyvy, v210, F::BGRA_4444_15u, F::BGRA_4444_32f_Linear}}};
@@ -169,7 +170,7 @@ void DrawStop(Canvas& canvas, const Stop& stop, int x, int y, int reduction, con
   const int left = x + width - insetWidth - 8, insetTop = top + height - insetHeight - 8;
   canvas.Fill(left - 2, insetTop - 22, insetWidth + 4, insetHeight + 24, kPaper);
   small.Draw(canvas, left + 4, insetTop - 6, Format("error x %d", kErrorGain), kInk);
-  canvas.Draw(stop.error, left, insetTop, insetReduction);
+  canvas.Draw(stop.error, left, insetTop, insetReduction, Canvas::Reduce::Maximum);
 }
 
 Canvas DrawSheet(const std::vector<Clip>& clips) {
@@ -196,7 +197,7 @@ Canvas DrawSheet(const std::vector<Clip>& clips) {
 }
 
 void RunDemo(const DemoOptions& options) {
-  const ConvertOptions convert{3, options.run.ThreadCount()};
+  const ConvertOptions convert{3, std::max(1, options.run.threads)};  // one thread unless asked: speeds compare
   std::vector<Clip> clips;
   for (const std::string& file : options.files) clips.push_back(RunClip(file, convert));
   SavePicture(DrawSheet(clips).Result(), options.out, convert);

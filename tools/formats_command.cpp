@@ -62,6 +62,20 @@ void PrintTable() {
         Colorimetry(entry.format), Range(entry.format), RowRule(entry.format), Origin(entry.format));
 }
 
+void PrintMarkdown() {
+  std::cout
+      << "# Pixel formats\n\nWritten by `vexel formats --markdown`. The value's bits are explained in "
+         "[pixel_formats.h](../include/vexel/pixel_formats.h). *First row* is the picture row that is stored first; "
+         "*row rule* is what `VX_AllocatePixelBuffer` gives.\n\n"
+         "| name | value | depth | layout | alpha | colour | range | row rule | first row |\n"
+         "|---|---|---|---|---|---|---|---|---|\n";
+  for (const CatalogueEntry& entry : Catalogue()) {
+    const VX_PixelFormat f = entry.format;
+    std::cout << "| `" << entry.name << "` | " << Hex(f) << " | " << Depth(f) << " | " << Layout(f) << " | " << Alpha(f)
+              << " | " << Colorimetry(f) << " | " << Range(f) << " | " << RowRule(f) << " | " << Origin(f) << " |\n";
+  }
+}
+
 void PrintJson() {
   std::cout << "[\n";
   const char* separator = "";
@@ -85,9 +99,18 @@ void PrintJson() {
 
 void AddFormatsCommand(CLI::App& app) {
   CLI::App* command = app.add_subcommand("formats", "List the pixel formats: bits, row rule, origin");
-  const auto json = std::make_shared<bool>(false);
-  command->add_flag("--json", *json, "As JSON");
-  command->callback([json] { *json ? PrintJson() : PrintTable(); });
+  const auto style = std::make_shared<std::string>();
+  CLI::Option* json = command->add_flag_callback(
+      "--json", [style] { *style = "json"; }, "As JSON");
+  command
+      ->add_flag_callback(
+          "--markdown", [style] { *style = "markdown"; }, "As a Markdown table")
+      ->excludes(json);
+  command->callback([style] {
+    if (*style == "json") return PrintJson();
+    if (*style == "markdown") return PrintMarkdown();
+    PrintTable();
+  });
 }
 
 }  // namespace tool

@@ -136,6 +136,7 @@ class ImageSink : public FrameSink {
       context->colorspace = frame->colorspace;
       frame->quality = context->global_quality;
     }
+    if (mKind.container == Container::Png) av_opt_set(context->priv_data, "pred", "mixed", 0);
     CheckAv(avcodec_open2(context.get(), codec, nullptr), what);
     CheckAv(avcodec_send_frame(context.get(), frame.get()), what);
     CheckAv(avcodec_send_frame(context.get(), nullptr), what);

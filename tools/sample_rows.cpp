@@ -168,12 +168,12 @@ void Unpack422_32f(const std::byte* row, VX_PixelFormat format, const SampleCodi
 void PackV210(const SampleRow& samples, const SampleCoding&, VX_PixelFormat, std::byte* row, int width) {
   const uint32_t* y = samples.components[0].data();
   for (int x = 0, word = 0; x < width; x += 6, word += 4) {
-    uint32_t group[12] = {};
+    uint32_t group[12] = {512, 64, 512, 64, 512, 64, 512, 64, 512, 64, 512, 64};
     for (int i = 0; i < 6 && x + i < width; i += 2) {
       group[2 * i] = samples.components[1][(x + i) / 2];
       group[2 * i + 1] = y[x + i];
       group[2 * i + 2] = samples.components[2][(x + i) / 2];
-      group[2 * i + 3] = x + i + 1 < width ? y[x + i + 1] : 0;
+      group[2 * i + 3] = y[x + i + 1 < width ? x + i + 1 : x + i];
     }
     for (int i = 0; i < 4; ++i)
       StoreWord(row, static_cast<size_t>(word + i), group[3 * i] | group[3 * i + 1] << 10 | group[3 * i + 2] << 20);

@@ -1,0 +1,57 @@
+#!/usr/bin/env bash
+# Every refusal: its exit status, what it says, and that it says so on standard error only.
+. "$(dirname "$0")/common.sh"
+
+refuses() {  # STATUS PATTERN ARGUMENTS...
+  local status=$1 pattern=$2 got
+  shift 2
+  "$vexel" "$@" >out 2>err
+  got=$?
+  [ "$got" = "$status" ] || fail "vexel $*: status $got, not $status"
+  grep -qE -- "$pattern" err || fail "vexel $*: said $(cat err)"
+  [ ! -s out ] || fail "vexel $*: wrote to standard output"
+}
+
+head -c 12288 "$clip420" >noise.raw  # 64 x 48 pixels of 4 bytes
+convert noise.raw picture.png --raw-format BGRA_4444_8u --size 64x48 --format BGRA_4444_8u
+head -c 600 picture.png >torn.png
+echo 'no picture' >text.png
+to_bgra=(--format BGRA_4444_8u)
+raw=(--raw-format BGRA_4444_8u --size 64x48)
+
+refuses 2 'COMMAND --help'
+refuses 2 'unknown command "convrt"; did you mean convert\?' convrt
+refuses 2 'out is required' convert picture.png
+refuses 2 '--format is required' convert picture.png x.png
+refuses 2 '--isa' convert picture.png x.png "${to_bgra[@]}" --isa neon
+refuses 2 '--threads' convert picture.png x.png "${to_bgra[@]}" --threads 0
+refuses 1 'unknown format "UYVY_422_8U_709"; did you mean UYVY_422_8u_709' convert picture.png x.png --format UYVY_422_8U_709
+refuses 1 'unknown format "BGRA_444_8u"; did you mean BGRA_4444_8u' convert picture.png x.png --format BGRA_444_8u
+refuses 1 'cannot read "nowhere.mov": No such file or directory' convert nowhere.mov x.png "${to_bgra[@]}"
+refuses 1 'cannot read "nowhere.mov": No such file or directory' info nowhere.mov
+refuses 1 'cannot read "text.png"|cannot decode "text.png"' convert text.png x.png "${to_bgra[@]}"
+refuses 1 'cannot decode "torn.png": it holds no whole frame' convert torn.png x.png "${to_bgra[@]}"
+refuses 1 'cannot write "no/where.png": No such file or directory' convert picture.png no/where.png "${to_bgra[@]}"
+refuses 1 'cannot tell from its name.*"x.foo"' convert picture.png x.foo "${to_bgra[@]}"
+refuses 1 'unknown container "gif"' convert picture.png x.png "${to_bgra[@]}" --container gif
+refuses 1 'holds one picture.*out_%04d.png' convert "$clip420" x.png "${to_bgra[@]}" --frames 0-3
+refuses 1 'not a sequence pattern' convert "$clip420" 'x_%d_%d.png' "${to_bgra[@]}"
+refuses 1 'has only 24 frames' convert "$clip420" x.png "${to_bgra[@]}" --frames 24
+refuses 1 'not a range of frames' convert "$clip420" x.png "${to_bgra[@]}" --frames 5-3
+refuses 1 'need their size' convert noise.raw x.png --raw-format BGRA_4444_8u "${to_bgra[@]}"
+refuses 1 '"64" is not a size' convert noise.raw x.png --raw-format BGRA_4444_8u --size 64 "${to_bgra[@]}"
+refuses 1 'ends in the middle of a frame' convert noise.raw x.raw --raw-format BGRA_4444_8u --size 65x48 "${to_bgra[@]}"
+refuses 1 'nothing is ever scaled' convert picture.png x.png "${to_bgra[@]}" --size 32x24
+refuses 1 'cannot hold a 2147483647x2147483647' convert noise.raw x.raw --raw-format BGRA_4444_8u --size 2147483647x2147483647 "${to_bgra[@]}"
+refuses 1 'cannot convert BGRA_4444_8u to PALDV25 at 64x48: VX_ErrFormatNotHandled \(-1000\)' convert noise.raw x.raw "${raw[@]}" --format PALDV25
+refuses 1 'cannot convert BGRA_4444_8u to YUV_420_MPEG4_FRAME at 64x48: VX_ErrFormatNotHandled \(-1000\)' convert noise.raw x.raw "${raw[@]}" --format YUV_420_MPEG4_FRAME
+refuses 1 'unknown matrix "907"' convert "$clip420" x.png "${to_bgra[@]}" --matrix 907
+refuses 1 'no library format holds yuv422p10le frames coded with the BT.2020 matrix' convert "$clip422" x.png "${to_bgra[@]}" --matrix 2020
+
+# A write error that only shows when the data leaves the buffers.
+if [ -e /dev/full ]; then
+  "$vexel" convert picture.png - "${to_bgra[@]}" >/dev/full 2>err
+  [ $? = 1 ] || fail "a full device goes unnoticed"
+  grep -q 'cannot write standard output: No space left on device' err || fail "a full device: $(cat err)"
+fi
+exit $failed
