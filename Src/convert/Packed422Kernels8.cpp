@@ -49,14 +49,13 @@ struct PairsToBgrxBody {
     const I16 even = AsI16(hn::Xor(chroma, zero)), odd = AsI16(hn::Xor(between, zero));
 
     const I16 y = matrix.Luma(WordBytes256<LumaByte(kOrder)>(pairs));
-    const I16 blue = Double(matrix.Blue(y, JoinLowWords(even, odd)));
-    const I16 red = Double(matrix.Red(y, JoinHighWords(even, odd)));
-    const I16 greenChroma = JoinHighWords(matrix.GreenChroma(even), matrix.GreenChroma(odd));
-    const I16 green = Double(hn::SaturatedAdd(y, greenChroma));
+    const I16 blue = matrix.AddChroma(y, JoinLowWords(even, odd), matrix.blue);
+    const I16 red = matrix.AddChroma(y, JoinHighWords(even, odd), matrix.red);
+    const I16 green = matrix.Integers(y, JoinHighWords(matrix.GreenChroma(even), matrix.GreenChroma(odd)));
 
-    const auto blueGreen = hn::Xor(JoinHighBytes(blue, green), Dwords(0x80808080));
-    const auto redOpaque = hn::Xor(AsU8(hn::ShiftRight<8>(AsU16(red))), Dwords(0xFF80FF80));
-    StoreWordPairs(blueGreen, redOpaque, out);
+    const hn::ScalableTag<uint8_t> d;
+    const U8 blueRed = PackBlocks(blue, red), greenOpaque = PackBlocks(green, WordPair(255, 255));
+    StoreWordPairs(hn::InterleaveLower(d, blueRed, greenOpaque), hn::InterleaveUpper(d, blueRed, greenOpaque), out);
   }
   VectorYuvToRgb8 matrix;
 };
@@ -157,11 +156,8 @@ void PairsToVuyx(const uint8_t* src, uint8_t* dst, size_t count, int) {
   ForEachPair(kOrder, src, count, [&](size_t i, const Pair8& pair, const Pair8& next) {
     const int u[2] = {pair.u, (pair.u + next.u + 1) >> 1}, v[2] = {pair.v, (pair.v + next.v + 1) >> 1};
     for (size_t k = 0; k < 2 && 2 * i + k < count; ++k) {
-      uint8_t* vuyx = dst + 4 * (2 * i + k);
-      vuyx[0] = static_cast<uint8_t>(v[k]);
-      vuyx[1] = static_cast<uint8_t>(u[k]);
-      vuyx[2] = static_cast<uint8_t>(pair.y[k]);
-      vuyx[3] = 255;
+      const uint8_t vuyx[4] = {Clamp8(v[k]), Clamp8(u[k]), Clamp8(pair.y[k]), 255};
+      std::memcpy(dst + 4 * (2 * i + k), vuyx, 4);
     }
   });
 }

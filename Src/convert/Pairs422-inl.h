@@ -32,35 +32,6 @@ HWY_INLINE U16 WordBytes256(U8 v) {
   return kByte == 0 ? hn::ShiftLeft<8>(AsU16(v)) : AsU16(hn::And(v, Dwords(0xFF00FF00)));
 }
 
-// The low words of `even` in the low words, those of `odd` in the high words.
-template <class V>
-HWY_INLINE V JoinLowWords(V even, V odd) {
-#if HWY_TARGET == HWY_AVX3
-  return V{_mm512_mask_shuffle_epi8(even.raw, 0xCCCCCCCCCCCCCCCC, odd.raw, ByteOrder<0x1010>().raw)};
-#else
-  return hn::OddEven(AsI16(hn::ShiftLeft<16>(AsI32(odd))), even);
-#endif
-}
-
-// The high words of `even` in the low words, those of `odd` in the high words.
-template <class V>
-HWY_INLINE V JoinHighWords(V even, V odd) {
-#if HWY_TARGET == HWY_AVX3
-  return V{_mm512_mask_shuffle_epi8(odd.raw, 0x3333333333333333, even.raw, ByteOrder<0x3232>().raw)};
-#else
-  return hn::OddEven(odd, AsI16(hn::ShiftRight<16>(AsI32(even))));
-#endif
-}
-
-// The high bytes of the words of `low` in the low bytes, those of `high` in the high bytes.
-HWY_INLINE U8 JoinHighBytes(I16 low, I16 high) {
-#if HWY_TARGET == HWY_AVX3
-  return U8{_mm512_mask_shuffle_epi8(high.raw, 0x5555555555555555, low.raw, ByteOrder<0x3311>().raw)};
-#else
-  return SelectBytes(Dwords(0xFF00FF00), AsU8(high), AsU8(hn::ShiftRight<8>(AsU16(low))));
-#endif
-}
-
 // Stores low[0] high[0] low[1] high[1] ...
 HWY_INLINE void StoreWordPairs(U8 low, U8 high, uint8_t* out) {
 #if HWY_TARGET == HWY_AVX3
@@ -83,56 +54,65 @@ HWY_INLINE void StoreWordPairs(U8 low, U8 high, uint8_t* out) {
 #endif
 }
 
-// Lanes 1, 2, ... of `v`, then lane 0 of `next`.
-HWY_INLINE I16 ShiftLaneIn(I16 v, I16 next) {
+// Lanes of 32 bits 1, 2, ... of `v`, then lane 0 of `next`.
+template <class V>
+HWY_INLINE V ShiftLaneIn(V v, V next) {
 #if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_alignr_epi32(next.raw, v.raw, 1)};
+  return V{_mm512_alignr_epi32(next.raw, v.raw, 1)};
 #elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_alignr_epi8(_mm256_permute2x128_si256(v.raw, next.raw, 0x21), v.raw, 4)};
+  return V{_mm256_alignr_epi8(_mm256_permute2x128_si256(v.raw, next.raw, 0x21), v.raw, 4)};
 #else
-  return I16{_mm_alignr_epi8(next.raw, v.raw, 4)};
+  return V{_mm_alignr_epi8(next.raw, v.raw, 4)};
 #endif
 }
 // The last lane of `before`, then lanes 0, 1, ... of `v`.
-HWY_INLINE I16 ShiftLaneOut(I16 before, I16 v) {
+template <class V>
+HWY_INLINE V ShiftLaneOut(V before, V v) {
 #if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_alignr_epi32(v.raw, before.raw, 15)};
+  return V{_mm512_alignr_epi32(v.raw, before.raw, 15)};
 #elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_alignr_epi8(v.raw, _mm256_permute2x128_si256(before.raw, v.raw, 0x21), 12)};
+  return V{_mm256_alignr_epi8(v.raw, _mm256_permute2x128_si256(before.raw, v.raw, 0x21), 12)};
 #else
-  return I16{_mm_alignr_epi8(v.raw, before.raw, 12)};
+  return V{_mm_alignr_epi8(v.raw, before.raw, 12)};
 #endif
 }
 
 // Stores pairs of chroma words (u, v) and luma words (y0, y1), both clamped to 0..255.
 template <PairOrder kOrder>
 HWY_INLINE void StorePairs(I16 uv, I16 y, uint8_t* out) {
-  alignas(16) static constexpr uint8_t kUyvy[16] = {0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15};
-  alignas(16) static constexpr uint8_t kYuyv[16] = {8, 0, 9, 1, 10, 2, 11, 3, 12, 4, 13, 5, 14, 6, 15, 7};
-  const auto order = hn::LoadDup128(hn::ScalableTag<uint8_t>(), kOrder == PairOrder::Uyvy ? kUyvy : kYuyv);
+  static constexpr ShuffleTable kUyvy({0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15});
+  static constexpr ShuffleTable kYuyv({8, 0, 9, 1, 10, 2, 11, 3, 12, 4, 13, 5, 14, 6, 15, 7});
+  const U8 order = kOrder == PairOrder::Uyvy ? kUyvy.Load() : kYuyv.Load();
   StoreVector(hn::TableLookupBytes(PackBlocks(uv, y), order), out);
 }
 
 // Runs body(pairs, next, out) over a 4:2:2 row of `count` pixels, a vector of pairs at a time. `next` holds for each
 // pair the one after it; the last pair of the row follows itself. Every pixel makes kDstPixelBytes bytes of the
-// destination; where kWholePairs is set the destination is 4:2:2 too and ends with a whole pair.
+// destination; where kWholePairs is set the destination is 4:2:2 too and ends with a whole pair. The last vector ends
+// with the row and may do some pairs again, which source and destination, being different rows, allow.
 template <size_t kDstPixelBytes, bool kWholePairs, class Body>
 HWY_INLINE void PairLoop(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count, const Body& body) {
-  constexpr size_t kSrcStep = 4 * kVectorPairs, kDstStep = 2 * kDstPixelBytes * kVectorPairs;
+  constexpr size_t kPairs = kVectorPairs, kDstPairBytes = 2 * kDstPixelBytes;
+  const size_t pairs = (count + 1) / 2;
+  size_t i = 0;
+  for (; i + kPairs < pairs; i += kPairs)
+    body(LoadVector<uint8_t>(src + 4 * i), LoadVector<uint8_t>(src + 4 * i + 4), dst + i * kDstPairBytes);
   if (count == 0) return;
-  size_t pairs = (count + 1) / 2;
-  if (kWholePairs) count = 2 * pairs;
-  for (; pairs > kVectorPairs; pairs -= kVectorPairs, count -= 2 * kVectorPairs, src += kSrcStep, dst += kDstStep)
-    body(LoadVector<uint8_t>(src), LoadVector<uint8_t>(src + 4), dst);
 
-  alignas(64) uint8_t in[kSrcStep + HWY_MAX_BYTES], out[kDstStep];
   uint32_t last;
   std::memcpy(&last, src + 4 * (pairs - 1), 4);
-  StoreVector(Dwords(last), in, 0);
-  StoreVector(Dwords(last), in, 1);
-  std::memcpy(in, src, 4 * pairs);
-  body(LoadVector<uint8_t>(in), LoadVector<uint8_t>(in + 4), out);
-  std::memcpy(dst, out, kDstPixelBytes * count);
+  const U8 repeated = Dwords(last);
+  if (pairs >= kPairs && (kWholePairs || count % 2 == 0)) {
+    const U8 vector = LoadVector<uint8_t>(src + 4 * (pairs - kPairs));
+    body(vector, ShiftLaneIn(vector, repeated), dst + (pairs - kPairs) * kDstPairBytes);
+    return;
+  }
+  alignas(64) uint8_t in[4 * kPairs], out[kDstPairBytes * kPairs];
+  StoreVector(repeated, in);
+  std::memcpy(in, src + 4 * i, 4 * (pairs - i));
+  const U8 vector = LoadVector<uint8_t>(in);
+  body(vector, ShiftLaneIn(vector, repeated), out);
+  std::memcpy(dst + i * kDstPairBytes, out, kDstPixelBytes * ((kWholePairs ? 2 * pairs : count) - 2 * i));
 }
 
 }  // namespace HWY_NAMESPACE

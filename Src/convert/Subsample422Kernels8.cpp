@@ -59,18 +59,19 @@ template <bool kPremultiply>
 struct FromBgra {
   HWY_INLINE PairWords operator()(U8 a, U8 b) const {
     if constexpr (kPremultiply) {
-      const auto opaque = Dwords(0xFF000000);
       const hn::ScalableTag<uint32_t> d;
-      const auto alphas = hn::BitCast(d, hn::And(hn::And(a, b), opaque));
-      if (HWY_UNLIKELY(!hn::AllTrue(d, hn::Eq(alphas, hn::BitCast(d, opaque)))))
-        return Multiply(Premultiplied(a), Premultiplied(b));
+      const auto opaque = hn::BitCast(d, Dwords(0xFF000000)), alphas = hn::And(hn::BitCast(d, hn::And(a, b)), opaque);
+      if (HWY_UNLIKELY(!hn::AllTrue(d, hn::Eq(alphas, opaque)))) {
+        const auto alpha0 = Alpha(a), alpha1 = Alpha(b);
+        return Multiply(Scale(WordBytes<0>(a), alpha0), Green(a, alpha0), Scale(WordBytes<0>(b), alpha1),
+                        Green(b, alpha1));
+      }
     }
-    return Multiply(a, b);
+    return Multiply(VectorMatrix8::OuterChannels(a), matrix.InnerChannel(a), VectorMatrix8::OuterChannels(b),
+                    matrix.InnerChannel(b));
   }
 
-  HWY_INLINE PairWords Multiply(U8 a, U8 b) const {
-    const I16 outer0 = VectorMatrix8::OuterChannels(a), inner0 = matrix.InnerChannel(a);
-    const I16 outer1 = VectorMatrix8::OuterChannels(b), inner1 = matrix.InnerChannel(b);
+  HWY_INLINE PairWords Multiply(I16 outer0, I16 inner0, I16 outer1, I16 inner1) const {
     return SplitPairs(Chroma(outer0, inner0), Chroma(outer1, inner1), matrix.Sum(2, outer0, inner0),
                       matrix.Sum(2, outer1, inner1));
   }
@@ -79,23 +80,24 @@ struct FromBgra {
     return JoinHighWords(AsI16(matrix.Sum(1, outer, inner)), AsI16(matrix.Sum(0, outer, inner)));
   }
 
-  // c a / 255 to nearest, as (t + 128) 257 >> 16 of t = c a.
-  static HWY_INLINE U8 Premultiplied(U8 bgra) {
+  static HWY_INLINE U16 Alpha(U8 bgra) { return AsU16(hn::TableLookupBytes(bgra, ByteOrder<0x8383>())); }
+  // c a / 255 to nearest: (t + 128) 257 >> 16 of t = c a.
+  static HWY_INLINE I16 Scale(U16 channels, U16 alpha) {
     const hn::ScalableTag<uint16_t> d;
-    const auto half = hn::Set(d, uint16_t{128}), divide = hn::Set(d, uint16_t{257});
-    const auto alpha = AsU16(hn::TableLookupBytes(bgra, ByteOrder<0x8383>()));
-    const auto blueRed = hn::Add(hn::Mul(WordBytes<0>(bgra), alpha), half);
-    const auto green = hn::Add(hn::Mul(WordBytes<1>(bgra), alpha), half);
-    return AsU8(hn::Or(hn::MulHigh(blueRed, divide), hn::ShiftLeft<8>(hn::MulHigh(green, divide))));
+    return AsI16(hn::MulHigh(hn::Add(hn::Mul(channels, alpha), hn::Set(d, uint16_t{128})), hn::Set(d, uint16_t{257})));
+  }
+  HWY_INLINE I16 Green(U8 bgra, U16 alpha) const {
+    const auto green = Scale(WordBytes<1>(bgra), alpha);
+    return matrix.InnerOfDoubled(AsU8(hn::Add(green, green)));
   }
 
   VectorMatrix8 matrix;
 };
 
-// Pairs from their own words, those of the pairs after them, and the details d of the pairs before them.
-HWY_INLINE void LiftPairs(const PairWords& words, const PairWords& following, I16& details, uint8_t* out) {
+// Pairs from their own words, the even chroma of the pairs after them, and the details d of the pairs before them.
+HWY_INLINE void LiftPairs(const PairWords& words, I16 following, I16& details, uint8_t* out) {
   const hn::ScalableTag<int16_t> d;
-  const I16 after = ShiftLaneIn(words.even, following.even);
+  const I16 after = ShiftLaneIn(words.even, following);
   const I16 between = AsI16(hn::AverageRound(AsU16(words.even), AsU16(after)));
   const I16 now = hn::Sub(words.odd, between);
   const I16 sum = hn::Add(hn::Add(ShiftLaneOut(details, now), now), hn::Set(d, int16_t{2}));
@@ -111,22 +113,26 @@ HWY_INLINE void Subsample(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT
   constexpr size_t kPixels = 2 * kVectorPairs, kSrcStep = 4 * kPixels, kDstStep = 2 * kPixels;
   if (count == 0) return;
   const size_t blocks = count / kPixels, rest = count % kPixels, steps = blocks + (rest > 0);
-  alignas(64) uint8_t tail[2 * kSrcStep], out[kDstStep];
-  uint32_t last;
-  std::memcpy(&last, src + 4 * (count - 1), 4);
-  for (size_t i = 0; i < 4; ++i) StoreVector(Dwords(last), tail, i);
-  std::memcpy(tail, src + blocks * kSrcStep, 4 * rest);
+  alignas(64) uint8_t tail[kSrcStep], out[kDstStep];
+  if (rest > 0) {
+    uint32_t last;
+    std::memcpy(&last, src + 4 * (count - 1), 4);
+    StoreVector(Dwords(last), tail, 0);
+    StoreVector(Dwords(last), tail, 1);
+    std::memcpy(tail, src + blocks * kSrcStep, 4 * rest);
+  }
 
   const I16 zero = hn::Zero(hn::ScalableTag<int16_t>());
   PairWords words = {zero, zero, zero};
   I16 details = zero;
-  for (size_t i = 0; i <= steps; ++i) {
-    const uint8_t* p = i < blocks ? src + i * kSrcStep : tail + (i - blocks) * kSrcStep;
+  for (size_t i = 0; i < steps; ++i) {
+    const uint8_t* p = i < blocks ? src + i * kSrcStep : tail;
     const PairWords following = source(LoadVector<uint8_t>(p, 0), LoadVector<uint8_t>(p, 1));
-    if (i > 0) LiftPairs(words, following, details, i <= blocks ? dst + (i - 1) * kDstStep : out);
+    if (i > 0) LiftPairs(words, following.even, details, dst + (i - 1) * kDstStep);
     words = following;
   }
-  std::memcpy(dst + blocks * kDstStep, out, (rest + 1) / 2 * 4);
+  LiftPairs(words, ShiftLaneOut(words.odd, words.odd), details, rest > 0 ? out : dst + (blocks - 1) * kDstStep);
+  if (rest > 0) std::memcpy(dst + blocks * kDstStep, out, (rest + 1) / 2 * 4);
 }
 
 HWY_ATTR void Vuyx8ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) { Subsample(src, dst, count, FromVuyx()); }

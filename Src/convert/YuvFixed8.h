@@ -1,7 +1,8 @@
 // The matrices of 8-bit Y'CbCr in fixed point, and the scalar definition of what they compute.
 //
-// Every coefficient is the product of a matrix and the code scalings in double precision, rounded once. Results lie
-// within 0.53 code values of the exact ones before clamping to 0..255.
+// Every coefficient is the product of a matrix and the code scalings in double precision, rounded once. Over all 2^24
+// colours results lie within 0.52 code values of the exact ones clamped to 0..255 (RGB to Y'CbCr and between the
+// colorimetries within 0.507), and more than 99.6 % of them are the nearest codes.
 #pragma once
 
 #include <cstdint>
@@ -38,7 +39,7 @@ constexpr FixedMatrix8 MakeRgbToYuv8(const YuvMatrix& m) {
 }
 
 // VUY to VUY of the other colorimetry with 14 fractional bits, about (128, 128, 16). Grey stays what it is, and scaling
-// about black (premultiplying) commutes with it.
+// about black (premultiplying) commutes with it but for rounding.
 constexpr FixedMatrix8 MakeYuvToYuv8(const YuvRecoding& r) {
   constexpr double kOne = 16384, kToLuma = kOne * kLumaRange8 / kChromaRange8;
   FixedMatrix8 f{};
@@ -55,14 +56,14 @@ constexpr FixedMatrix8 MakeYuvToYuv8(const YuvRecoding& r) {
   return f;
 }
 
-// VUY to BGR in 16-bit steps, as signed values with 7 fractional bits about 128:
+// VUY to BGR in 16-bit steps with 6 fractional bits:
 //
-//   y   = (256 Y luma >> 16) + lumaBias                    u = 256 (U - 128), v likewise
-//   B'  = y + (u blueU + 2^14 >> 15) + u                   G' = y + (u greenU + v greenV >> 16)
-//   R'  = y + (v redV + 2^14 >> 15) + v                    out = (2 x' >> 8) + 128
+//   y = (256 Y luma >> 16) + lumaBias          u = 256 (U - 128), v likewise
+//   B = clamp((y + (u blueU + 2^14 >> 15)) >> 6)
+//   G = clamp((y + (u greenU + v greenV >> 16)) >> 6)
+//   R = clamp((y + (v redV + 2^14 >> 15)) >> 6)
 //
-// where the last addition and the doubling saturate to int16, which is the clamping to 0..255. The factors of U in B
-// and of V in R exceed the range of one product, so u and v themselves, a factor of 2, are added.
+// Sums that leave int16 are far above 255 and may saturate.
 struct FixedYuvToRgb8 {
   int luma, lumaBias, blueU, greenU, greenV, redV;
 };
@@ -70,11 +71,11 @@ struct FixedYuvToRgb8 {
 constexpr FixedYuvToRgb8 MakeYuvToRgb8(const YuvMatrix& m) {
   constexpr double kLuma = 255.0 / kLumaRange8, kChroma = 255.0 / kChromaRange8;
   FixedYuvToRgb8 f{};
-  f.luma = RoundFixed(32768 * kLuma);
+  f.luma = RoundFixed(16384 * kLuma);
   // Half a code to round, and half a step for what the shift of the luma product cuts off on average.
-  f.lumaBias = RoundFixed(-128 * (kLumaBlack8 * kLuma + 128) + 64 + 0.5);
-  f.blueU = RoundFixed(16384 * (kChroma * m.bU - 2)), f.redV = RoundFixed(16384 * (kChroma * m.rV - 2));
-  f.greenU = RoundFixed(32768 * kChroma * m.gU), f.greenV = RoundFixed(32768 * kChroma * m.gV);
+  f.lumaBias = RoundFixed(-64 * kLumaBlack8 * kLuma + 32 + 0.5);
+  f.blueU = RoundFixed(8192 * kChroma * m.bU), f.redV = RoundFixed(8192 * kChroma * m.rV);
+  f.greenU = RoundFixed(16384 * kChroma * m.gU), f.greenV = RoundFixed(16384 * kChroma * m.gV);
   return f;
 }
 
@@ -84,23 +85,19 @@ inline constexpr FixedYuvToRgb8 kYuvToRgb8_601 = MakeYuvToRgb8(kBt601), kYuvToRg
 
 namespace plain {
 
-inline int Clamp8(int value) { return value < 0 ? 0 : value > 255 ? 255 : value; }
-inline int Clamp16(int value) { return value < -32768 ? -32768 : value > 32767 ? 32767 : value; }
+inline uint8_t Clamp8(int value) { return static_cast<uint8_t>(value < 0 ? 0 : value > 255 ? 255 : value); }
 
 inline void MultiplyMatrix8(const FixedMatrix8& m, const uint8_t* in, uint8_t* out) {
-  const int c0 = in[0], c1 = 2 * in[1], c2 = in[2];
   for (int j = 0; j < 3; ++j)
-    out[j] =
-        static_cast<uint8_t>(Clamp8((m.c0[j] * c0 + m.c1[j] * c1 + m.c2[j] * c2 + m.biasUnit * m.bias[j]) >> m.shift));
+    out[j] = Clamp8((m.c0[j] * in[0] + m.c1[j] * 2 * in[1] + m.c2[j] * in[2] + m.biasUnit * m.bias[j]) >> m.shift);
 }
 
 // u and v are 256 times the chroma about 0, so that half codes have their place.
 inline void Yuv8ToBgr8(const FixedYuvToRgb8& f, int luma, int u, int v, uint8_t* bgr) {
-  const int y = static_cast<int>(luma * 256u * static_cast<uint32_t>(f.luma) >> 16) + f.lumaBias;
-  const int sums[3] = {Clamp16(y + ((u * f.blueU + (1 << 14)) >> 15) + u),
-                       Clamp16(y + ((u * f.greenU + v * f.greenV) >> 16)),
-                       Clamp16(y + ((v * f.redV + (1 << 14)) >> 15) + v)};
-  for (int j = 0; j < 3; ++j) bgr[j] = static_cast<uint8_t>((Clamp16(2 * sums[j]) >> 8) + 128);
+  const int y = (luma * 256 * f.luma >> 16) + f.lumaBias;
+  bgr[0] = Clamp8((y + ((u * f.blueU + (1 << 14)) >> 15)) >> 6);
+  bgr[1] = Clamp8((y + ((u * f.greenU + v * f.greenV) >> 16)) >> 6);
+  bgr[2] = Clamp8((y + ((v * f.redV + (1 << 14)) >> 15)) >> 6);
 }
 
 }  // namespace plain

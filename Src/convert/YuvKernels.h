@@ -18,7 +18,7 @@ extern const RowKernelSet kVuya32f_601To709, kVuya32f_709To601, kVuyx32f_601To70
 extern const RowKernelSet kVuya8ToBgra32f_601, kVuya8ToBgra32f_709, kVuyx8ToBgrx32f_601, kVuyx8ToBgrx32f_709;
 extern const RowKernelSet kBgra32fToVuya8_601, kBgra32fToVuya8_709;
 
-// Matrices in 8u fixed point, within 0.515 code values of the exact ones (YuvMatrix8Kernels.cpp).
+// Matrices in 8u fixed point, within 0.52 code values of the exact ones (YuvMatrix8Kernels.cpp).
 extern const RowKernelSet kBgra8ToVuya8_601, kBgra8ToVuya8_709, kBgrx8ToVuyx8_601, kBgrx8ToVuyx8_709;
 extern const RowKernelSet kVuya8ToBgra8_601, kVuya8ToBgra8_709, kVuyx8ToBgrx8_601, kVuyx8ToBgrx8_709;
 extern const RowKernelSet kVuya8_601To709, kVuya8_709To601, kVuyx8_601To709, kVuyx8_709To601;

@@ -43,15 +43,15 @@ struct RgbToYuvOp {
   HWY_INLINE U8 operator()(U8 bgra) const {
     const I16 blueRed = VectorMatrix8::OuterChannels(bgra), green = matrix.InnerChannel(bgra);
     const I32 v = matrix.Sum(0, blueRed, green), u = matrix.Sum(1, blueRed, green), y = matrix.Sum(2, blueRed, green);
+    const U8 alpha = kAlpha == AlphaWrite::Keep ? bgra : Dwords(0xFF000000);
 #if HWY_TARGET == HWY_AVX3
-    const __m512i third = ByteOrder<0x8222>().raw;
-    __m512i out = AlphaBytes<kAlpha>(bgra).raw;
-    out = _mm512_mask_mov_epi8(out, 0x4444444444444444, y.raw);
-    out = _mm512_mask_shuffle_epi8(out, 0x1111111111111111, v.raw, third);
-    return U8{_mm512_mask_shuffle_epi8(out, 0x2222222222222222, u.raw, third)};
+    const __m512i third = ByteOrder<0x2222>().raw;
+    __m512i out = _mm512_mask_mov_epi8(alpha.raw, ByteMask(0x00FF0000), y.raw);
+    out = _mm512_mask_shuffle_epi8(out, ByteMask(0x000000FF), v.raw, third);
+    return U8{_mm512_mask_shuffle_epi8(out, ByteMask(0x0000FF00), u.raw, third)};
 #else
     const auto vy = hn::OddEven(AsU16(y), AsU16(hn::ShiftRight<16>(v)));
-    const auto ua = hn::OddEven(AsU16(AlphaBytes<kAlpha>(bgra)), AsU16(hn::ShiftRight<8>(u)));
+    const auto ua = hn::OddEven(AsU16(alpha), AsU16(hn::ShiftRight<8>(u)));
     return SelectBytes(Dwords(0xFF00FF00), AsU8(ua), AsU8(vy));
 #endif
   }
@@ -62,14 +62,10 @@ template <AlphaWrite kAlpha>
 struct YuvToYuvOp {
   HWY_INLINE U8 operator()(U8 vuya) const {
     const I16 outer = VectorMatrix8::OuterChannels(vuya), inner = matrix.InnerChannel(vuya);
-    const auto v = hn::ShiftRight<14>(matrix.Sum(0, outer, inner));
-    const auto u = hn::ShiftRight<14>(matrix.Sum(1, outer, inner));
-    const auto y = hn::ShiftLeft<2>(matrix.Sum(2, outer, inner));
-    const auto alpha = hn::ShiftRight<8>(AsU16(AlphaBytes<kAlpha>(vuya)));
-    const auto vy = hn::OddEven(AsI16(y), AsI16(v)), ua = hn::OddEven(AsI16(alpha), AsI16(u));
-    // Each block now holds v0 y0 v1 y1 ... v3 y3 u0 a0 ... u3 a3.
-    alignas(16) static constexpr uint8_t kOrder[16] = {0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15};
-    return hn::TableLookupBytes(PackBlocks(vy, ua), hn::LoadDup128(hn::ScalableTag<uint8_t>(), kOrder));
+    const I32 v = hn::ShiftRight<14>(matrix.Sum(0, outer, inner));
+    const I32 u = hn::ShiftLeft<2>(matrix.Sum(1, outer, inner));
+    const I32 y = hn::ShiftLeft<2>(matrix.Sum(2, outer, inner));
+    return PackPixels<kAlpha>(hn::OddEven(AsI16(y), AsI16(v)), AsI16(u), vuya);
   }
   VectorMatrix8 matrix;
 };
@@ -79,18 +75,8 @@ struct YuvToRgbOp {
   HWY_INLINE U8 operator()(U8 vuya) const {
     const auto uv = AsI16(hn::Xor(hn::TableLookupBytes(vuya, ByteOrder<0x0818>()), Dwords(0x80008000)));
     const I16 y = matrix.Luma(AsU16(hn::TableLookupBytes(vuya, ByteOrder<0x2828>())));
-    const I16 blueRed = Double(matrix.BlueRed(y, uv));
-    const I16 green = Double(hn::SaturatedAdd(y, matrix.GreenChroma(uv)));
-#if HWY_TARGET == HWY_AVX3
-    __m512i out = AlphaBytes<kAlpha>(vuya).raw;
-    out = _mm512_mask_shuffle_epi8(out, 0x5555555555555555, blueRed.raw, ByteOrder<0x8381>().raw);
-    out = _mm512_mask_shuffle_epi8(out, 0x2222222222222222, green.raw, ByteOrder<0x8838>().raw);
-    return hn::Xor(U8{out}, Dwords(0x00808080));
-#else
-    const auto ga = hn::OddEven(AsU16(AlphaBytes<kAlpha>(vuya)), AsU16(hn::ShiftRight<16>(AsI32(green))));
-    const auto br = hn::ShiftRight<8>(AsU16(blueRed));
-    return hn::Xor(SelectBytes(Dwords(0xFF00FF00), AsU8(ga), AsU8(br)), Dwords(0x00808080));
-#endif
+    return PackPixels<kAlpha>(matrix.AddChroma(y, uv, matrix.blueRed), matrix.Integers(y, matrix.GreenChroma(uv)),
+                              vuya);
   }
   VectorYuvToRgb8 matrix;
 };

@@ -63,28 +63,67 @@ HWY_INLINE U8 SelectBytes(U8 mask, U8 yes, U8 no) {
 #endif
 }
 
-// Shuffle table that moves bytes within each group of four. The hexadecimal digits of kOrder name the source bytes,
-// from the highest result byte to the lowest, 8 for zero: 0x8280 makes words of bytes 2 and 0.
-// The table fills a vector: compilers repeat the broadcast of a shorter one in every pass of a loop.
-struct ByteOrderTable {
-  constexpr explicit ByteOrderTable(uint32_t order) : bytes() {
+// Shuffle tables, repeated for every 128-bit block: compilers redo the broadcast of a shorter one in every pass of a
+// loop.
+struct ShuffleTable {
+  constexpr explicit ShuffleTable(const uint8_t (&block)[16]) : bytes() {
+    for (size_t i = 0; i < HWY_MAX_BYTES; ++i) bytes[i] = block[i % 16];
+  }
+  // Moves bytes within each group of four. The hexadecimal digits name the source bytes, from the highest result byte
+  // to the lowest, 8 for zero: 0x8280 makes words of bytes 2 and 0.
+  constexpr explicit ShuffleTable(uint32_t order) : bytes() {
     for (uint32_t i = 0; i < HWY_MAX_BYTES; ++i) {
       const uint32_t digit = order >> (4 * (i % 4)) & 15;
       bytes[i] = static_cast<uint8_t>(digit >= 8 ? 0x80 : digit + i % 16 / 4 * 4);
     }
   }
+  HWY_INLINE U8 Load() const { return hn::Load(hn::ScalableTag<uint8_t>(), bytes); }
+
   alignas(HWY_MAX_BYTES) uint8_t bytes[HWY_MAX_BYTES];
 };
 template <uint32_t kOrder>
 HWY_INLINE U8 ByteOrder() {
-  static constexpr ByteOrderTable kTable(kOrder);
-  return hn::Load(hn::ScalableTag<uint8_t>(), kTable.bytes);
+  static constexpr ShuffleTable kTable(kOrder);
+  return kTable.Load();
 }
 
-// A vector whose fourth bytes are those of the pixels, or opaque; its other bytes are anything.
+#if HWY_TARGET == HWY_AVX3
+// Where the bytes of `pattern` are 0xFF. As a constant, compilers would load it anew in every pass of a loop.
+HWY_INLINE __mmask64 ByteMask(uint32_t pattern) { return hn::MaskFromVec(Dwords(pattern)).raw; }
+#endif
+
+// Pairs of words: the low words of `even` and `odd`, and their high words.
+HWY_INLINE I16 JoinLowWords(I16 even, I16 odd) {
+#if HWY_TARGET == HWY_AVX3
+  return I16{_mm512_mask_shuffle_epi8(even.raw, ByteMask(0xFFFF0000), odd.raw, ByteOrder<0x1010>().raw)};
+#else
+  return hn::OddEven(AsI16(hn::ShiftLeft<16>(AsI32(odd))), even);
+#endif
+}
+HWY_INLINE I16 JoinHighWords(I16 even, I16 odd) {
+#if HWY_TARGET == HWY_AVX3
+  return I16{_mm512_mask_shuffle_epi8(odd.raw, ByteMask(0x0000FFFF), even.raw, ByteOrder<0x3232>().raw)};
+#else
+  return hn::OddEven(odd, AsI16(hn::ShiftRight<16>(AsI32(even))));
+#endif
+}
+
+// Four bytes of a pixel from the low and high words of two vectors, that is x0 y0 and alpha x1, to x0 x1 y0 alpha: the
+// words are clamped to 0..255, alpha is that of the pixels or opaque.
 template <AlphaWrite kAlpha>
-HWY_INLINE U8 AlphaBytes(U8 pixels) {
-  return kAlpha == AlphaWrite::Keep ? pixels : Dwords(0xFF000000);
+HWY_INLINE U8 PackPixels(I16 outer, I16 innerHigh, U8 pixels) {
+  static constexpr ShuffleTable kOrder({0, 9, 1, 8, 2, 11, 3, 10, 4, 13, 5, 12, 6, 15, 7, 14});
+#if HWY_TARGET == HWY_AVX3
+  const __mmask64 low = ByteMask(0x0000FFFF);
+  const I16 inner{kAlpha == AlphaWrite::Keep
+                      ? _mm512_mask_shuffle_epi8(innerHigh.raw, low, pixels.raw, ByteOrder<0x8383>().raw)
+                      : _mm512_mask_mov_epi8(innerHigh.raw, low, Dwords(0x000000FF).raw)};
+#else
+  const hn::ScalableTag<uint32_t> d;
+  const auto alpha = kAlpha == AlphaWrite::Keep ? hn::ShiftRight<24>(hn::BitCast(d, pixels)) : hn::Set(d, 255u);
+  const I16 inner = hn::OddEven(innerHigh, AsI16(alpha));
+#endif
+  return hn::TableLookupBytes(PackBlocks(outer, inner), kOrder.Load());
 }
 
 // FixedMatrix8 with its numbers in vectors.
@@ -99,16 +138,14 @@ struct VectorMatrix8 {
     return hn::Add(MultiplyPairs(outerChannels, outer[j]), MultiplyPairs(innerChannel, inner[j]));
   }
   static HWY_INLINE I16 OuterChannels(U8 pixels) { return AsI16(hn::And(pixels, Dwords(0x00FF00FF))); }
-  HWY_INLINE I16 InnerChannel(U8 pixels) const {
-    const auto doubled = AsU8(hn::ShiftRight<7>(AsU16(pixels)));
-    return AsI16(hn::OrAnd(unit, doubled, Dwords(0x000001FE)));
-  }
+  HWY_INLINE I16 InnerChannel(U8 pixels) const { return InnerOfDoubled(AsU8(hn::ShiftRight<7>(AsU16(pixels)))); }
+  HWY_INLINE I16 InnerOfDoubled(U8 doubled) const { return AsI16(hn::OrAnd(unit, doubled, Dwords(0x000001FE))); }
 
   I16 outer[3], inner[3];
   U8 unit;
 };
 
-// FixedYuvToRgb8 with its numbers in vectors.
+// FixedYuvToRgb8 with its numbers in vectors. Words have 6 fractional bits.
 struct VectorYuvToRgb8 {
   HWY_INLINE explicit VectorYuvToRgb8(const FixedYuvToRgb8& f)
       : luma(AsU16(WordPair(f.luma, f.luma))),
@@ -120,24 +157,17 @@ struct VectorYuvToRgb8 {
 
   // Of words 256 Y.
   HWY_INLINE I16 Luma(U16 y) const { return hn::Add(AsI16(hn::MulHigh(y, luma)), lumaBias); }
-  // B and R in the low and high word of each pixel, from its luma in both and the pair (u, v).
-  HWY_INLINE I16 BlueRed(I16 y, I16 uv) const { return AddChroma(y, uv, blueRed); }
-  // The same for words of one kind.
-  HWY_INLINE I16 Blue(I16 y, I16 u) const { return AddChroma(y, u, blue); }
-  HWY_INLINE I16 Red(I16 y, I16 v) const { return AddChroma(y, v, red); }
-  // What chroma adds to G, in the high word of each pixel.
-  HWY_INLINE I16 GreenChroma(I16 uv) const { return AsI16(MultiplyPairs(uv, green)); }
-
-  static HWY_INLINE I16 AddChroma(I16 y, I16 c, I16 factor) {
-    return hn::SaturatedAdd(hn::Add(y, hn::MulFixedPoint15(c, factor)), c);
+  // Luma plus the chroma part of one or two channels, less the fraction; `factor` is one of the vectors below.
+  static HWY_INLINE I16 AddChroma(I16 y, I16 chroma, I16 factor) {
+    return Integers(y, hn::MulFixedPoint15(chroma, factor));
   }
+  // What chroma adds to G, in the high word of each pair (u, v).
+  HWY_INLINE I16 GreenChroma(I16 uv) const { return AsI16(MultiplyPairs(uv, green)); }
+  static HWY_INLINE I16 Integers(I16 y, I16 chroma) { return hn::ShiftRight<6>(hn::SaturatedAdd(y, chroma)); }
 
   U16 luma;
   I16 lumaBias, blueRed, blue, red, green;
 };
-
-// Doubles with saturation: the upper byte of each word is then the 8-bit result less 128.
-HWY_INLINE I16 Double(I16 v) { return hn::SaturatedAdd(v, v); }
 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel

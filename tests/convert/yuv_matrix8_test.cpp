@@ -57,18 +57,18 @@ TEST(YuvMatrix8, EveryColourIsRoundedRight) {
         in[4 * i + 2] = static_cast<uint8_t>(c2);
       }
       (*matrix.kept)[ActiveKernelVariant()](in.data(), out.data(), kRow);
-      for (size_t i = 0; i < kRow; ++i) {
-        for (int j = 0; j < 3; ++j) {
+      for (size_t j = 0; j < 3; ++j) {
+        for (size_t i = 0; i < kRow; ++i) {
           const double exact = origin.c[j] + steps[0].c[j] * static_cast<double>(i & 255) +
                                steps[1].c[j] * static_cast<double>(i >> 8) + steps[2].c[j] * c2;
-          const double error = std::abs(out[4 * i + static_cast<size_t>(j)] - Code8(exact));
+          const double error = std::abs(out[4 * i + j] - Code8(exact));
           worst = std::max(worst, error);
           notNearest += error > 0.5 + 1e-9;
         }
       }
     }
     const double share = static_cast<double>(notNearest) / (3.0 * 256 * kRow);
-    EXPECT_LT(worst, 0.515) << matrix.name;
+    EXPECT_LT(worst, 0.52) << matrix.name;
     EXPECT_LT(share, 0.004) << matrix.name;
     RecordProperty(matrix.name, std::to_string(worst) + ", not nearest " + std::to_string(share));
   }
