@@ -65,18 +65,22 @@ HWY_INLINE F32 FinishAlpha(F32 colour, F32 source) {
   return TakeChannels<8>(colour, kOpaque ? hn::Set(FloatTag(), 1.0f) : source);
 }
 
-// One vector of floats from its studio codes of 8 or 10 bits (Code: uint8_t, uint16_t).
-template <const StudioScale& kScale, class Code = uint8_t>
-HWY_INLINE F32 WidenCodes(const uint8_t* HWY_RESTRICT src) {
+// One vector of floats from its studio codes.
+template <const StudioScale& kScale>
+HWY_INLINE F32 CodesToFloat(I32 codes) {
   const hn::RebindToSigned<FloatTag> di;
-  const auto codes = hn::Sub(LoadPromoted<int32_t, Code>(src), hn::LoadDup128(di, kScale.zero));
-  return hn::Mul(hn::ConvertTo(FloatTag(), codes), hn::LoadDup128(FloatTag(), kScale.toFloat));
+  return hn::Mul(hn::ConvertTo(FloatTag(), hn::Sub(codes, hn::LoadDup128(di, kScale.zero))),
+                 hn::LoadDup128(FloatTag(), kScale.toFloat));
+}
+template <const StudioScale& kScale>
+HWY_INLINE F32 WidenCodes(const uint8_t* HWY_RESTRICT src) {
+  return CodesToFloat<kScale>(LoadPromoted<int32_t, uint8_t>(src));
 }
 
 // One vector of codes from its floats, not yet saturated. NaN and what int32 cannot hold gives INT32_MIN.
-template <const StudioScale& kScale>
-HWY_INLINE I32 ScaleToCodes(F32 v) {
-  const FloatTag d;
+template <const StudioScale& kScale, class V>
+HWY_INLINE auto ScaleToCodes(V v) {
+  const hn::DFromV<V> d;
   return ConvertNearest(hn::Add(hn::Mul(v, hn::LoadDup128(d, kScale.fromFloat)), hn::LoadDup128(d, kScale.offset)));
 }
 

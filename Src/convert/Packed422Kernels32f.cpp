@@ -70,37 +70,46 @@ namespace {
 
 constexpr size_t kVectorPairs = kVectorPixels;
 
+constexpr size_t kBlockPairs = 4 * kVectorPairs;
+
+struct SwapBlock {
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    for (size_t i = 0; i < 4; ++i) StoreVector(hn::Shuffle2301(LoadVector<int32_t>(in, i)), out, i);
+  }
+};
+
+template <const StudioScale& kScale>
+struct WidenBlock {
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    for (size_t i = 0; i < 4; ++i) StoreVector(WidenCodes<kScale>(in + i * kLanes<float>), out, i);
+  }
+};
+
+template <const StudioScale& kScale>
+struct NarrowBlock {
+  static HWY_INLINE I32 Codes(const uint8_t* HWY_RESTRICT in, size_t index) {
+    return ScaleToCodes<kScale>(LoadVector<float>(in, index));
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    StoreVector(PackTo8(Codes(in, 0), Codes(in, 1), Codes(in, 2), Codes(in, 3)), out);
+  }
+};
+
 void Swap422_32f(const uint8_t* src, uint8_t* dst, size_t count) {
-  RowLoop<4 * kVectorPairs, 16, 16>(src, dst, PairsOf(count),
-                                    [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-                                      for (size_t i = 0; i < 4; ++i)
-                                        StoreVector(hn::Shuffle2301(LoadVector<int32_t>(in, i)), out, i);
-                                    });
+  RowLoop<kBlockPairs, 16, 16>(src, dst, PairsOf(count), SwapBlock());
 }
-
-template <const StudioScale& kScale>
-HWY_INLINE void WidenPairs(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  RowLoop<4 * kVectorPairs, 4, 16>(src, dst, PairsOf(count),
-                                   [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-                                     for (size_t i = 0; i < 4; ++i)
-                                       StoreVector(WidenCodes<kScale>(in + i * kLanes<float>), out, i);
-                                   });
+void Uyvy8To32f(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPairs, 4, 16>(src, dst, PairsOf(count), WidenBlock<kUyvy8Scale>());
 }
-
-void Uyvy8To32f(const uint8_t* src, uint8_t* dst, size_t count) { WidenPairs<kUyvy8Scale>(src, dst, count); }
-void Yuyv8To32f(const uint8_t* src, uint8_t* dst, size_t count) { WidenPairs<kYuyv8Scale>(src, dst, count); }
-
-template <const StudioScale& kScale>
-HWY_INLINE void NarrowPairs(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  RowLoop<4 * kVectorPairs, 16, 4>(
-      src, dst, PairsOf(count), [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto codes = [in](size_t i) HWY_ATTR { return ScaleToCodes<kScale>(LoadVector<float>(in, i)); };
-        StoreVector(PackTo8(codes(0), codes(1), codes(2), codes(3)), out);
-      });
+void Yuyv8To32f(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPairs, 4, 16>(src, dst, PairsOf(count), WidenBlock<kYuyv8Scale>());
 }
-
-void Uyvy32fTo8(const uint8_t* src, uint8_t* dst, size_t count) { NarrowPairs<kUyvy8Scale>(src, dst, count); }
-void Yuyv32fTo8(const uint8_t* src, uint8_t* dst, size_t count) { NarrowPairs<kYuyv8Scale>(src, dst, count); }
+void Uyvy32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPairs, 16, 4>(src, dst, PairsOf(count), NarrowBlock<kUyvy8Scale>());
+}
+void Yuyv32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPairs, 16, 4>(src, dst, PairsOf(count), NarrowBlock<kYuyv8Scale>());
+}
 
 // The even pixels of kVectorPairs pixel pairs, or the odd ones.
 HWY_INLINE F32 LoadEvenPixels(const uint8_t* HWY_RESTRICT p) {

@@ -28,21 +28,21 @@ constexpr size_t GroupsOf(size_t pixels) { return (pixels + 5) / 6; }
 // Black pairs for what a last group holds beyond the row. In float and as zero samples of a read row they need no fill.
 constexpr uint32_t kBlackUyvy8 = 0x10801080;
 
-// Fixed point: products of a 16-bit value and a coefficient in units of 2^-15, rounded. Results are codes of 8 bits in
-// units of 2^-6. Luma comes in as 10-bit codes times 32, chroma as sums of two 10-bit codes times 32.
-constexpr int16_t ToFixed(double resultPerInput) {
-  const double v = resultPerInput * 32768.0;
+// Fixed point: products of a 16-bit value and a coefficient in units of 2^-15, rounded. Factors are 10-bit codes times
+// 64 less 2^15, which is zero chroma; results are 8-bit codes times 64.
+constexpr int16_t ToFixed(double factor) {
+  const double v = factor / 4 * 32768;
   return static_cast<int16_t>(v < 0 ? v - 0.5 : v + 0.5);
 }
-constexpr double kLumaUnit = 64.0 / (4 * 32), kChromaUnit = 64.0 / (2 * 4 * 32);
 
 struct BgrFixed {
-  int16_t y, bU, gU, gV, rV;
+  int16_t y, offset, bU, gU, gV, rV;
 };
 constexpr BgrFixed MakeBgrFixed(const YuvMatrix& m) {
-  constexpr double kLuma = 255.0 / kLumaRange8 * kLumaUnit, kChroma = 255.0 / kChromaRange8 * kChromaUnit;
-  return {ToFixed(kLuma), ToFixed(m.bU * kChroma), ToFixed(m.gU * kChroma), ToFixed(m.gV * kChroma),
-          ToFixed(m.rV * kChroma)};
+  constexpr double kLuma = 255.0 / kLumaRange8, kChroma = 255.0 / kChromaRange8;
+  constexpr double kOffset = (128 - kLumaBlack8) * kLuma * 64 + 0.5;
+  return {ToFixed(kLuma),          static_cast<int16_t>(kOffset), ToFixed(m.bU * kChroma),
+          ToFixed(m.gU * kChroma), ToFixed(m.gV * kChroma),       ToFixed(m.rV * kChroma)};
 }
 inline constexpr BgrFixed kBgrFixed601 = MakeBgrFixed(kBt601), kBgrFixed709 = MakeBgrFixed(kBt709);
 
@@ -50,11 +50,36 @@ struct RecodingFixed {
   int16_t vU, vV, uU, uV, yU, yV;
 };
 constexpr RecodingFixed MakeRecodingFixed(const YuvRecoding& r) {
-  constexpr double kLuma = double{kLumaRange8} / kChromaRange8 * kChromaUnit;
-  return {ToFixed(r.vU * kChromaUnit), ToFixed(r.vV * kChromaUnit), ToFixed(r.uU * kChromaUnit),
-          ToFixed(r.uV * kChromaUnit), ToFixed(r.yU * kLuma),       ToFixed(r.yV * kLuma)};
+  constexpr double kLuma = double{kLumaRange8} / kChromaRange8;
+  return {ToFixed(r.vU), ToFixed(r.vV), ToFixed(r.uU), ToFixed(r.uV), ToFixed(r.yU * kLuma), ToFixed(r.yV * kLuma)};
 }
 inline constexpr RecodingFixed kRecodingFixed709To601 = MakeRecodingFixed(k709To601);
+
+// The two bytes that hold sample `index` of a group, and the factor that moves it to the top of their 16 bits, where
+// the bits above it fall out.
+constexpr uint8_t FirstByte(size_t index) { return static_cast<uint8_t>(index / 3 * 4 + index % 3); }
+constexpr uint16_t ToTop(size_t index) { return static_cast<uint16_t>(64 >> 2 * (index % 3)); }
+
+// How kVectors vectors of kBlocks 128-bit blocks take their samples, kLanes of kBytes bytes to a block, from the groups
+// in order. A sample ends at the top of its lane.
+template <size_t kVectors, size_t kBlocks, size_t kBytes>
+struct UnpackTable {
+  static constexpr size_t kLanes = 16 / kBytes;
+  alignas(64) uint8_t bytes[kVectors][16 * kBlocks];
+  alignas(64) uint16_t factors[kVectors][8 * kBlocks];
+};
+template <size_t kVectors, size_t kBlocks, size_t kBytes>
+constexpr UnpackTable<kVectors, kBlocks, kBytes> MakeUnpackTable() {
+  UnpackTable<kVectors, kBlocks, kBytes> table{};
+  for (size_t i = 0; i < kVectors * kBlocks * table.kLanes; ++i) {
+    const size_t vector = i / (kBlocks * table.kLanes), end = (i % (kBlocks * table.kLanes) + 1) * kBytes;
+    for (size_t byte = end - kBytes; byte < end - 2; ++byte) table.bytes[vector][byte] = 0x80;
+    table.bytes[vector][end - 2] = FirstByte(i % kGroupSamples);
+    table.bytes[vector][end - 1] = static_cast<uint8_t>(FirstByte(i % kGroupSamples) + 1);
+    table.factors[vector][end / 2 - 1] = ToTop(i % kGroupSamples);
+  }
+  return table;
+}
 
 }  // namespace
 }  // namespace vexel
@@ -114,108 +139,158 @@ HWY_INLINE Full<T> Repeat(const T* lanes) {
   return hn::LoadDup128(hn::ScalableTag<T>(), lanes);
 }
 
+struct PackBytes {
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    static constexpr uint8_t Z = 0x80;
+    alignas(16) static constexpr uint8_t kOuter[16] = {0, Z, 2, Z, 3, Z, 5, Z, 6, Z, 8, Z, 9, Z, 11, Z};
+    alignas(16) static constexpr uint8_t kMiddle[16] = {Z, 1, Z, Z, Z, 4, Z, Z, Z, 7, Z, Z, Z, 10, Z, Z};
+    alignas(16) static constexpr uint16_t kShift[8] = {4, 64, 4, 64, 4, 64, 4, 64};
+    const hn::ScalableTag<uint16_t> d16;
+    const hn::ScalableTag<uint32_t> d32;
+    const auto groups = SpreadGroups(LoadVector<uint8_t>(in));
+    const auto outer = hn::BitCast(d16, hn::TableLookupBytesOr0(groups, Repeat(kOuter)));
+    const auto middle = hn::BitCast(d32, hn::TableLookupBytesOr0(groups, Repeat(kMiddle)));
+    StoreVector(hn::Or(hn::BitCast(d32, hn::Mul(outer, Repeat(kShift))), hn::ShiftLeft<4>(middle)), out);
+  }
+};
+
 void Uyvy8ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kVectorGroups, 12, 16, 4 * kVectorGroups, 0, kBlackUyvy8>(
-      src, 4 * PairsOf(count), dst, 16 * GroupsOf(count),
-      [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        static constexpr uint8_t Z = 0x80;
-        alignas(16) static constexpr uint8_t kOuter[16] = {0, Z, 2, Z, 3, Z, 5, Z, 6, Z, 8, Z, 9, Z, 11, Z};
-        alignas(16) static constexpr uint8_t kMiddle[16] = {Z, 1, Z, Z, Z, 4, Z, Z, Z, 7, Z, Z, Z, 10, Z, Z};
-        alignas(16) static constexpr uint16_t kShift[8] = {4, 64, 4, 64, 4, 64, 4, 64};
-        const hn::ScalableTag<uint16_t> d16;
-        const hn::ScalableTag<uint32_t> d32;
-        const auto groups = SpreadGroups(LoadVector<uint8_t>(in));
-        const auto outer = hn::BitCast(d16, hn::TableLookupBytesOr0(groups, Repeat(kOuter)));
-        const auto middle = hn::BitCast(d32, hn::TableLookupBytesOr0(groups, Repeat(kMiddle)));
-        StoreVector(hn::Or(hn::BitCast(d32, hn::Mul(outer, Repeat(kShift))), hn::ShiftLeft<4>(middle)), out);
-      });
+  GroupLoop<kVectorGroups, 12, 16, 4 * kVectorGroups, 0, kBlackUyvy8>(src, 4 * PairsOf(count), dst,
+                                                                      16 * GroupsOf(count), PackBytes());
 }
+
+struct UnpackBytes {
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    alignas(16) static constexpr uint8_t kOrder[16] = {0, 8, 1, 2, 10, 3, 4, 12, 5, 6, 14, 7, 9, 11, 13, 15};
+    // A rounded product with 2^13 is a rounded shift by 2; the third sample stands 4 bits higher.
+    alignas(16) static constexpr int16_t kShift[8] = {1 << 13, 1 << 9, 1 << 13, 1 << 9,
+                                                      1 << 13, 1 << 9, 1 << 13, 1 << 9};
+    const hn::ScalableTag<int16_t> d16;
+    const hn::ScalableTag<uint32_t> d32;
+    const auto words = LoadVector<uint32_t>(in);
+    const auto outer = hn::BitCast(d16, hn::And(words, hn::Set(d32, 0x3FF003FF)));
+    const auto middle = hn::BitCast(d16, hn::And(hn::ShiftRight<10>(words), hn::Set(d32, 0x3FF)));
+    const auto shift = Repeat(kShift);
+    const auto bytes = PackBlocks(hn::MulFixedPoint15(outer, shift), hn::MulFixedPoint15(middle, shift));
+    StoreVector(GatherGroups(hn::TableLookupBytes(bytes, Repeat(kOrder))), out);
+  }
+};
 
 void V210ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kVectorGroups, 16, 12, 0, 4 * kVectorGroups, 0>(
-      src, 16 * GroupsOf(count), dst, 4 * PairsOf(count),
-      [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        alignas(16) static constexpr uint8_t kOrder[16] = {0, 8, 1, 2, 10, 3, 4, 12, 5, 6, 14, 7, 9, 11, 13, 15};
-        // A rounded product with 2^13 is a rounded shift by 2; the third sample stands 4 bits higher.
-        alignas(16) static constexpr int16_t kShift[8] = {1 << 13, 1 << 9, 1 << 13, 1 << 9,
-                                                          1 << 13, 1 << 9, 1 << 13, 1 << 9};
-        const hn::ScalableTag<int16_t> d16;
-        const hn::ScalableTag<uint32_t> d32;
-        const auto words = LoadVector<uint32_t>(in);
-        const auto outer = hn::BitCast(d16, hn::And(words, hn::Set(d32, 0x3FF003FF)));
-        const auto middle = hn::BitCast(d16, hn::And(hn::ShiftRight<10>(words), hn::Set(d32, 0x3FF)));
-        const auto shift = Repeat(kShift);
-        const auto bytes = PackBlocks(hn::MulFixedPoint15(outer, shift), hn::MulFixedPoint15(middle, shift));
-        StoreVector(GatherGroups(hn::TableLookupBytes(bytes, Repeat(kOrder))), out);
-      });
+  GroupLoop<kVectorGroups, 16, 12, 0, 4 * kVectorGroups, 0>(src, 16 * GroupsOf(count), dst, 4 * PairsOf(count),
+                                                            UnpackBytes());
 }
 
-// 16-bit samples. A block of 8 groups is a whole number of vectors of floats on every target.
-constexpr size_t kBlockGroups = 8, kBlockSamples = kBlockGroups * kGroupSamples;
+// Two groups at a time, one per block; the wider targets gain nothing from four.
+using PackTag = hn::CappedTag<float, 8>;
+constexpr size_t kPackGroups = hn::MaxLanes(PackTag()) / 4;
 
-// The samples of a group; kSpareSamples more are overwritten.
-constexpr size_t kSpareSamples = 4;
-HWY_INLINE void UnpackGroup(const uint8_t* HWY_RESTRICT src, uint16_t* HWY_RESTRICT samples) {
-  // The two bytes that hold a sample, moved so that it ends at bit 15 and the bits above it fall out.
-  alignas(32) static constexpr uint8_t kBytes[32] = {0,  1,  1,    2,    2,    3,    4,    5,    5,    6,   6,
-                                                     7,  8,  9,    9,    10,   10,   11,   12,   13,   13,  14,
-                                                     14, 15, 0x80, 0x80, 0x80, 0x80, 0x80, 0x80, 0x80, 0x80};
-  alignas(32) static constexpr uint16_t kShift[16] = {64, 16, 4, 64, 16, 4, 64, 16, 4, 64, 16, 4, 0, 0, 0, 0};
-  const hn::CappedTag<uint16_t, 16> d16;
-  const hn::Repartition<uint8_t, decltype(d16)> d8;
-  constexpr size_t kN = hn::MaxLanes(d16);
-  const auto group = hn::LoadDup128(d8, src);
-  for (size_t i = 0; i < 16; i += kN) {
-    const auto moved = hn::BitCast(d16, hn::TableLookupBytesOr0(group, hn::Load(d8, kBytes + 2 * i)));
-    hn::StoreU(hn::ShiftRight<6>(hn::Mul(moved, hn::Load(d16, kShift + i))), d16, samples + i);
-  }
+// The pair kPair of each group as 10-bit codes, not yet saturated.
+template <size_t kPair>
+HWY_INLINE auto LoadPairs(const uint8_t* HWY_RESTRICT groups) {
+  const auto* floats = reinterpret_cast<const float*>(groups) + 4 * kPair;
+#if HWY_TARGET <= HWY_AVX2
+  const hn::Full128<float> d;
+  return ScaleToCodes<kUyvy10Scale>(hn::Combine(PackTag(), hn::LoadU(d, floats + kGroupSamples), hn::LoadU(d, floats)));
+#else
+  return ScaleToCodes<kUyvy10Scale>(hn::LoadU(PackTag(), floats));
+#endif
 }
 
-HWY_INLINE void PackGroup(const uint16_t* HWY_RESTRICT samples, uint8_t* HWY_RESTRICT dst) {
+struct PackFloats {
   static constexpr uint8_t Z = 0x80;
-  // Of the first 8 samples and of the last 8: the lower two of each word, and the third in an upper half.
-  alignas(16) static constexpr uint8_t kTwo[2][16] = {{0, 1, 2, 3, 6, 7, 8, 9, Z, Z, Z, Z, Z, Z, Z, Z},
-                                                      {Z, Z, Z, Z, Z, Z, Z, Z, 4, 5, 6, 7, 10, 11, 12, 13}};
-  alignas(16) static constexpr uint8_t kThird[2][16] = {{Z, Z, 4, 5, Z, Z, 10, 11, Z, Z, Z, Z, Z, Z, Z, Z},
-                                                        {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, Z, Z, 14, 15}};
-  const hn::CappedTag<uint8_t, 16> d8;
-  const hn::Repartition<uint16_t, decltype(d8)> d16;
-  const hn::Repartition<uint32_t, decltype(d8)> d32;
-  const auto first = hn::BitCast(d8, hn::LoadU(d16, samples)), last = hn::BitCast(d8, hn::LoadU(d16, samples + 4));
-  const auto pick = [&](const uint8_t(&bytes)[2][16]) HWY_ATTR {
-    return hn::BitCast(d32, hn::Or(hn::TableLookupBytesOr0(first, hn::Load(d8, bytes[0])),
-                                   hn::TableLookupBytesOr0(last, hn::Load(d8, bytes[1]))));
-  };
-  const decltype(pick(kTwo)) lower{_mm_madd_epi16(pick(kTwo).raw, _mm_set1_epi32(1 | 1024 << 16))};
-  hn::StoreU(hn::BitCast(d8, hn::Or(lower, hn::ShiftLeft<4>(pick(kThird)))), d8, dst);
-}
+  using Table = uint8_t[2][16];
+  // Of a group's first 8 samples and of its last 8: the lower two of each word, and the third in an upper half.
+  alignas(16) static constexpr Table kTwo = {{0, 1, 2, 3, 6, 7, 8, 9, Z, Z, Z, Z, Z, Z, Z, Z},
+                                             {Z, Z, Z, Z, Z, Z, Z, Z, 4, 5, 6, 7, 10, 11, 12, 13}};
+  alignas(16) static constexpr Table kThird = {{Z, Z, 4, 5, Z, Z, 10, 11, Z, Z, Z, Z, Z, Z, Z, Z},
+                                               {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, Z, Z, 14, 15}};
+
+  template <class V>
+  static HWY_INLINE V Saturate(V v) {
+    const hn::DFromV<V> d;
+    return hn::Min(hn::Max(v, hn::Zero(d)), hn::Set(d, 1023));
+  }
+  template <class V>
+  static HWY_INLINE V Pick(V first, V last, const Table& table) {
+    const hn::Repartition<uint8_t, hn::DFromV<V>> d8;
+    const auto a = hn::TableLookupBytesOr0(hn::BitCast(d8, first), hn::LoadDup128(d8, table[0]));
+    const auto b = hn::TableLookupBytesOr0(hn::BitCast(d8, last), hn::LoadDup128(d8, table[1]));
+    return hn::BitCast(hn::DFromV<V>(), hn::Or(a, b));
+  }
+
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    const hn::Repartition<int16_t, PackTag> d16;
+    const hn::Repartition<int32_t, PackTag> d32;
+    const hn::Repartition<uint8_t, PackTag> d8;
+    const auto middle = LoadPairs<1>(in);
+    const auto first = Saturate(hn::ReorderDemote2To(d16, LoadPairs<0>(in), middle));
+    const auto last = Saturate(hn::ReorderDemote2To(d16, middle, LoadPairs<2>(in)));
+    const auto two = Pick(first, last, kTwo), third = Pick(first, last, kThird);
+    // A sum of products puts the second sample above the first.
+#if HWY_TARGET <= HWY_AVX2
+    const hn::VFromD<decltype(d32)> lower{_mm256_madd_epi16(two.raw, _mm256_set1_epi32(1 | 1024 << 16))};
+#else
+    const hn::VFromD<decltype(d32)> lower{_mm_madd_epi16(two.raw, _mm_set1_epi32(1 | 1024 << 16))};
+#endif
+    hn::StoreU(hn::BitCast(d8, hn::Or(lower, hn::ShiftLeft<4>(hn::BitCast(d32, third)))), d8, out);
+  }
+};
 
 void Uyvy32fToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kBlockGroups, 48, 16, 0, 0, 0>(
-      src, 16 * PairsOf(count), dst, 16 * GroupsOf(count),
-      [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const hn::ScalableTag<int16_t> d16;
-        alignas(64) uint16_t samples[kBlockSamples];
-        auto* bytes = reinterpret_cast<uint8_t*>(samples);
-        for (size_t i = 0; i < kBlockSamples / kLanes<int16_t>; ++i) {
-          const auto codes = PackTo16(ScaleToCodes<kUyvy10Scale>(LoadVector<float>(in, 2 * i)),
-                                      ScaleToCodes<kUyvy10Scale>(LoadVector<float>(in, 2 * i + 1)));
-          StoreVector(hn::Min(hn::Max(codes, hn::Zero(d16)), hn::Set(d16, 1023)), bytes, i);
-        }
-        for (size_t i = 0; i < kBlockGroups; ++i) PackGroup(samples + i * kGroupSamples, out + i * kGroupBytes);
-      });
+  GroupLoop<kPackGroups, 48, 16, 0, 0, 0>(src, 16 * PairsOf(count), dst, 16 * GroupsOf(count), PackFloats());
 }
 
+// The groups that the blocks of vector kIndex of three come from.
+template <size_t kIndex>
+HWY_INLINE U8 RepeatGroups(U8 groups) {
+#if HWY_TARGET == HWY_AVX3
+  constexpr int kOrder[3] = {0x40, 0xA5, 0xFE};
+  return U8{_mm512_shuffle_i64x2(groups.raw, groups.raw, kOrder[kIndex])};
+#elif HWY_TARGET == HWY_AVX2
+  constexpr int kOrder[3] = {0x44, 0xE4, 0xEE};
+  return U8{_mm256_permute4x64_epi64(groups.raw, kOrder[kIndex])};
+#else
+  return groups;
+#endif
+}
+
+struct UnpackFloats {
+  static constexpr auto kTable = MakeUnpackTable<3, kVectorGroups, 4>();
+
+  template <size_t kIndex>
+  static HWY_INLINE void Unpack(U8 groups, uint8_t* HWY_RESTRICT out) {
+    const hn::ScalableTag<uint8_t> d8;
+    const hn::ScalableTag<uint16_t> d16;
+    const hn::ScalableTag<uint32_t> d32;
+    const auto bytes = hn::TableLookupBytesOr0(RepeatGroups<kIndex>(groups), hn::Load(d8, kTable.bytes[kIndex]));
+    const auto atTop = hn::Mul(hn::BitCast(d16, bytes), hn::Load(d16, kTable.factors[kIndex]));
+    const auto codes = hn::BitCast(hn::ScalableTag<int32_t>(), hn::ShiftRight<22>(hn::BitCast(d32, atTop)));
+    StoreVector(CodesToFloat<kUyvy10Scale>(codes), out, kIndex);
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    const auto groups = LoadVector<uint8_t>(in);
+    Unpack<0>(groups, out);
+    Unpack<1>(groups, out);
+    Unpack<2>(groups, out);
+  }
+};
+
 void V210ToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kBlockGroups, 16, 48, 0, 0, 0>(
-      src, 16 * GroupsOf(count), dst, 16 * PairsOf(count),
-      [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        alignas(64) uint16_t samples[kBlockSamples + kSpareSamples];
-        for (size_t i = 0; i < kBlockGroups; ++i) UnpackGroup(in + i * kGroupBytes, samples + i * kGroupSamples);
-        const auto* bytes = reinterpret_cast<const uint8_t*>(samples);
-        for (size_t i = 0; i < kBlockSamples / kLanes<float>; ++i)
-          StoreVector(WidenCodes<kUyvy10Scale, uint16_t>(bytes + 2 * i * kLanes<float>), out, i);
-      });
+  GroupLoop<kVectorGroups, 16, 48, 0, 0, 0>(src, 16 * GroupsOf(count), dst, 16 * PairsOf(count), UnpackFloats());
+}
+
+// The samples of a group, times 64, and zeros for the rest of 16.
+HWY_INLINE void UnpackGroup(const uint8_t* HWY_RESTRICT src, uint16_t* HWY_RESTRICT samples) {
+  static constexpr auto kTable = MakeUnpackTable<1, 2, 2>();
+  const hn::CappedTag<uint16_t, 16> d16;
+  const hn::Repartition<uint8_t, decltype(d16)> d8;
+  const auto group = hn::LoadDup128(d8, src);
+  for (size_t i = 0; i < 16; i += hn::MaxLanes(d16)) {
+    const auto bytes = hn::BitCast(d16, hn::TableLookupBytesOr0(group, hn::Load(d8, kTable.bytes[0] + 2 * i)));
+    const auto atTop = hn::Mul(bytes, hn::Load(d16, kTable.factors[0] + i));
+    hn::StoreU(hn::And(atTop, hn::Set(d16, 0xFFC0)), d16, samples + i);
+  }
 }
 
 // Three channels of 16 bits, not yet saturated to bytes.
@@ -223,86 +298,88 @@ struct Channels16 {
   I16 c[3];
 };
 
-HWY_INLINE I16 RoundCode(I16 v) {
-  return hn::ShiftRight<6>(hn::SaturatedAdd(v, hn::Set(hn::ScalableTag<int16_t>(), 32)));
-}
-HWY_INLINE I16 Times(I16 v, int16_t coefficient) {
-  return hn::MulFixedPoint15(v, hn::Set(hn::ScalableTag<int16_t>(), coefficient));
-}
+HWY_INLINE I16 Set16(int v) { return hn::Set(hn::ScalableTag<int16_t>(), static_cast<int16_t>(v)); }
+HWY_INLINE I16 Times(I16 v, int16_t coefficient) { return hn::MulFixedPoint15(v, Set16(coefficient)); }
 
-// The steps take luma codes and sums of two chroma codes. Sums that leave 16 bits saturate; they are beyond white or
-// black anyway.
+// The steps take codes times 64, with the top bit flipped: less 2^15, as signed. Sums that leave 16 bits saturate; they
+// are beyond white or black anyway.
 template <const BgrFixed& kM>
 struct ToBgr8 {
-  static HWY_INLINE Channels16 Apply(I16 luma, I16 u2, I16 v2) {
-    const hn::ScalableTag<int16_t> d;
-    const auto y = Times(hn::ShiftLeft<5>(hn::Sub(luma, hn::Set(d, 64))), kM.y);
-    const auto u = hn::ShiftLeft<5>(hn::Sub(u2, hn::Set(d, 1024))), v = hn::ShiftLeft<5>(hn::Sub(v2, hn::Set(d, 1024)));
-    return {{RoundCode(hn::SaturatedAdd(y, Times(u, kM.bU))),
-             RoundCode(hn::SaturatedAdd(y, hn::Add(Times(u, kM.gU), Times(v, kM.gV)))),
-             RoundCode(hn::SaturatedAdd(y, Times(v, kM.rV)))}};
+  static HWY_INLINE Channels16 Apply(I16 luma, I16 u, I16 v) {
+    const auto y = hn::Add(Times(luma, kM.y), Set16(kM.offset + 32));
+    return {{hn::ShiftRight<6>(hn::SaturatedAdd(y, Times(u, kM.bU))),
+             hn::ShiftRight<6>(hn::SaturatedAdd(y, hn::Add(Times(u, kM.gU), Times(v, kM.gV)))),
+             hn::ShiftRight<6>(hn::SaturatedAdd(y, Times(v, kM.rV)))}};
   }
 };
 
 struct ToVuy8 {
-  static HWY_INLINE Channels16 Apply(I16 luma, I16 u2, I16 v2) {
-    const hn::ScalableTag<int16_t> d;
-    const auto four = hn::Set(d, 4);
-    return {{hn::ShiftRight<3>(hn::Add(v2, four)), hn::ShiftRight<3>(hn::Add(u2, four)),
-             hn::ShiftRight<2>(hn::Add(luma, hn::Set(d, 2)))}};
-  }
+  static HWY_INLINE I16 Round(I16 v) { return hn::Add(hn::ShiftRight<8>(hn::SaturatedAdd(v, Set16(128))), Set16(128)); }
+  static HWY_INLINE Channels16 Apply(I16 luma, I16 u, I16 v) { return {{Round(v), Round(u), Round(luma)}}; }
 };
 
 template <const RecodingFixed& kR>
 struct RecodeToVuy8 {
-  static HWY_INLINE Channels16 Apply(I16 luma, I16 u2, I16 v2) {
-    const hn::ScalableTag<int16_t> d;
-    const auto zero = hn::Set(d, kChromaZero8 * 64);
-    const auto u = hn::ShiftLeft<5>(hn::Sub(u2, hn::Set(d, 1024))), v = hn::ShiftLeft<5>(hn::Sub(v2, hn::Set(d, 1024)));
-    return {{RoundCode(hn::Add(hn::Add(Times(u, kR.vU), Times(v, kR.vV)), zero)),
-             RoundCode(hn::Add(hn::Add(Times(u, kR.uU), Times(v, kR.uV)), zero)),
-             RoundCode(hn::Add(hn::Add(Times(u, kR.yU), Times(v, kR.yV)), hn::ShiftLeft<4>(luma)))}};
+  static HWY_INLINE Channels16 Apply(I16 luma, I16 u, I16 v) {
+    const auto half = Set16(128 * 64 + 32);
+    return {{hn::ShiftRight<6>(hn::Add(hn::Add(Times(u, kR.vU), Times(v, kR.vV)), half)),
+             hn::ShiftRight<6>(hn::Add(hn::Add(Times(u, kR.uU), Times(v, kR.uV)), half)),
+             hn::ShiftRight<6>(
+                 hn::Add(hn::Add(Times(u, kR.yU), Times(v, kR.yV)), hn::Add(hn::ShiftRight<2>(luma), half)))}};
   }
 };
 
 constexpr size_t kStepPixels = kLanes<int16_t>;  // two vectors of sample pairs
 
-// Luma in the order of the pairs in `a` and `b`, block by block, and for every pixel the sum of its two chroma codes:
-// its own twice, or its own and the next pair's for an odd pixel.
+// Even lanes of a and b, or odd ones, block by block.
+template <int kOdd>
+HWY_INLINE I16 TakeLanes(U16 a, U16 b) {
+  const hn::ScalableTag<float> df;
+  constexpr int kOrder = kOdd ? 0xDD : 0x88;
+#if HWY_TARGET == HWY_AVX3
+  const F32 taken{_mm512_shuffle_ps(hn::BitCast(df, a).raw, hn::BitCast(df, b).raw, kOrder)};
+#elif HWY_TARGET == HWY_AVX2
+  const F32 taken{_mm256_shuffle_ps(hn::BitCast(df, a).raw, hn::BitCast(df, b).raw, kOrder)};
+#else
+  const F32 taken{_mm_shuffle_ps(hn::BitCast(df, a).raw, hn::BitCast(df, b).raw, kOrder)};
+#endif
+  return hn::BitCast(hn::ScalableTag<int16_t>(), taken);
+}
+
+// [U, mean of U and the next U, V, mean of V and the next V] of each pair. Samples times 64 have an exact mean.
+HWY_INLINE U16 PixelChroma(U16 own, U16 next) {
+  const hn::ScalableTag<uint16_t> d16;
+  const hn::ScalableTag<uint32_t> d32;
+  return hn::OddEven(hn::BitCast(d16, hn::ShiftLeft<16>(hn::BitCast(d32, hn::AverageRound(own, next)))), own);
+}
+
+// The pixels of two vectors of pairs: in each block those of its block of the first, then of the second.
 template <class Step>
 HWY_INLINE Channels16 StepPixels(const uint8_t* HWY_RESTRICT pairs) {
   const hn::ScalableTag<int16_t> d16;
   const hn::ScalableTag<int32_t> d32;
-  const hn::ScalableTag<float> df;
-  const auto a = LoadVector<int32_t>(pairs, 0), b = LoadVector<int32_t>(pairs, 1);
-  const auto luma = hn::ReorderDemote2To(d16, hn::ShiftRight<16>(a), hn::ShiftRight<16>(b));
-  // [2U, U + next U, 2V, V + next V] per pair.
-  const auto sums = [=](I32 own, I32 next) HWY_ATTR {
-    const auto even = hn::And(hn::Add(own, own), hn::Set(d32, 0xFFFF));
-    return hn::BitCast(df, hn::Or(even, hn::ShiftLeft<16>(hn::Add(own, next))));
-  };
-  const auto sumsA = sums(a, LoadVector<int32_t>(pairs + 8, 0)), sumsB = sums(b, LoadVector<int32_t>(pairs + 8, 1));
-#if HWY_TARGET == HWY_AVX3
-  const F32 u{_mm512_shuffle_ps(sumsA.raw, sumsB.raw, 0x88)}, v{_mm512_shuffle_ps(sumsA.raw, sumsB.raw, 0xDD)};
-#elif HWY_TARGET == HWY_AVX2
-  const F32 u{_mm256_shuffle_ps(sumsA.raw, sumsB.raw, 0x88)}, v{_mm256_shuffle_ps(sumsA.raw, sumsB.raw, 0xDD)};
-#else
-  const F32 u{_mm_shuffle_ps(sumsA.raw, sumsB.raw, 0x88)}, v{_mm_shuffle_ps(sumsA.raw, sumsB.raw, 0xDD)};
-#endif
-  return Step::Apply(luma, hn::BitCast(d16, u), hn::BitCast(d16, v));
+  const auto a = LoadVector<uint16_t>(pairs, 0), b = LoadVector<uint16_t>(pairs, 1);
+  const auto luma =
+      hn::ReorderDemote2To(d16, hn::ShiftRight<16>(hn::BitCast(d32, a)), hn::ShiftRight<16>(hn::BitCast(d32, b)));
+  const auto chromaA = PixelChroma(a, LoadVector<uint16_t>(pairs + 8, 0));
+  const auto chromaB = PixelChroma(b, LoadVector<uint16_t>(pairs + 8, 1));
+  const auto top = Set16(-32768);
+  return Step::Apply(hn::Xor(luma, top), hn::Xor(TakeLanes<0>(chromaA, chromaB), top),
+                     hn::Xor(TakeLanes<1>(chromaA, chromaB), top));
+}
+
+// The low bytes of two channels side by side.
+HWY_INLINE U16 ZipBytes(I16 a, I16 b) {
+  alignas(16) static constexpr uint8_t kZip[16] = {0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15};
+  return hn::BitCast(hn::ScalableTag<uint16_t>(), hn::TableLookupBytes(PackBlocks(a, b), Repeat(kZip)));
 }
 
 // Bytes of four channels, the fourth opaque: the first half of each block, then the second.
 HWY_INLINE void StorePixels(const Channels16& pixels, uint8_t* HWY_RESTRICT dst) {
-  alignas(16) static constexpr uint8_t kZip[16] = {0, 8, 1, 9, 2, 10, 3, 11, 4, 12, 5, 13, 6, 14, 7, 15};
-  const hn::ScalableTag<int16_t> d16;
-  const auto zip = [](I16 a, I16 b) HWY_ATTR {
-    return hn::BitCast(hn::ScalableTag<uint16_t>(), hn::TableLookupBytes(PackBlocks(a, b), Repeat(kZip)));
-  };
-  const auto lower = zip(pixels.c[0], pixels.c[1]), upper = zip(pixels.c[2], hn::Set(d16, 255));
-  const hn::ScalableTag<uint16_t> du;
-  StoreVector(hn::InterleaveLower(du, lower, upper), dst, 0);
-  StoreVector(hn::InterleaveUpper(du, lower, upper), dst, 1);
+  const hn::ScalableTag<uint16_t> d16;
+  const auto lower = ZipBytes(pixels.c[0], pixels.c[1]), upper = ZipBytes(pixels.c[2], Set16(255));
+  StoreVector(hn::InterleaveLower(d16, lower, upper), dst, 0);
+  StoreVector(hn::InterleaveUpper(d16, lower, upper), dst, 1);
 }
 
 constexpr size_t kChunkGroups = 32, kChunkPixels = 6 * kChunkGroups;
@@ -404,45 +481,49 @@ void V210ToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) {
 
 // The product with a coefficient in units of 2^-15, rounded.
 int Times(int v, int16_t coefficient) { return (v * coefficient + 0x4000) >> 15; }
-uint8_t RoundCode(int v) { return static_cast<uint8_t>(Clamp((v + 32) >> 6, 0, 255)); }
 
-// Calls pixel(luma, u2, v2, out) for each pixel of a row; u2 and v2 are sums of two codes.
+// Divides by a power of two, rounds to nearest and saturates to a byte.
+uint8_t RoundCode(int v, int shift) { return static_cast<uint8_t>(Clamp((v + (1 << (shift - 1))) >> shift, 0, 255)); }
+
+// Calls pixel(luma, u, v, out) for each pixel of a row. All are 10-bit codes times 64: the mean chroma of an odd pixel
+// is exact.
 template <class Pixel>
 void UpsampleRow(const uint8_t* src, uint8_t* dst, size_t count, const Pixel& pixel) {
   for (size_t x = 0; x < count; ++x, dst += 4) {
     const size_t pair = x / 2, next = x % 2 != 0 && pair + 1 < PairsOf(count) ? pair + 1 : pair;
-    pixel(LoadSample(src, 4 * pair + 1 + 2 * (x % 2)), LoadSample(src, 4 * pair) + LoadSample(src, 4 * next),
-          LoadSample(src, 4 * pair + 2) + LoadSample(src, 4 * next + 2), dst);
+    const auto mean = [&](size_t c) { return (LoadSample(src, 4 * pair + c) + LoadSample(src, 4 * next + c)) * 32; };
+    pixel(LoadSample(src, 4 * pair + 1 + 2 * (x % 2)) * 64, mean(0), mean(2), dst);
     dst[3] = 255;
   }
 }
 
 void ToBgrx8(const BgrFixed& m, const uint8_t* src, uint8_t* dst, size_t count) {
-  UpsampleRow(src, dst, count, [&m](int luma, int u2, int v2, uint8_t* out) {
-    const int y = Times((luma - 64) * 32, m.y), u = (u2 - 1024) * 32, v = (v2 - 1024) * 32;
-    out[0] = RoundCode(y + Times(u, m.bU));
-    out[1] = RoundCode(y + Times(u, m.gU) + Times(v, m.gV));
-    out[2] = RoundCode(y + Times(v, m.rV));
+  UpsampleRow(src, dst, count, [&m](int luma, int u, int v, uint8_t* out) {
+    const int y = Times(luma - 512 * 64, m.y) + m.offset;
+    u -= 512 * 64, v -= 512 * 64;
+    out[0] = RoundCode(y + Times(u, m.bU), 6);
+    out[1] = RoundCode(y + Times(u, m.gU) + Times(v, m.gV), 6);
+    out[2] = RoundCode(y + Times(v, m.rV), 6);
   });
 }
 void V210ToBgrx8_601(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8(kBgrFixed601, src, dst, count); }
 void V210ToBgrx8_709(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8(kBgrFixed709, src, dst, count); }
 
 void V210ToVuyx8(const uint8_t* src, uint8_t* dst, size_t count) {
-  UpsampleRow(src, dst, count, [](int luma, int u2, int v2, uint8_t* out) {
-    out[0] = static_cast<uint8_t>(Clamp((v2 + 4) >> 3, 0, 255));
-    out[1] = static_cast<uint8_t>(Clamp((u2 + 4) >> 3, 0, 255));
-    out[2] = static_cast<uint8_t>(Clamp((luma + 2) >> 2, 0, 255));
+  UpsampleRow(src, dst, count, [](int luma, int u, int v, uint8_t* out) {
+    out[0] = RoundCode(v, 8);
+    out[1] = RoundCode(u, 8);
+    out[2] = RoundCode(luma, 8);
   });
 }
 
 void V210_709ToVuyx8_601(const uint8_t* src, uint8_t* dst, size_t count) {
   constexpr RecodingFixed r = kRecodingFixed709To601;
-  UpsampleRow(src, dst, count, [r](int luma, int u2, int v2, uint8_t* out) {
-    const int u = (u2 - 1024) * 32, v = (v2 - 1024) * 32;
-    out[0] = RoundCode(Times(u, r.vU) + Times(v, r.vV) + 128 * 64);
-    out[1] = RoundCode(Times(u, r.uU) + Times(v, r.uV) + 128 * 64);
-    out[2] = RoundCode(Times(u, r.yU) + Times(v, r.yV) + luma * 16);
+  UpsampleRow(src, dst, count, [r](int luma, int u, int v, uint8_t* out) {
+    u -= 512 * 64, v -= 512 * 64;
+    out[0] = RoundCode(Times(u, r.vU) + Times(v, r.vV) + 128 * 64, 6);
+    out[1] = RoundCode(Times(u, r.uU) + Times(v, r.uV) + 128 * 64, 6);
+    out[2] = RoundCode(Times(u, r.yU) + Times(v, r.yV) + luma / 4, 6);
   });
 }
 

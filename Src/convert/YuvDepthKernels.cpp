@@ -30,31 +30,41 @@ struct Premultiplied {
   static HWY_INLINE F32 Apply(F32 v) { return FinishAlpha<false>(hn::Mul(v, hn::Broadcast<3>(v)), v); }
 };
 
-template <class Alpha>
-HWY_INLINE void WidenRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  RowLoop<4 * kVectorPixels, 4, 16>(
-      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        for (size_t i = 0; i < 4; ++i)
-          StoreVector(Alpha::Apply(WidenCodes<kVuya8Scale>(in + i * kLanes<float>)), out, i);
-      });
-}
-
-void Vuya8To32f(const uint8_t* src, uint8_t* dst, size_t count) { WidenRow<Kept>(src, dst, count); }
-void Vuyx8To32f(const uint8_t* src, uint8_t* dst, size_t count) { WidenRow<Opaque>(src, dst, count); }
-void Vuya8ToVuyp32f(const uint8_t* src, uint8_t* dst, size_t count) { WidenRow<Premultiplied>(src, dst, count); }
+constexpr size_t kBlockPixels = 4 * kVectorPixels;
 
 template <class Alpha>
-HWY_INLINE void NarrowRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  RowLoop<4 * kVectorPixels, 16, 4>(
-      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto codes = [in](size_t i)
-                               HWY_ATTR { return ScaleToCodes<kVuya8Scale>(Alpha::Apply(LoadVector<float>(in, i))); };
-        StoreVector(PackTo8(codes(0), codes(1), codes(2), codes(3)), out);
-      });
+struct WidenBlock {
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    for (size_t i = 0; i < 4; ++i) StoreVector(Alpha::Apply(WidenCodes<kVuya8Scale>(in + i * kLanes<float>)), out, i);
+  }
+};
+
+void Vuya8To32f(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPixels, 4, 16>(src, dst, count, WidenBlock<Kept>());
+}
+void Vuyx8To32f(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPixels, 4, 16>(src, dst, count, WidenBlock<Opaque>());
+}
+void Vuya8ToVuyp32f(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPixels, 4, 16>(src, dst, count, WidenBlock<Premultiplied>());
 }
 
-void Vuya32fTo8(const uint8_t* src, uint8_t* dst, size_t count) { NarrowRow<Kept>(src, dst, count); }
-void Vuyx32fTo8(const uint8_t* src, uint8_t* dst, size_t count) { NarrowRow<Opaque>(src, dst, count); }
+template <class Alpha>
+struct NarrowBlock {
+  static HWY_INLINE I32 Codes(const uint8_t* HWY_RESTRICT in, size_t index) {
+    return ScaleToCodes<kVuya8Scale>(Alpha::Apply(LoadVector<float>(in, index)));
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    StoreVector(PackTo8(Codes(in, 0), Codes(in, 1), Codes(in, 2), Codes(in, 3)), out);
+  }
+};
+
+void Vuya32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPixels, 16, 4>(src, dst, count, NarrowBlock<Kept>());
+}
+void Vuyx32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kBlockPixels, 16, 4>(src, dst, count, NarrowBlock<Opaque>());
+}
 
 }  // namespace
 }  // namespace HWY_NAMESPACE

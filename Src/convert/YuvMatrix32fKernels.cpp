@@ -94,10 +94,9 @@ struct ToBgr {
   static HWY_INLINE F32 Apply(F32 vuya) {
     static constexpr Channels kFirst = MakeChannels(kM.bU, kM.gU, kM.rV);
     static constexpr Channels kSecond = MakeChannels(0, kM.gV, 0);
-    const auto v = hn::Broadcast<0>(vuya);
-    const auto uuv = TakeChannels<4>(hn::Broadcast<1>(vuya), v);
+    const auto uuv = PermuteChannels<1, 1, 0, 3>(vuya);
     const auto oneTerm = hn::Add(hn::Broadcast<2>(vuya), hn::Mul(uuv, kFirst.Vector()));
-    const auto twoTerms = hn::Add(oneTerm, hn::Mul(v, kSecond.Vector()));
+    const auto twoTerms = hn::Add(oneTerm, hn::Mul(hn::Broadcast<0>(vuya), kSecond.Vector()));
     return TakeChannels<2>(oneTerm, twoTerms);
   }
 };
@@ -114,22 +113,19 @@ struct RecodeYuv {
 };
 
 template <class Source, class Step, class Destination, bool kOpaque>
-HWY_INLINE void MatrixRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  RowLoop<4 * kVectorPixels, Source::kBytes, Destination::kBytes>(
-      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        F32 a = Source::Load(in, 0), b = Source::Load(in, 1);
-        F32 c = Source::Load(in, 2), d = Source::Load(in, 3);
-        a = FinishAlpha<kOpaque>(Step::Apply(a), a);
-        b = FinishAlpha<kOpaque>(Step::Apply(b), b);
-        c = FinishAlpha<kOpaque>(Step::Apply(c), c);
-        d = FinishAlpha<kOpaque>(Step::Apply(d), d);
-        Destination::Store(a, b, c, d, out);
-      });
-}
+struct MatrixBlock {
+  static constexpr size_t kPixels = 4 * kVectorPixels;
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    const F32 a = Source::Load(in, 0), b = Source::Load(in, 1), c = Source::Load(in, 2), d = Source::Load(in, 3);
+    Destination::Store(FinishAlpha<kOpaque>(Step::Apply(a), a), FinishAlpha<kOpaque>(Step::Apply(b), b),
+                       FinishAlpha<kOpaque>(Step::Apply(c), c), FinishAlpha<kOpaque>(Step::Apply(d), d), out);
+  }
+};
 
-#define VX_VECTOR_KERNEL(name, Source, Step, Destination, opaque)  \
-  void name(const uint8_t* src, uint8_t* dst, size_t count) {      \
-    MatrixRow<Source, Step, Destination, opaque>(src, dst, count); \
+#define VX_VECTOR_KERNEL(name, Source, Step, Destination, opaque)                           \
+  void name(const uint8_t* src, uint8_t* dst, size_t count) {                               \
+    using Block = MatrixBlock<Source, Step, Destination, opaque>;                           \
+    RowLoop<Block::kPixels, Source::kBytes, Destination::kBytes>(src, dst, count, Block()); \
   }
 VX_YUV_MATRIX_KERNELS(VX_VECTOR_KERNEL)
 #undef VX_VECTOR_KERNEL
