@@ -51,6 +51,10 @@ const KernelCase kCases[] = {
     {"BGRX8 to RGB10", &kBgrx8ToRgb10, 4, 4},
     {"BGRX15 to RGB10", &kBgrx15ToRgb10, 8, 4},
     {"BGRX32f to RGB10", &kBgrx32fToRgb10, 16, 4},
+    {"BGRA32f to linear", &kBgra32fToLinear, 16, 16},
+    {"linear to BGRA32f", &kLinearToBgra32f, 16, 16},
+    {"BGRA8 to linear", &kBgra8ToLinear, 4, 16},
+    {"linear to BGRA8", &kLinearToBgra8, 16, 4},
 };
 
 // As long chains of rows are run: blocks of 384 pixels through the first-level cache, streamed to the frame.

@@ -13,20 +13,6 @@
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
 
-#ifndef VEXEL_CONVERT_DEPTHKERNELS_FACTORS
-#define VEXEL_CONVERT_DEPTHKERNELS_FACTORS
-namespace vexel {
-namespace {
-
-constexpr float k8uTo32f = 0.003921569f;  // float(1 / 255.)
-constexpr float k15uTo32f = 1.0f / 32768;
-constexpr float k32fTo8u = 255;
-constexpr float k32fTo15u = 32768;
-
-}  // namespace
-}  // namespace vexel
-#endif
-
 #if HWY_TARGET != HWY_BASELINE_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
@@ -76,8 +62,8 @@ struct Widen8uTo15uBody {
 template <AlphaWrite kAlpha>
 struct Narrow32fTo8uBody {
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
-    const auto v0 = LoadConverted(in, 0, k32fTo8u), v1 = LoadConverted(in, 1, k32fTo8u);
-    const auto v2 = LoadConverted(in, 2, k32fTo8u), v3 = LoadConverted(in, 3, k32fTo8u);
+    const auto v0 = LoadConverted(in, 0, 255.0f), v1 = LoadConverted(in, 1, 255.0f);
+    const auto v2 = LoadConverted(in, 2, 255.0f), v3 = LoadConverted(in, 3, 255.0f);
     StoreVector(WriteAlpha<kAlpha, uint8_t>(PackTo8(v0, v1, v2, v3)), out);
   }
 };
@@ -85,7 +71,7 @@ struct Narrow32fTo8uBody {
 template <AlphaWrite kAlpha>
 struct Narrow32fTo15uBody {
   HWY_INLINE U16 Narrow(const uint8_t* in, size_t index) const {
-    const auto v = PackToU16(LoadConverted(in, index, k32fTo15u), LoadConverted(in, index + 1, k32fTo15u));
+    const auto v = PackToU16(LoadConverted(in, index, 32768.0f), LoadConverted(in, index + 1, 32768.0f));
     return WriteAlpha<kAlpha, uint16_t>(hn::Min(v, hn::Set(hn::ScalableTag<uint16_t>(), 32768)));
   }
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
@@ -184,13 +170,13 @@ void Widen8uTo15u(const uint8_t* src, uint8_t* dst, size_t count) {
 template <AlphaWrite kAlpha>
 void Narrow32fTo8u(const uint8_t* src, uint8_t* dst, size_t count) {
   MapChannels<float, uint8_t, kAlpha>(
-      src, dst, count, [](float c) { return static_cast<uint8_t>(Clamp(ConvertNearest(c * k32fTo8u), 0, 255)); });
+      src, dst, count, [](float c) { return static_cast<uint8_t>(Clamp(ConvertNearest(c * 255.0f), 0, 255)); });
 }
 
 template <AlphaWrite kAlpha>
 void Narrow32fTo15u(const uint8_t* src, uint8_t* dst, size_t count) {
   MapChannels<float, uint16_t, kAlpha>(
-      src, dst, count, [](float c) { return static_cast<uint16_t>(Clamp(ConvertNearest(c * k32fTo15u), 0, 32768)); });
+      src, dst, count, [](float c) { return static_cast<uint16_t>(Clamp(ConvertNearest(c * 32768.0f), 0, 32768)); });
 }
 
 template <AlphaWrite kAlpha>

@@ -21,6 +21,9 @@ inline constexpr uint8_t kFullScale<uint8_t> = 255;
 template <>
 inline constexpr uint16_t kFullScale<uint16_t> = 32768;
 
+inline constexpr float k8uTo32f = 0.003921569f;  // float(1 / 255.)
+inline constexpr float k15uTo32f = 1.0f / 32768;
+
 // Index of the channel that holds alpha.
 inline constexpr size_t AlphaIndex(AlphaWrite alpha) { return alpha == AlphaWrite::OpaqueFirst ? 0 : 3; }
 

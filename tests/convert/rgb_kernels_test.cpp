@@ -66,6 +66,12 @@ const RowCase kCases[] = {
     VX_CASE(Bgrx8ToRgb10, BGRX_4444_8u, kRgb10Format),
     VX_CASE(Bgrx15ToRgb10, BGRX_4444_15u, kRgb10Format),
     VX_CASE(Bgrx32fToRgb10, BGRX_4444_32f, kRgb10Format),
+    VX_CASE(Bgra32fToLinear, BGRA_4444_32f, BGRA_4444_32f_Linear),
+    VX_CASE(LinearToBgra32f, BGRA_4444_32f_Linear, BGRA_4444_32f),
+    VX_CASE(Bgrx32fToLinear, BGRX_4444_32f, BGRX_4444_32f_Linear),
+    VX_CASE(LinearToBgrx32f, BGRX_4444_32f_Linear, BGRX_4444_32f),
+    VX_CASE(Bgra8ToLinear, BGRA_4444_8u, BGRA_4444_32f_Linear),
+    VX_CASE(LinearToBgra8, BGRA_4444_32f_Linear, BGRA_4444_8u),
 };
 
 TEST(RgbKernels, Arena) {

@@ -1,0 +1,101 @@
+// The working curve of linear light, and its way back to 8u codes as a table.
+#pragma once
+
+#include <bit>
+#include <cstdint>
+#include <xmmintrin.h>
+
+#include "convert/PlainPixels.h"
+#include "frame/Power.h"
+
+namespace vexel {
+
+// The working curve: linear = sign(c) |c|^2.4.
+inline constexpr PowerExponent kToLinear(2.4f), kFromLinear(1 / 2.4f);
+
+// 32f to an 8u code; of light that means the definition of LinearToBgra8.
+inline int32_t NarrowTo8(float c) { return plain::Clamp(plain::ConvertNearest(c * 255.0f), 0, 255); }
+inline int32_t NarrowLightTo8(float c) { return NarrowTo8(SignedPower(c, kFromLinear)); }
+
+// Tables must not depend on the rounding mode of whoever comes first.
+class DefaultFpMode {
+ public:
+  DefaultFpMode() noexcept : mSaved(_mm_getcsr()) { _mm_setcsr(0x1F80); }
+  ~DefaultFpMode() { _mm_setcsr(mSaved); }
+  DefaultFpMode(const DefaultFpMode&) = delete;
+  DefaultFpMode& operator=(const DefaultFpMode&) = delete;
+
+ private:
+  uint32_t mSaved;
+};
+
+// NarrowLightTo8 as a look-up that gives exactly its results. The function rises from 0 to 255 between 2^-23 and 1,
+// at 255 thresholds, and falls back to 0 where its argument leaves the range of int32. A bucket is 1/128 of an octave
+// and holds one threshold at most, so with x the low bits of a float, the code is (entry + x) >> kLowBits for entry =
+// (code at the start << kLowBits) + (distance from the threshold to the end, or 0 without one).
+class LightCodes {
+ public:
+  static constexpr int kLowBits = 16;
+  static constexpr int32_t kFirst = 0x34000000, kLast = 0x3F800000;  // 2^-23 and 1 as bits
+
+  // Made by the first caller; others wait for it.
+  static const LightCodes& Get() noexcept {
+    static const LightCodes table;
+    return table;
+  }
+  const int32_t* Entries() const { return mEntries; }
+  // From these bits on (NaN included) the code is 0.
+  int32_t OverflowBits() const { return mOverflow; }
+
+  // The same function, unrounded and off by less than kMostError, between kFirst and kLast, in two factors: kScales by
+  // the low bits of the exponent, and a parabola of the rest of the mantissa (as 1 to 17/16) by its four high bits.
+  static constexpr float kMostError = 1.0f / 2048;
+  const float* Scales() const { return mScales; }
+  const float* Coefficients(int power) const { return mCoefficients[power]; }
+
+ private:
+  LightCodes() noexcept {
+    const DefaultFpMode mode;
+    for (int32_t i = 0; i < kBuckets; ++i) {
+      const int32_t start = kFirst + (i << kLowBits), code = CodeOfBits(start);
+      mEntries[i] = code << kLowBits;
+      if (CodeOfBits(start + kLowMask) == code) continue;
+      const int32_t threshold = Bisect(start, start + kLowMask, [&](int32_t bits) { return CodeOfBits(bits) > code; });
+      mEntries[i] += start + kLowMask + 1 - threshold;
+    }
+    for (int exponent = kFirst >> 23; exponent <= kLast >> 23; ++exponent)
+      mScales[exponent & 31] = 255.0f * SignedPower(std::bit_cast<float>(exponent << 23), kFromLinear);
+    for (int i = 0; i < 16; ++i) FitParabola(i);
+    mOverflow = Bisect(kLast, 0x7F800000, [](int32_t bits) { return CodeOfBits(bits) == 0; });
+  }
+  static constexpr int32_t kLowMask = (1 << kLowBits) - 1;
+  static constexpr int32_t kBuckets = ((kLast - kFirst) >> kLowBits) + 1;
+  static int32_t CodeOfBits(int32_t bits) { return NarrowLightTo8(std::bit_cast<float>(bits)); }
+  // Through the three Chebyshev nodes of a sixteenth of an octave.
+  void FitParabola(int i) noexcept {
+    constexpr double kMiddle = 1 + 1 / 32.0, kStep = 0.86602540378443865 / 32;
+    const auto at = [&](double x) { return double{SignedPower(static_cast<float>(x + i / 16.0), kFromLinear)}; };
+    const double before = at(kMiddle - kStep), middle = at(kMiddle), after = at(kMiddle + kStep);
+    const double curvature = (before - 2 * middle + after) / (2 * kStep * kStep),
+                 slope = (after - before) / (2 * kStep);
+    mCoefficients[2][i] = static_cast<float>(curvature);
+    mCoefficients[1][i] = static_cast<float>(slope - 2 * curvature * kMiddle);
+    mCoefficients[0][i] = static_cast<float>(middle - slope * kMiddle + curvature * kMiddle * kMiddle);
+  }
+  // The first value for which `isPast` holds; it does for `past` and not for `before`.
+  template <class IsPast>
+  static int32_t Bisect(int32_t before, int32_t past, const IsPast& isPast) {
+    while (past - before > 1) {
+      const int32_t middle = before + (past - before) / 2;
+      (isPast(middle) ? past : before) = middle;
+    }
+    return past;
+  }
+
+  alignas(64) float mScales[32] = {};
+  alignas(64) float mCoefficients[3][16];
+  int32_t mEntries[kBuckets];
+  int32_t mOverflow;
+};
+
+}  // namespace vexel

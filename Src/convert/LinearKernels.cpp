@@ -1,0 +1,194 @@
+// The working curve of linear light: linear = sign(c) |c|^2.4 and back, channel by channel; alpha stays what it is.
+//
+// Negative and over-range values keep their sign and size, NaN stays NaN (one, the quiet one of the channel's sign).
+// The 8u kernels equal the walk through 32f: 8u is scaled by 1/255 before the curve, and after the curve 32f narrows as
+// always (round to nearest, saturate; NaN and what int32 cannot hold give 0).
+#include <cstddef>
+#include <cstdint>
+
+#include "convert/LightCodes.h"
+#include "convert/PlainPixels.h"
+#include "convert/RgbKernels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "convert/LinearKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "convert/PixelVectors-inl.h"
+#include "frame/KernelTable.h"
+#include "frame/Power-inl.h"
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace {
+
+template <const PowerExponent& kExponent, AlphaWrite kAlpha>
+struct CurveBody {
+  HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
+    const hn::ScalableTag<float> d;
+    F32 blue, green, red, alpha;
+    hn::LoadInterleaved4(d, reinterpret_cast<const float*>(in), blue, green, red, alpha);
+    SignedPower3<PowerCore::Float>(blue, green, red, kExponent);
+    if constexpr (kAlpha != AlphaWrite::Keep) alpha = hn::Set(d, 1.0f);
+    hn::StoreInterleaved4(blue, green, red, alpha, d, reinterpret_cast<float*>(out));
+  }
+};
+
+class LinearToBgra8Body {
+ public:
+  explicit HWY_INLINE LinearToBgra8Body(const LightCodes& codes) : mCodes(codes), mOverflow(codes.OverflowBits()) {}
+
+  HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
+    const hn::ScalableTag<float> d;
+    F32 blue, green, red, alpha;
+    hn::LoadInterleaved4(d, reinterpret_cast<const float*>(in), blue, green, red, alpha);
+    const Codes codes = LightToCodes(blue, green, red);
+    const auto low = hn::Or(codes.blue, hn::ShiftLeft<8>(codes.green));
+    const auto high = hn::Or(hn::ShiftLeft<16>(codes.red), hn::ShiftLeft<24>(AlphaCode(alpha)));
+    StoreVector(hn::Or(low, high), out);
+  }
+
+ private:
+  using DI = hn::ScalableTag<int32_t>;
+  struct Codes {
+    I32 blue, green, red;
+  };
+
+  static HWY_INLINE I32 AlphaCode(F32 v) {
+    const auto code = ConvertNearest(hn::Mul(v, hn::Set(hn::ScalableTag<float>(), 255.0f)));
+    return hn::Min(hn::Max(code, hn::Zero(DI())), hn::Set(DI(), 255));
+  }
+  // The bits of floats limited to the range of the tables.
+  static HWY_INLINE I32 InRange(I32 bits) {
+    return hn::Min(hn::Max(bits, hn::Set(DI(), LightCodes::kFirst)), hn::Set(DI(), LightCodes::kLast));
+  }
+  HWY_INLINE I32 ZeroOverflow(I32 bits, I32 code) const {
+    return hn::IfThenElseZero(hn::Lt(bits, hn::Set(DI(), mOverflow)), code);
+  }
+  HWY_INLINE I32 LookUp(F32 v) const {
+    const DI d;
+    const auto bits = hn::BitCast(d, v), inRange = InRange(bits);
+    const auto bucket = hn::ShiftRight<LightCodes::kLowBits>(hn::Sub(inRange, hn::Set(d, LightCodes::kFirst)));
+    const auto low = hn::And(inRange, hn::Set(d, (1 << LightCodes::kLowBits) - 1));
+    const auto entry = hn::GatherIndex(d, mCodes.Entries(), bucket);
+    return ZeroOverflow(bits, hn::ShiftRight<LightCodes::kLowBits>(hn::Add(entry, low)));
+  }
+  HWY_INLINE Codes LookUpAll(F32 blue, F32 green, F32 red) const { return {LookUp(blue), LookUp(green), LookUp(red)}; }
+
+#if HWY_TARGET == HWY_AVX3
+  // Tables of 16 and 32 floats are permutations here, which are faster than gathers. Only near a threshold does the
+  // result leave the code open.
+  HWY_INLINE I32 Estimate(F32 v, F32& farthest) const {
+    const hn::ScalableTag<float> df;
+    const auto bits = hn::BitCast(DI(), v), inRange = InRange(bits);
+    const auto segment = hn::ShiftRight<19>(inRange).raw;
+    const auto coefficient = [&](int power) HWY_ATTR {
+      return F32{_mm512_permutexvar_ps(segment, _mm512_load_ps(mCodes.Coefficients(power)))};
+    };
+    const auto rest = hn::Or(hn::And(inRange, hn::Set(DI(), 0x7FFFF)), hn::Set(DI(), 0x3F800000));
+    const auto x = hn::BitCast(df, rest);
+    const auto parabola = hn::Add(coefficient(0), hn::Mul(x, hn::Add(coefficient(1), hn::Mul(x, coefficient(2)))));
+    const auto scale = F32{_mm512_permutex2var_ps(_mm512_load_ps(mCodes.Scales()), hn::ShiftRight<23>(inRange).raw,
+                                                  _mm512_load_ps(mCodes.Scales() + 16))};
+    const auto unrounded = hn::Mul(parabola, scale);
+    const auto code = ConvertNearest(unrounded);
+    farthest = hn::Max(farthest, hn::Abs(hn::Sub(unrounded, hn::ConvertTo(df, code))));
+    return ZeroOverflow(bits, code);
+  }
+  HWY_INLINE Codes LightToCodes(F32 blue, F32 green, F32 red) const {
+    const hn::ScalableTag<float> df;
+    auto farthest = hn::Zero(df);
+    const Codes codes = {Estimate(blue, farthest), Estimate(green, farthest), Estimate(red, farthest)};
+    if (HWY_LIKELY(hn::AllTrue(df, hn::Lt(farthest, hn::Set(df, 0.5f - LightCodes::kMostError))))) return codes;
+    return LookUpAll(blue, green, red);
+  }
+#else
+  HWY_INLINE Codes LightToCodes(F32 blue, F32 green, F32 red) const { return LookUpAll(blue, green, red); }
+#endif
+
+  const LightCodes& mCodes;
+  const int32_t mOverflow;
+};
+
+template <const PowerExponent& kExponent, AlphaWrite kAlpha>
+HWY_ATTR void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kLanes<float>, 16, 16>(src, dst, count, CurveBody<kExponent, kAlpha>());
+}
+HWY_ATTR void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<kLanes<float>, 16, 4>(src, dst, count, LinearToBgra8Body(LightCodes::Get()));
+}
+template <AlphaWrite kAlpha>
+HWY_ATTR void Linearize(const uint8_t* src, uint8_t* dst, size_t count) {
+  Curve<kToLinear, kAlpha>(src, dst, count);
+}
+template <AlphaWrite kAlpha>
+HWY_ATTR void Delinearize(const uint8_t* src, uint8_t* dst, size_t count) {
+  Curve<kFromLinear, kAlpha>(src, dst, count);
+}
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#if HWY_ONCE
+namespace vexel {
+namespace plain {
+namespace {
+
+template <const PowerExponent& kExponent, AlphaWrite kAlpha>
+void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
+  MapPixels<float, float>(src, dst, count, [](const float* in, float* out) {
+    ForChannels<3>([&](size_t k) { out[k] = SignedPower(in[k], kExponent); });
+    out[3] = kAlpha == AlphaWrite::Keep ? in[3] : 1.0f;
+  });
+}
+template <AlphaWrite kAlpha>
+void Linearize(const uint8_t* src, uint8_t* dst, size_t count) {
+  Curve<kToLinear, kAlpha>(src, dst, count);
+}
+template <AlphaWrite kAlpha>
+void Delinearize(const uint8_t* src, uint8_t* dst, size_t count) {
+  Curve<kFromLinear, kAlpha>(src, dst, count);
+}
+
+// The curve of all 256 codes. Made by the first caller; others wait for it.
+struct LinearCodes {
+  LinearCodes() noexcept {
+    const DefaultFpMode mode;
+    for (int c = 0; c < 256; ++c) light[c] = SignedPower(c * k8uTo32f, kToLinear);
+  }
+  float light[256];
+};
+
+void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) {
+  static const LinearCodes codes;
+  MapPixels<uint8_t, float>(src, dst, count, [](const uint8_t* in, float* out) {
+    ForChannels<3>([&](size_t k) { out[k] = codes.light[in[k]]; });
+    out[3] = in[3] * k8uTo32f;
+  });
+}
+
+void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+  MapPixels<float, uint8_t>(src, dst, count, [](const float* in, uint8_t* out) {
+    ForChannels<3>([&](size_t k) { out[k] = static_cast<uint8_t>(NarrowLightTo8(in[k])); });
+    out[3] = static_cast<uint8_t>(NarrowTo8(in[3]));
+  });
+}
+
+}  // namespace
+}  // namespace plain
+
+const RowKernelSet kBgra32fToLinear = VX_KERNEL_VARIANTS(Linearize<AlphaWrite::Keep>);
+const RowKernelSet kBgrx32fToLinear = VX_KERNEL_VARIANTS(Linearize<AlphaWrite::OpaqueLast>);
+const RowKernelSet kLinearToBgra32f = VX_KERNEL_VARIANTS(Delinearize<AlphaWrite::Keep>);
+const RowKernelSet kLinearToBgrx32f = VX_KERNEL_VARIANTS(Delinearize<AlphaWrite::OpaqueLast>);
+const RowKernelSet kBgra8ToLinear = {&plain::Bgra8ToLinear, nullptr, nullptr, nullptr, nullptr};
+const RowKernelSet kLinearToBgra8 = VX_KERNEL_VARIANTS(LinearToBgra8);
+
+}  // namespace vexel
+#endif  // HWY_ONCE
