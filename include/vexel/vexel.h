@@ -153,7 +153,9 @@ VX_API VX_Result VX_ClipBufferToRect(void* base, int32_t rowBytes, VX_PixelForma
  *
  * 0 done, and for height < 1; -3 a special source without a decoder; -4 a special destination inside a chain; -13 a
  * special source that cannot be decoded to exactly width x height; -16 out of memory; -999 no chain of at most eight
- * steps; -1000 a special destination without an encoder. Nothing is written on failure. */
+ * steps; -1000 a special destination without an encoder. Ours, tested after the chain is found and for height >= 1: -17 a
+ * negative width or one whose row exceeds 2^31 - 1 bytes, -11 and -12 a null source or destination. Nothing is written
+ * on failure. Width 0 does nothing. */
 VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                             int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                             int32_t renderQuality) VX_NOEXCEPT;

@@ -1,0 +1,199 @@
+// VX_Convert: special sources and destinations by way of their planners, orientation, and the chain over all rows.
+#include <cstddef>
+
+#include "convert/Planar420.h"
+#include "convert/RowConverter.h"
+#include "formats/FormatBits.h"
+#include "frame/FpModeGuard.h"
+#include "frame/Scratch.h"
+#include "frame/StreamCopy.h"
+#include "vexel/vexel.h"
+
+namespace vexel {
+namespace {
+
+struct ConstBuffer {
+  const uint8_t* base;
+  ptrdiff_t rowBytes;
+  VX_PixelFormat format;
+};
+struct Buffer {
+  uint8_t* base;
+  ptrdiff_t rowBytes;
+  VX_PixelFormat format;
+};
+
+// A transient pixel buffer for the length of a scope.
+class Intermediate {
+ public:
+  Intermediate() = default;
+  ~Intermediate() { VX_FreeTransientPixelBuffer(mFormat, mRaw, mRawSize); }
+  Intermediate(const Intermediate&) = delete;
+  Intermediate& operator=(const Intermediate&) = delete;
+
+  VX_Result Allocate(VX_PixelFormat format, int32_t width, int32_t height) noexcept {
+    mFormat = format;
+    return VX_AllocateTransientPixelBuffer(format, width, height, &mRaw, &mPixels, &mRowBytes, &mRawSize);
+  }
+  void* pixels() const noexcept { return mPixels; }
+  int32_t rowBytes() const noexcept { return mRowBytes; }
+  VX_PixelFormat format() const noexcept { return mFormat; }
+
+ private:
+  VX_PixelFormat mFormat{};
+  void* mRaw = nullptr;
+  void* mPixels = nullptr;
+  size_t mRawSize = 0;
+  int32_t mRowBytes = 0;
+};
+
+// Bottom picture row first, walking up.
+template <class B>
+B BottomUp(B buffer, int32_t height) noexcept {
+  if (!VX_IsOriginTopLeft(buffer.format)) return buffer;
+  buffer.base += static_cast<ptrdiff_t>(height - 1) * buffer.rowBytes;
+  buffer.rowBytes = -buffer.rowBytes;
+  return buffer;
+}
+
+// A destination that would push everything else out of the cache.
+bool GoesPastCache(VX_PixelFormat format, int32_t width, int32_t height) noexcept {
+  const uint32_t cache = VX_GetCacheSize();
+  return cache != 0 && UnpaddedRowBytes(format, width) * height >= static_cast<int64_t>(cache / 2);
+}
+
+// Whether the row bytes of a buffer can express a row.
+bool RowFits(VX_PixelFormat format, int32_t width) noexcept {
+  return width >= 0 && UnpaddedRowBytes(format, width) <= INT32_MAX;
+}
+
+VX_Result RunChain(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
+                   int32_t renderQuality) noexcept {
+  RowConverter converter;
+  if (const VX_Result result = converter.Prepare(src.format, dst.format, renderQuality, width)) return result;
+  if (height < 1 || width == 0) return VX_Success;
+  if (!RowFits(src.format, width) || !RowFits(dst.format, width)) return VX_ErrArgumentOutOfRange;
+  if (!src.base) return VX_ErrNullSource;
+  if (!dst.base) return VX_ErrNullDestination;
+  const bool stream = GoesPastCache(dst.format, width, height);
+  if (stream) converter.StreamOutput();
+  VX_SCRATCH(scratch, converter.ScratchBytes());
+  if (!scratch && converter.ScratchBytes() != 0) return VX_ErrOutOfMemory;
+  converter.UseScratch(scratch.get());
+
+  const ConstBuffer from = BottomUp(src, height);
+  const Buffer to = BottomUp(dst, height);
+  for (int32_t row = 0; row < height; ++row)
+    converter.Convert(from.base + row * from.rowBytes, to.base + row * to.rowBytes);
+  if (stream) StreamFence();
+  return VX_Success;
+}
+
+// What a decoder would deliver for a DV source asked for width x height.
+struct DecodeTarget {
+  int32_t width, height;
+  bool known;
+};
+
+DecodeTarget PlanDvDecode(VX_PixelFormat src, int32_t width, int32_t height, int32_t renderQuality) noexcept {
+  struct NativeSize {
+    int32_t width, height;
+  };
+  static constexpr NativeSize kNative[] = {{0, 0},       {720, 480},   {720, 576}, {960, 720}, {960, 720},
+                                           {1280, 1080}, {1440, 1080}, {720, 480}, {720, 576}};
+  const uint32_t kind = FrameKind(src);
+  if (kind == 0 || kind >= sizeof kNative / sizeof kNative[0]) return {0, 0, false};
+  const NativeSize native = kNative[kind];
+  const bool reduced = (width <= native.width / 2 && height <= native.height) ||
+                       (renderQuality < 3 && width < native.width && height < native.height);
+  return reduced ? DecodeTarget{width, height, true} : DecodeTarget{native.width, native.height, true};
+}
+
+// The raster format that the encoder of a special destination takes; false if there is no encoder for it.
+bool PlanEncode(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) noexcept {
+  using F = VX_PixelFormat;
+  const uint32_t kind = FrameKind(dst);
+  if (kind == 1 || kind == 2) {
+    const bool hasAlphaKind = Layout(src) == kLayout4444 && AlphaKind(src) != kAlphaNone;
+    *input = !IsYuv(src)       ? F::BGRA_4444_8u
+             : hasAlphaKind    ? F::VUYA_4444_8u
+             : IsReversed(src) ? F::YUYV_422_8u
+                               : F::UYVY_422_8u;
+    return true;
+  }
+  if (kind == 7 || kind == 8) return *input = F::YUYV_422_8u, true;
+  if (kind >= 3 && kind <= 6) return *input = F::YUYV_422_8u_709, true;
+  if (kind < 9 || kind > 12) return false;
+  if (!IsVideoRange(dst)) return *input = F::BGRX_4444_8u, true;
+  if (Colorimetry(dst) != kColorimetry709 || IsSpecial(src)) return false;
+  return *input = src, true;
+}
+
+VX_Result EncodeSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height) noexcept {
+  if (!Is420(dst.format)) return VX_ErrFormatNotHandled;  // DV goes through an encoder module that is not there
+  return Encode420(src.base, static_cast<int32_t>(src.rowBytes), src.format, dst.base, dst.format, width, height);
+}
+
+VX_Result ConvertToSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
+                           int32_t renderQuality) noexcept {
+  VX_PixelFormat input;
+  if (!PlanEncode(src.format, dst.format, &input)) return VX_ErrFormatNotHandled;
+  if (input == src.format) return EncodeSpecial(src, dst, width, height);
+  if (!Is420(dst.format)) return VX_ErrFormatNotHandled;
+  Intermediate raster;
+  if (const VX_Result result = raster.Allocate(input, width, height)) return result;
+  if (const VX_Result result = VX_Convert(src.base, static_cast<int32_t>(src.rowBytes), src.format, raster.pixels(),
+                                          raster.rowBytes(), input, width, height, renderQuality))
+    return result;
+  return EncodeSpecial({static_cast<const uint8_t*>(raster.pixels()), raster.rowBytes(), input}, dst, width, height);
+}
+
+VX_Result ConvertRasters(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
+                         int32_t renderQuality) noexcept {
+  if (IsSpecial(dst.format)) return ConvertToSpecial(src, dst, width, height, renderQuality);
+  return RunChain(src, dst, width, height, renderQuality);
+}
+
+// From a 4:2:0 source by way of the planned intermediate.
+VX_Result ConvertFrom420(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
+                         int32_t renderQuality) noexcept {
+  const DecodePlan plan = PlanDecode420(src.format, width, height, dst.format, width, height, renderQuality);
+  if (plan.width != width || plan.height != height) return VX_ErrUnsupportedConversion;
+  if (plan.format == dst.format)
+    return Decode420(src.base, src.format, width, height, dst.base, static_cast<int32_t>(dst.rowBytes), dst.format,
+                     renderQuality);
+  Plan chain;  // refuses what cannot be reached before anything is decoded
+  if (!IsSpecial(dst.format))
+    if (const VX_Result result = MakePlan(plan.format, dst.format, renderQuality, &chain)) return result;
+  if (height < 1) return VX_Success;
+  Intermediate decoded;
+  if (const VX_Result result = decoded.Allocate(plan.format, width, height)) return result;
+  if (const VX_Result result = Decode420(src.base, src.format, width, height, decoded.pixels(), decoded.rowBytes(),
+                                         plan.format, renderQuality))
+    return result;
+  return ConvertRasters({static_cast<const uint8_t*>(decoded.pixels()), decoded.rowBytes(), plan.format}, dst, width,
+                        height, renderQuality);
+}
+
+VX_Result ConvertFromSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
+                             int32_t renderQuality) noexcept {
+  if (Is420(src.format)) return ConvertFrom420(src, dst, width, height, renderQuality);
+  const DecodeTarget target = PlanDvDecode(src.format, width, height, renderQuality);
+  if (!target.known) return VX_ErrUnsupportedFormat;
+  if (target.width != width || target.height != height) return VX_ErrUnsupportedConversion;
+  return VX_ErrUnsupportedFormat;  // no DV decoder is there
+}
+
+}  // namespace
+}  // namespace vexel
+
+using namespace vexel;
+
+VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
+                     VX_PixelFormat dstFormat, int32_t width, int32_t height, int32_t renderQuality) noexcept {
+  const FpModeGuard fpMode;
+  const ConstBuffer from{static_cast<const uint8_t*>(src), srcRowBytes, srcFormat};
+  const Buffer to{static_cast<uint8_t*>(dst), dstRowBytes, dstFormat};
+  if (srcFormat != dstFormat && IsSpecial(srcFormat)) return ConvertFromSpecial(from, to, width, height, renderQuality);
+  return ConvertRasters(from, to, width, height, renderQuality);
+}

@@ -1,0 +1,82 @@
+#include "convert/RowConverter.h"
+
+#include <algorithm>
+
+#include "formats/FormatBits.h"
+#include "frame/StreamCopy.h"
+
+namespace vexel {
+namespace {
+
+// Six pixels are a whole number of pairs and groups, so blocks of them have exact byte counts in every format.
+uint32_t BytesPerSixPixels(VX_PixelFormat format) {
+  return static_cast<uint32_t>(UnpaddedRowBytes(format, kBlockMultiple));
+}
+
+}  // namespace
+
+VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, int32_t width,
+                                KernelVariant variant) noexcept {
+  Plan plan;
+  if (const VX_Result result = MakePlan(src, dst, renderQuality, &plan)) return result;
+  mStepCount = plan.stepCount;
+  mWidth = static_cast<size_t>(std::max(width, 0));
+  mDstFormat = dst;
+  mSrcBytesPerSixPixels = BytesPerSixPixels(src);
+  mDstBytesPerSixPixels = BytesPerSixPixels(dst);
+  mVariant = variant;
+  mIsCopy = src == dst;
+  mStream = false;
+  mWholeRow = false;
+  for (int i = 0; i < mStepCount; ++i) {
+    mSteps[i] = (*plan.steps[i].kernel)[variant];
+    mWholeRow |= plan.steps[i].span == StepSpan::Row;
+  }
+  return VX_Success;
+}
+
+size_t RowConverter::ScratchRowBytes() const noexcept {
+  // One 4 x 32-bit float pixel per pixel; V210 groups and pairs of the last few pixels fit in the rounding.
+  return (UnitPixels() * 16 + 63) & ~size_t{63};
+}
+
+size_t RowConverter::ScratchBytes() const noexcept {
+  const size_t rows = mIsCopy ? 0 : static_cast<size_t>(std::min(mStepCount - 1, 2)) + (mStream ? 1 : 0);
+  return rows * ScratchRowBytes();
+}
+
+void RowConverter::RunSteps(const uint8_t* src, uint8_t* dst, size_t count) const noexcept {
+  uint8_t* const ping = mScratch;
+  uint8_t* const pong = mScratch + ScratchRowBytes();
+  const uint8_t* from = src;
+  for (int i = 0; i < mStepCount; ++i) {
+    uint8_t* const to = i == mStepCount - 1 ? dst : i % 2 == 0 ? ping : pong;
+    mSteps[i](from, to, count);
+    from = to;
+  }
+}
+
+void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
+  const uint8_t* src = static_cast<const uint8_t*>(srcRow);
+  uint8_t* dst = static_cast<uint8_t*>(dstRow);
+  if (mIsCopy && mStream) {
+    StreamCopy(dst, src, static_cast<size_t>(UnpaddedRowBytes(mDstFormat, static_cast<int64_t>(mWidth))), mVariant);
+    return;
+  }
+  if (mStepCount == 1 && !mStream) {
+    mSteps[0](src, dst, mWidth);
+    return;
+  }
+  const size_t unit = UnitPixels();
+  uint8_t* const staging = mScratch + static_cast<size_t>(std::min(mStepCount - 1, 2)) * ScratchRowBytes();
+  for (size_t done = 0; done < mWidth; done += unit) {
+    const size_t count = std::min(unit, mWidth - done);
+    const uint8_t* from = src + done / kBlockMultiple * mSrcBytesPerSixPixels;
+    uint8_t* to = dst + done / kBlockMultiple * mDstBytesPerSixPixels;
+    RunSteps(from, mStream ? staging : to, count);
+    if (mStream)
+      StreamCopy(to, staging, static_cast<size_t>(UnpaddedRowBytes(mDstFormat, static_cast<int64_t>(count))), mVariant);
+  }
+}
+
+}  // namespace vexel

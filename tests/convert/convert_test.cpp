@@ -1,0 +1,132 @@
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <cstring>
+#include <vector>
+
+#include "support/Formats.h"
+#include "support/Random.h"
+
+namespace vexel {
+namespace {
+
+using F = VX_PixelFormat;
+using testing::FormatName;
+using testing::RasterFormats;
+
+std::vector<uint8_t> RandomBytes(size_t bytes, uint64_t seed) {
+  std::vector<uint8_t> memory(bytes);
+  testing::Random(seed).Fill(memory.data(), bytes);
+  return memory;
+}
+
+TEST(Convert, SameFormatCopiesEveryByteAndKeepsRowOrder) {
+  for (F format : RasterFormats())
+    for (int width : {1, 2, 5, 6, 7, 400}) {
+      const auto rowBytes = static_cast<int32_t>(UnpaddedRowBytes(format, width));
+      const auto src = RandomBytes(static_cast<size_t>(rowBytes) * 3, Bits(format));
+      std::vector<uint8_t> dst(src.size());
+      ASSERT_EQ(VX_Convert(src.data(), rowBytes, format, dst.data(), rowBytes, format, width, 3, 2), VX_Success);
+      EXPECT_EQ(src, dst) << FormatName(format) << " width " << width;
+    }
+}
+
+// A bottom-up format and a top-down one store rows in opposite orders; negative row bytes turn a buffer around.
+TEST(Convert, OrientationFollowsTheFormats) {
+  constexpr int kWidth = 4, kHeight = 3;
+  uint8_t bgra[kHeight][kWidth * 4], uyvy[kHeight][kWidth * 2];
+  for (int y = 0; y < kHeight; ++y) std::memset(bgra[y], 60 * y + 30, sizeof bgra[y]);
+  for (auto& row : bgra)
+    for (int x = 0; x < kWidth; ++x) row[4 * x + 3] = 255;
+  const auto lumaOfRow = [&](int y) { return uyvy[y][1]; };
+
+  ASSERT_EQ(VX_Convert(bgra, sizeof bgra[0], F::BGRA_4444_8u, uyvy, sizeof uyvy[0], F::UYVY_422_8u, kWidth, kHeight, 2),
+            VX_Success);
+  EXPECT_GT(lumaOfRow(0), lumaOfRow(1));
+  EXPECT_GT(lumaOfRow(1), lumaOfRow(2));
+
+  ASSERT_EQ(VX_Convert(bgra[kHeight - 1], -static_cast<int32_t>(sizeof bgra[0]), F::BGRA_4444_8u, uyvy, sizeof uyvy[0],
+                       F::UYVY_422_8u, kWidth, kHeight, 2),
+            VX_Success);
+  EXPECT_LT(lumaOfRow(0), lumaOfRow(1));
+  EXPECT_LT(lumaOfRow(1), lumaOfRow(2));
+
+  VX_SetDebugFlag(10, 1);
+  const VX_Result result =
+      VX_Convert(bgra, sizeof bgra[0], F::BGRA_4444_8u, uyvy, sizeof uyvy[0], F::UYVY_422_8u, kWidth, kHeight, 2);
+  VX_SetDebugFlag(10, 0);
+  ASSERT_EQ(result, VX_Success);
+  EXPECT_LT(lumaOfRow(0), lumaOfRow(1));
+}
+
+TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
+  // Addresses that may not be touched.
+  void* const nowhere = reinterpret_cast<void*>(16);
+  struct Case {
+    F src, dst;
+    int32_t width, height;
+    VX_Result expected;
+  };
+  const Case cases[] = {
+      {F::Invalid, F::Invalid, 4, 4, VX_ErrFailed},
+      {F::Invalid, F::Invalid, 4, 0, VX_ErrFailed},
+      {F::Invalid, F::ARGB_4444_8u, 4, 4, VX_ErrFailed},
+      {FromBits(0x105), F::BGRA_4444_8u, 4, 4, VX_ErrFailed},
+      {F::BGRA_4444_8u, FromBits(0x1FFF), 4, 4, VX_ErrFailed},
+      {F::BGRA_4444_8u, F::UYVY_422_8u, 4, 0, VX_Success},
+      {F::BGRA_4444_8u, F::UYVY_422_8u, 4, INT_MIN, VX_Success},
+      {F::BGRA_4444_8u, F::UYVY_422_8u, 0, 4, VX_Success},
+      {F::BGRA_4444_8u, F::UYVY_422_8u, -1, 4, VX_ErrArgumentOutOfRange},
+      {F::BGRA_4444_8u, F::BGRA_4444_8u, INT_MIN, 4, VX_ErrArgumentOutOfRange},
+      {F::BGRA_4444_8u, F::BGRA_4444_8u, INT_MAX, 1, VX_ErrArgumentOutOfRange},
+      {F::UYVY_422_8u, F::BGRA_4444_32f, INT_MAX / 8, INT_MAX, VX_ErrArgumentOutOfRange},
+      // DV: a larger request than the native size cannot be decoded; otherwise there is no decoder.
+      {F::PAL_DV100_1080i, F::BGRA_4444_8u, 1920, 1080, VX_ErrUnsupportedConversion},
+      {F::PAL_DV100_1080i, F::BGRA_4444_8u, 1440, 1080, VX_ErrUnsupportedFormat},
+      {F::PAL_DV100_1080i, F::BGRA_4444_8u, 720, 1080, VX_ErrUnsupportedFormat},
+      {F::PALDV25, F::BGRA_4444_8u, 720, 576, VX_ErrUnsupportedFormat},
+      {F::NTSCDV25, F::BGRA_4444_8u, 720, 576, VX_ErrUnsupportedConversion},
+      {FromBits(0x7F000020), F::BGRA_4444_8u, 4, 4, VX_ErrUnsupportedFormat},
+      // Destinations without an encoder.
+      {F::BGRA_4444_8u, F::PALDV25, 720, 576, VX_ErrFormatNotHandled},
+      {F::YUYV_422_8u, F::PALDV50, 720, 576, VX_ErrFormatNotHandled},
+      {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, 64, 64, VX_ErrFormatNotHandled},
+      {F::BGRA_4444_8u, FromBits(0x0E000A31), 64, 64, VX_ErrFormatNotHandled},
+      {F::BGRA_4444_8u, FromBits(0x7F000020), 64, 64, VX_ErrFormatNotHandled},
+      {F::YUV_420_MPEG2_FRAME_709, F::YUV_420_MPEG2_FRAME_709, 64, 64, VX_ErrFormatNotHandled},
+  };
+  for (const Case& c : cases)
+    EXPECT_EQ(VX_Convert(nowhere, 64, c.src, nowhere, 64, c.dst, c.width, c.height, 2), c.expected)
+        << std::hex << Bits(c.src) << " to " << Bits(c.dst) << std::dec << " " << c.width << " x " << c.height;
+  uint8_t pixel[64] = {};
+  EXPECT_EQ(VX_Convert(nullptr, 64, F::BGRA_4444_8u, pixel, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullSource);
+  EXPECT_EQ(VX_Convert(pixel, 64, F::BGRA_4444_8u, nullptr, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullDestination);
+}
+
+// Blocks, whole rows and streamed rows give the same bytes: a wide picture equals the same picture converted in the
+// other ways.
+TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
+  struct Pair {
+    F src, dst;
+  };
+  const Pair pairs[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u},     {F::BGRA_4444_8u, F::ARGB_4444_32f},
+                        {F::UYVY_422_8u, F::BGRA_4444_32f},     {F::BGRA_4444_8u, F::V210_422_10u},
+                        {F::ARGB_4444_32f, F::UYVY_422_8u_709}, {F::V210_422_10u, F::XRGB_4444_15u}};
+  constexpr int kWidth = 1001;
+  for (const auto& [src, dst] : pairs) {
+    const auto srcRow = static_cast<int32_t>(UnpaddedRowBytes(src, kWidth));
+    const auto dstRow = static_cast<int32_t>(UnpaddedRowBytes(dst, kWidth));
+    const int height = static_cast<int>(VX_GetCacheSize() / 2 / static_cast<uint32_t>(dstRow)) + 2;
+    const auto source = RandomBytes(static_cast<size_t>(srcRow), 7);
+    std::vector<uint8_t> large(static_cast<size_t>(dstRow) * height), small(static_cast<size_t>(dstRow));
+    // Row bytes 0: every row is the one source row.
+    ASSERT_EQ(VX_Convert(source.data(), 0, src, large.data(), dstRow, dst, kWidth, height, 2), VX_Success);
+    ASSERT_EQ(VX_Convert(source.data(), 0, src, small.data(), dstRow, dst, kWidth, 1, 2), VX_Success);
+    for (int y = 0; y < height; ++y)
+      ASSERT_EQ(std::memcmp(&large[static_cast<size_t>(dstRow) * y], small.data(), small.size()), 0)
+          << FormatName(src) << " to " << FormatName(dst) << " row " << y;
+  }
+}
+
+}  // namespace
+}  // namespace vexel
