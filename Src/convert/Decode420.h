@@ -68,7 +68,7 @@ class Rows420 {
   int32_t LineOf(int32_t row, int32_t index) const noexcept { return row * mAdvance + mFirstLine + index * mLineStep; }
   void AddTap(int32_t row, uint32_t weight) noexcept;
   void AddChromaTaps(int32_t line) noexcept;
-  void MeanOfRows(const Plane& plane, uint32_t total) const noexcept;
+  void MeanOfRows(const Plane& plane, uint64_t total) const noexcept;
   void MakeLuma(int32_t row) noexcept;
   void MakeChroma(int32_t row) noexcept;
   const uint16_t* ResampleLuma() noexcept;

@@ -9,7 +9,7 @@ using namespace decode420;
 namespace {
 
 // Weights of one line's chroma rows are in eighths.
-constexpr uint32_t kLineWeight = 8;
+constexpr int32_t kLineWeight = 8;
 
 // A block one pixel wide has no chroma bytes.
 constexpr uint16_t kNoChroma = 128 << 8;
@@ -127,21 +127,23 @@ void Rows420::AddChromaTaps(int32_t line) noexcept {
   const int32_t parity = oneField ? line % 2 : 0, step = oneField ? 2 : 1;
   const int32_t rows = (ChromaHeight(mSrc) - parity + step - 1) / step;
   if (rows < 1) return AddTap(0, kLineWeight);  // a picture of one or two lines has chroma of the upper field only
-  const int32_t ownLine = line / step, own = std::min(ownLine / 2, rows - 1);
-  if (!mLinear) return AddTap(own * step + parity, kLineWeight);
+  const int32_t ownLine = line / step, own = ownLine / 2;
+  const auto add = [&](int32_t k, int32_t weight) {
+    AddTap(std::clamp(k, 0, rows - 1) * step + parity, static_cast<uint32_t>(weight));
+  };
+  if (!mLinear) return add(own, kLineWeight);
   const int32_t offset = oneField ? 1 + 2 * parity : 2;
-  const bool above = ownLine % 2 == 0;  // the line lies above its chroma row
-  const auto otherWeight = static_cast<uint32_t>(above ? offset : 4 - offset);
-  const int32_t other = std::clamp(above ? own - 1 : own + 1, 0, rows - 1);
-  AddTap(own * step + parity, kLineWeight - otherWeight);
-  AddTap(other * step + parity, otherWeight);
+  const bool isAbove = ownLine % 2 == 0;  // the line lies above the chroma row that covers it
+  const int32_t otherWeight = isAbove ? offset : 4 - offset;
+  add(own, kLineWeight - otherWeight);
+  add(isAbove ? own - 1 : own + 1, otherWeight);
 }
 
-void Rows420::MeanOfRows(const Plane& plane, uint32_t total) const noexcept {
+void Rows420::MeanOfRows(const Plane& plane, uint64_t total) const noexcept {
   const uint32_t mixTotal = HasWideSamples(mSrc.format) ? kMixTotal10 : kMixTotal8;
   const auto row = [&](int32_t tap) { return plane.base + mTaps[tap].row * plane.rowBytes; };
   if (mixTotal % total == 0) {
-    const uint32_t scale = mixTotal / total;
+    const auto scale = static_cast<uint32_t>(mixTotal / total);
     for (int32_t i = 0; i < mTapCount; i += 2) {
       const int32_t next = i + 1 < mTapCount ? i + 1 : i;
       const MixRows rows = {row(i), row(next), scale * mTaps[i].weight, next == i ? 0 : scale * mTaps[next].weight,
@@ -185,7 +187,7 @@ void Rows420::MakeLuma(int32_t row) noexcept {
   mTapCount = 0;
   for (int32_t i = 0; i < mLines; ++i) mTaps[mTapCount++] = {LineOf(row, i), 1};
   MeanOfRows({mSrc.planes[0], mSrc.rowBytes[0], mMixLuma, {mY, nullptr}, static_cast<size_t>(mSrc.width)},
-             static_cast<uint32_t>(mLines));
+             static_cast<uint64_t>(mLines));
   mRowY = reinterpret_cast<const uint8_t*>(ResampleLuma());
 }
 
@@ -221,7 +223,7 @@ void Rows420::MakeChroma(int32_t row) noexcept {
   const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
   uint16_t* const out[2] = {reversed ? mV : mU, reversed ? mU : mV};
   const auto samples = static_cast<size_t>(ChromaWidth(mSrc));
-  const uint32_t total = kLineWeight * static_cast<uint32_t>(mLines);
+  const uint64_t total = uint64_t{kLineWeight} * static_cast<uint64_t>(mLines);
   if (pairs) {
     MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], out[1]}, samples}, total);
   } else {
