@@ -70,11 +70,15 @@ TEST(Planner, NothingIsLostOnTheWay) {
       for (int i = 0; i + 1 < plan.stepCount; ++i) {
         const F through = plan.steps[i].to;
         EXPECT_GE(DepthRank(through), std::min(DepthRank(src), DepthRank(dst))) << Chain(src, dst);
-        if (carriesAlpha(src) && carriesAlpha(dst)) EXPECT_TRUE(carriesAlpha(through)) << Chain(src, dst);
-        if (Layout(src) == kLayout4444 && Layout(dst) == kLayout4444)
+        if (carriesAlpha(src) && carriesAlpha(dst)) {
+          EXPECT_TRUE(carriesAlpha(through)) << Chain(src, dst);
+        }
+        if (Layout(src) == kLayout4444 && Layout(dst) == kLayout4444) {
           EXPECT_EQ(Layout(through), kLayout4444) << Chain(src, dst);
-        if (AlphaKind(src) == kAlphaStraight && AlphaKind(dst) == kAlphaStraight)
+        }
+        if (AlphaKind(src) == kAlphaStraight && AlphaKind(dst) == kAlphaStraight) {
           EXPECT_EQ(AlphaKind(through), kAlphaStraight) << Chain(src, dst);
+        }
       }
     }
 }
