@@ -149,7 +149,7 @@ TEST_P(Meaning, EveryPairOfFormats) {
     source.insert(source.end(), row.begin(), row.end());
     for (F dst : RasterFormats()) {
       // Whether light is added over black before or after linearisation depends on the chain.
-      if (colour.a < 1 && IsLinear(src) != IsLinear(dst) && HasAlpha(src) != HasAlpha(dst)) continue;
+      if (colour.a < 1 && (IsLinear(src) || IsLinear(dst)) && HasAlpha(src) != HasAlpha(dst)) continue;
       // Alpha that the source dropped cannot come back.
       Colour kept = colour;
       if (!HasAlpha(src)) {
