@@ -8,7 +8,7 @@
 namespace vexel {
 namespace {
 
-constinit std::mutex gMutex;
+std::mutex gMutex;
 constinit KernelVariant gMost = KernelVariant::Avx512;  // the tests' limit
 
 KernelVariant AllowedBySwitches() noexcept {

@@ -1,10 +1,12 @@
 #include "frame/Lifecycle.h"
 
+#include <cstdio>
+
 #include "frame/DvModule.h"
 #include "frame/Features.h"
 #include "frame/ImagePrimitives.h"
-#include "frame/InitTrace.h"
 #include "frame/Platform.h"
+#include "frame/Trace.h"
 #include "vexel/vexel.h"
 #include "zovcore/Debug.h"
 #include "zovcore/Threads.h"
@@ -44,10 +46,17 @@ void ApplyKeys() noexcept {
   gSwitches.noAvx512.Set(IsKeyTrue("VX.disableAVX512"));
 }
 
+// Errors are passed over: start-up goes on in any case.
 void InitialisePrimitives() noexcept {
   using primitives::Domain;
-  for (const Domain domain : {Domain::Channels, Domain::Fills, Domain::Arithmetic})
-    TraceInitWarning(primitives::Initialise(domain));
+  static constinit TraceSite site("VX.InitIpp", 5);
+  for (const Domain domain : {Domain::Channels, Domain::Fills, Domain::Arithmetic}) {
+    const primitives::Status status = primitives::Initialise(domain);
+    if (static_cast<int32_t>(status) <= 0 || !site.Enabled()) continue;
+    char text[128];
+    std::snprintf(text, sizeof text, "ippInit warning: %s", primitives::StatusText(status));
+    site.Line(text);
+  }
 }
 
 void CreateExecutor() noexcept try { Executor() = zovcore::threads::CreateCPUBoundExecutor(); } catch (...) {

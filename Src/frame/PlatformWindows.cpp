@@ -2,7 +2,9 @@
 #include "frame/Platform.h"
 
 #define WIN32_LEAN_AND_MEAN
+#ifndef NOMINMAX
 #define NOMINMAX
+#endif
 #include <windows.h>
 
 #include <intrin.h>
@@ -49,7 +51,9 @@ bool FindUnifiedCache(CacheInfo& cache) {
   using Query = BOOL(WINAPI*)(LOGICAL_PROCESSOR_RELATIONSHIP, PSYSTEM_LOGICAL_PROCESSOR_INFORMATION_EX, PDWORD);
   const HMODULE kernel = GetModuleHandleW(L"kernel32");
   const auto query =
-      kernel ? reinterpret_cast<Query>(GetProcAddress(kernel, "GetLogicalProcessorInformationEx")) : nullptr;
+      kernel
+          ? reinterpret_cast<Query>(reinterpret_cast<void*>(GetProcAddress(kernel, "GetLogicalProcessorInformationEx")))
+          : nullptr;
   if (!query) return false;
   DWORD bytes = 0;
   query(RelationCache, nullptr, &bytes);

@@ -1,7 +1,11 @@
 // Scoped scratch memory: up to 262,144 bytes on the caller's stack, larger from the transient allocator.
 #pragma once
 
+#if defined(_WIN32)
+#include <malloc.h>
+#else
 #include <alloca.h>
+#endif
 
 #include <cstddef>
 #include <cstdint>

@@ -76,7 +76,8 @@ typedef enum VX_Result
 /* ---- Lifecycle, switches, diagnostics ---------------------------------------------------------------------------- */
 
 /* Starts the library: detects processor features and the cache, reads the configuration keys "VX.disableAVX" and
- * "VX.disableAVX2" (true only if the text is exactly "true"), creates the CPU-bound executor. Reference counted; call it
+ * "VX.disableAVX2" (true only if the text is exactly "true"; our own key "VX.disableAVX512" keeps AVX2 kernels but no
+ * wider ones), creates the CPU-bound executor. Reference counted; call it
  * and VX_Terminate from one thread. Always VX_Success. Before it, all feature switches are off and plain kernels run. */
 VX_API VX_Result VX_Initialize(void) VX_NOEXCEPT;
 /* Undoes one VX_Initialize; the last one releases the executor. Switches and debug flags keep their values. */
