@@ -5,6 +5,7 @@
 #include "convert/RgbKernels.h"
 #include "frame/StreamCopy.h"
 #include "support/Bench.h"
+#include "vexel/vexel.h"
 
 namespace vexel::bench {
 namespace {
@@ -57,9 +58,9 @@ const KernelCase kCases[] = {
     {"linear to BGRA8", &kLinearToBgra8, 16, 4},
 };
 
-// As long chains of rows are run: blocks of 384 pixels through the first-level cache, streamed to the frame.
-void ConvertFrame(RowKernel kernel, KernelVariant variant, const KernelCase& kernelCase, const uint8_t* src,
-                  uint8_t* dst, size_t pixels) {
+// As the row converter writes frames that do not fit the cache: blocks of 384 pixels through its first level, streamed.
+void StreamFrame(RowKernel kernel, KernelVariant variant, const KernelCase& kernelCase, const uint8_t* src,
+                 uint8_t* dst, size_t pixels) {
   alignas(64) uint8_t block[384 * 16];
   for (size_t i = 0; i < pixels; i += 384) {
     const size_t count = std::min<size_t>(384, pixels - i);
@@ -91,11 +92,13 @@ void Register(const KernelCase& kernelCase, const Buffers& buffers, const std::s
   BenchCase bench(std::string(kernelCase.name) + " " + size, pixels);
   bench.Add("floor cached", [=] { FloorCached(src, srcBytes, dst, dstBytes); });
   bench.Add("floor streamed", [=] { FloorStreamed(src, srcBytes, dst, dstBytes); });
+  const bool streams = dstBytes >= VX_GetCacheSize() / 2;
   bench.Add("vexel", [=, &kernelCase] {
-    if (pixels == kRowPixels)
-      kernel(src, dst, pixels);
+    if (streams)
+      StreamFrame(kernel, variant, kernelCase, src, dst, pixels);
     else
-      ConvertFrame(kernel, variant, kernelCase, src, dst, pixels);
+      for (size_t i = 0; i < pixels; i += kRowPixels)
+        kernel(src + i * kernelCase.srcPixel, dst + i * kernelCase.dstPixel, kRowPixels);
   });
 }
 
