@@ -92,7 +92,7 @@ void Register(const KernelCase& kernelCase, const Buffers& buffers, const std::s
   BenchCase bench(std::string(kernelCase.name) + " " + size, pixels);
   bench.Add("floor cached", [=] { FloorCached(src, srcBytes, dst, dstBytes); });
   bench.Add("floor streamed", [=] { FloorStreamed(src, srcBytes, dst, dstBytes); });
-  const bool streams = dstBytes >= VX_GetCacheSize() / 2;
+  const bool streams = srcBytes + dstBytes >= VX_GetCacheSize() / 2;
   bench.Add("vexel", [=, &kernelCase] {
     if (streams)
       StreamFrame(kernel, variant, kernelCase, src, dst, pixels);

@@ -56,10 +56,11 @@ B BottomUp(B buffer, int32_t height) noexcept {
   return buffer;
 }
 
-// A destination that would push everything else out of the cache.
-bool GoesPastCache(VX_PixelFormat format, int32_t width, int32_t height) noexcept {
+// Whether reading the source would push the destination out of the cache before anyone looks at it.
+bool GoesPastCache(VX_PixelFormat src, VX_PixelFormat dst, int32_t width, int32_t height) noexcept {
   const uint32_t cache = VX_GetCacheSize();
-  return cache != 0 && UnpaddedRowBytes(format, width) * height >= static_cast<int64_t>(cache / 2);
+  const int64_t rowBytes = UnpaddedRowBytes(src, width) + UnpaddedRowBytes(dst, width);
+  return cache != 0 && rowBytes * height >= static_cast<int64_t>(cache / 2);
 }
 
 // Whether the row bytes of a buffer can express a row.
@@ -75,7 +76,7 @@ VX_Result RunChain(const ConstBuffer& src, const Buffer& dst, int32_t width, int
   if (!RowFits(src.format, width) || !RowFits(dst.format, width)) return VX_ErrArgumentOutOfRange;
   if (!src.base) return VX_ErrNullSource;
   if (!dst.base) return VX_ErrNullDestination;
-  const bool stream = GoesPastCache(dst.format, width, height);
+  const bool stream = GoesPastCache(src.format, dst.format, width, height);
   if (stream) converter.StreamOutput();
   VX_SCRATCH(scratch, converter.ScratchBytes());
   if (!scratch && converter.ScratchBytes() != 0) return VX_ErrOutOfMemory;
