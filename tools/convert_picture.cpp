@@ -53,8 +53,6 @@ std::string ExplainConversion(VX_PixelFormat from, VX_PixelFormat to, int qualit
   VX_PixelFormat chain[9];
   int32_t count = 0;
   const VX_Result result = VX_ExplainConversion(from, to, quality, chain, &count);
-  if (result == VX_ErrUnsupportedFormat) return FormatName(from) + " > its decoder > " + FormatName(to);
-  if (result == VX_ErrUnsupportedDestinationFormat) return FormatName(from) + " > its encoder > " + FormatName(to);
   if (result != VX_Success)
     return FormatName(from) + " > " + FormatName(to) + ": no plan, " + VX_ResultName(result) + " (" +
            std::to_string(result) + ")";

@@ -1,4 +1,5 @@
 // VX_Convert: special sources and destinations by way of their planners, orientation, and the chain over all rows.
+#include <algorithm>
 #include <cstddef>
 
 #include "convert/Planar420.h"
@@ -197,4 +198,31 @@ VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFor
   const Buffer to{static_cast<uint8_t*>(dst), dstRowBytes, dstFormat};
   if (srcFormat != dstFormat && IsSpecial(srcFormat)) return ConvertFromSpecial(from, to, width, height, renderQuality);
   return ConvertRasters(from, to, width, height, renderQuality);
+}
+
+VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
+                               VX_PixelFormat formats[9], int32_t* count) noexcept {
+  VX_PixelFormat from = srcFormat, to = dstFormat;
+  if (srcFormat == dstFormat && IsSpecial(dstFormat) && !PlanEncode(from, dstFormat, &to))
+    return VX_ErrFormatNotHandled;
+  if (IsSpecial(srcFormat)) {
+    if (!Is420(srcFormat)) return VX_ErrUnsupportedFormat;
+    from = PlanDecode420(srcFormat, 2, 2, dstFormat, 2, 2, renderQuality).format;  // the same for every size
+  }
+  if (IsSpecial(dstFormat) && (!Is420(dstFormat) || !PlanEncode(from, dstFormat, &to))) return VX_ErrFormatNotHandled;
+
+  VX_PixelFormat chain[kMaxSteps + 3];
+  int32_t length = 0;
+  chain[length++] = srcFormat;
+  if (from != srcFormat) chain[length++] = from;
+  if (from != to || (srcFormat == dstFormat && !IsSpecial(srcFormat))) {
+    Plan plan;
+    if (const VX_Result result = MakePlan(from, to, renderQuality, &plan)) return result;
+    for (int i = 0; i < plan.stepCount; ++i) chain[length++] = plan.steps[i].to;
+  }
+  if (to != dstFormat) chain[length++] = dstFormat;
+  if (length > 9) return VX_ErrFailed;
+  std::copy_n(chain, length, formats);
+  *count = length;
+  return VX_Success;
 }

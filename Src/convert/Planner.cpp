@@ -252,13 +252,3 @@ VX_Result MakePlan(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality
 }
 
 }  // namespace vexel
-
-VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
-                               VX_PixelFormat formats[9], int32_t* count) noexcept {
-  vexel::Plan plan;
-  if (const VX_Result result = vexel::MakePlan(srcFormat, dstFormat, renderQuality, &plan)) return result;
-  *count = 0;
-  formats[(*count)++] = srcFormat;
-  for (int i = 0; i < plan.stepCount; ++i) formats[(*count)++] = plan.steps[i].to;
-  return VX_Success;
-}

@@ -161,8 +161,9 @@ VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat
                             int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                             int32_t renderQuality) VX_NOEXCEPT;
 
-/* The formats that VX_Convert goes through between two raster formats, both ends included: up to 9 values into formats[],
- * their number into *count. -999 if there is no chain; -3 or -4 for special formats. */
+/* The formats that VX_Convert goes through, both ends and the rasters that 4:2:0 ends are decoded to and encoded from
+ * included: up to 9 values into formats[], their number into *count. Codes as VX_Convert: -999 if there is no chain, -3
+ * a special source without a decoder, -1000 a special destination without an encoder. */
 VX_API VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
                                       VX_PixelFormat formats[9], int32_t* count) VX_NOEXCEPT;
 

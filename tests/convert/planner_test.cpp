@@ -96,6 +96,25 @@ TEST(Planner, FixedAndTellingChains) {
             "V210_422_10u > UYVY_422_32f > VUYA_4444_32f > BGRA_4444_32f > BGRA_4444_15u");
 }
 
+TEST(Planner, ExplainsSpecialEnds) {
+  EXPECT_EQ(Chain(F::YUV_420_MPEG4_FRAME_709, F::VUYX_4444_8u_709), "YUV_420_MPEG4_FRAME_709 > VUYX_4444_8u_709");
+  EXPECT_EQ(Chain(F::YUV_420_MPEG2_FIELD_FullRange, F::BGRX_4444_15u),
+            "YUV_420_MPEG2_FIELD_FullRange > BGRX_4444_8u > BGRX_4444_15u");
+  EXPECT_EQ(Chain(F::VUYA_4444_8u, F::YUV_420_MPEG4_FRAME_FullRange),
+            "VUYA_4444_8u > BGRA_4444_8u > BGRP_4444_8u > BGRX_4444_8u > YUV_420_MPEG4_FRAME_FullRange");
+  EXPECT_EQ(Chain(F::V210_422_10u_709, F::YUV_420_MPEG2_FRAME_709), "V210_422_10u_709 > YUV_420_MPEG2_FRAME_709");
+  EXPECT_EQ(Chain(F::YUV_420_MPEG4_FRAME_FullRange, F::YUV_420_MPEG4_FRAME_FullRange),
+            "YUV_420_MPEG4_FRAME_FullRange > BGRX_4444_8u > YUV_420_MPEG4_FRAME_FullRange");
+  // Every chain fits: the 4:2:0 end and at most nine rasters would not.
+  for (F src : {F::YUV_420_MPEG4_FRAME, F::YUV_420_MPEG4_FRAME_709, F::YUV_420_MPEG2_FIELD_FullRange})
+    for (F dst : RasterFormats()) EXPECT_NE(Chain(src, dst), "none") << FormatName(src) << " to " << FormatName(dst);
+  F formats[9];
+  int32_t count = 0;
+  EXPECT_EQ(VX_ExplainConversion(F::PALDV25, F::BGRA_4444_8u, 2, formats, &count), VX_ErrUnsupportedFormat);
+  EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::PALDV25, 2, formats, &count), VX_ErrFormatNotHandled);
+  EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME, 2, formats, &count), VX_ErrFormatNotHandled);
+}
+
 TEST(Planner, InvalidAsAnEnd) {
   int reached = 0;
   for (F dst : RasterFormats()) reached += Chain(F::Invalid, dst) != "none";
