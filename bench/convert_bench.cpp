@@ -37,7 +37,7 @@ constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
 
 // A frame in one format with the library's row padding.
 struct Frame {
-  Frame(F f, Size size)
+  Frame(F f, Size size, bool opaque = false)
       : format(f),
         rowBytes(static_cast<int>(PaddedRowBytes(f, size.width))),
         memory(static_cast<size_t>(rowBytes) * size.height) {
@@ -45,6 +45,8 @@ struct Frame {
       memory.FillFloats();
     else
       memory.FillBytes();
+    if (Layout(f) == kLayout4444 && Depth(f) == kDepth8u && opaque)
+      for (size_t i = 3; i < memory.size(); i += 4) memory.data()[i] = 255;
     if (Depth(f) == kDepth15u) {  // keep to 0..32768
       auto* p = reinterpret_cast<uint16_t*>(memory.data());
       for (size_t i = 0; i < memory.size() / 2; ++i) p[i] &= 0x7FFF;
@@ -69,8 +71,8 @@ void Check(bool ok, const char* what) {
 }
 
 // The frame conversion, its floor, and the job for adding peers.
-Job Convert(const std::string& name, F srcFormat, F dstFormat, Size size) {
-  auto src = std::make_shared<Frame>(srcFormat, size), dst = std::make_shared<Frame>(dstFormat, size);
+Job Convert(const std::string& name, F srcFormat, F dstFormat, Size size, bool opaque = false) {
+  auto src = std::make_shared<Frame>(srcFormat, size, opaque), dst = std::make_shared<Frame>(dstFormat, size);
   Job job{src, dst, size,
           BenchCase("VX_Convert " + name + " " + size.name, static_cast<size_t>(size.width) * size.height)};
   const auto work = [=] {
@@ -101,7 +103,8 @@ cv::Mat MatOf(const Frame& frame, Size size, int type) {
 
 void Yuv8Cases(Size size) {
   Job decode = Convert("UYVY8 to BGRA8", F::UYVY_422_8u, F::BGRA_4444_8u, size);
-  Job encode = Convert("BGRA8 to UYVY8", F::BGRA_4444_8u, F::UYVY_422_8u, size);
+  Job encode = Convert("BGRA8 to UYVY8 (opaque)", F::BGRA_4444_8u, F::UYVY_422_8u, size, true);
+  Convert("BGRA8 to UYVY8 (alpha at random)", F::BGRA_4444_8u, F::UYVY_422_8u, size);
   Job matrix = Convert("BGRA8 to VUYA8", F::BGRA_4444_8u, F::VUYA_4444_8u, size);
   Convert("VUYA8 to BGRA8", F::VUYA_4444_8u, F::BGRA_4444_8u, size);
 #ifdef VEXEL_PEER_YUV

@@ -197,6 +197,20 @@ uint64_t FindChain(const Graph& graph, int src, int dst, bool hasSimd) noexcept 
 
 }  // namespace
 
+const RowKernelSet* FusedKernelFor(VX_PixelFormat src, VX_PixelFormat dst) noexcept {
+  struct FusedChain {
+    F src, dst;
+    const RowKernelSet* kernel;
+  };
+  static constexpr FusedChain kFused[] = {
+      {F::BGRA_4444_8u, F::UYVY_422_8u, &kBgra8ToUyvy8_601}, {F::BGRA_4444_8u, F::UYVY_422_8u_709, &kBgra8ToUyvy8_709},
+      {F::BGRP_4444_8u, F::UYVY_422_8u, &kBgrx8ToUyvy8_601}, {F::BGRP_4444_8u, F::UYVY_422_8u_709, &kBgrx8ToUyvy8_709},
+      {F::BGRX_4444_8u, F::UYVY_422_8u, &kBgrx8ToUyvy8_601}, {F::BGRX_4444_8u, F::UYVY_422_8u_709, &kBgrx8ToUyvy8_709}};
+  for (const FusedChain& chain : kFused)
+    if (chain.src == src && chain.dst == dst) return chain.kernel;
+  return nullptr;
+}
+
 const RowKernelSet* CopyKernelFor(VX_PixelFormat format) noexcept {
   if (IsSpecial(format)) return nullptr;
   if (IsV210(format)) return &kCopyV210;

@@ -33,6 +33,10 @@ struct Plan {
 // Render quality above 1 interpolates chroma where 32f 4:2:2 becomes 4:4:4:4; the walk does not depend on it.
 VX_Result MakePlan(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, Plan* plan) noexcept;
 
+// A kernel that gives the bytes of a whole planned chain in one pass over the row, for chains that are asked for often;
+// null where there is none. It sees whole rows.
+const RowKernelSet* FusedKernelFor(VX_PixelFormat src, VX_PixelFormat dst) noexcept;
+
 // The kernel that copies pixels of a format; null for formats that are no rasters of pixels, pairs or groups.
 const RowKernelSet* CopyKernelFor(VX_PixelFormat format) noexcept;
 

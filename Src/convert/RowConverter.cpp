@@ -32,6 +32,11 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
     mSteps[i] = (*plan.steps[i].kernel)[variant];
     mWholeRow |= plan.steps[i].span == StepSpan::Row;
   }
+  if (const RowKernelSet* fused = FusedKernelFor(src, dst)) {
+    mSteps[0] = (*fused)[variant];
+    mStepCount = 1;
+    mWholeRow = true;
+  }
   return VX_Success;
 }
 

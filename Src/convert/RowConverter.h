@@ -26,7 +26,8 @@ class RowConverter {
 
   // For destinations too large for the cache: the last step's output goes past the cache. Before ScratchBytes. Call
   // StreamFence (frame/StreamCopy.h) after the last row.
-  void StreamOutput() noexcept { mStream = true; }
+  // A single kernel that needs whole rows writes them itself: staging rows that leave the first-level cache costs more.
+  void StreamOutput() noexcept { mStream = !(mWholeRow && mStepCount == 1); }
 
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }

@@ -128,5 +128,25 @@ TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
   }
 }
 
+// Chains run in blocks, in whole rows or fused into one kernel: always the bytes of their steps one after the other.
+TEST(Convert, AChainGivesTheBytesOfItsSteps) {
+  constexpr int kWidth = 781;
+  for (F src : RasterFormats())
+    for (F dst : RasterFormats()) {
+      F formats[9];
+      int32_t count = 0;
+      ASSERT_EQ(VX_ExplainConversion(src, dst, 2, formats, &count), VX_Success);
+      auto stepped = RandomBytes(static_cast<size_t>(UnpaddedRowBytes(src, kWidth)), Bits(src) + 1);
+      std::vector<uint8_t> chained(static_cast<size_t>(UnpaddedRowBytes(dst, kWidth)));
+      ASSERT_EQ(VX_Convert(stepped.data(), 0, src, chained.data(), 0, dst, kWidth, 1, 2), VX_Success);
+      for (int i = 1; i < count; ++i) {
+        std::vector<uint8_t> next(static_cast<size_t>(UnpaddedRowBytes(formats[i], kWidth)));
+        ASSERT_EQ(VX_Convert(stepped.data(), 0, formats[i - 1], next.data(), 0, formats[i], kWidth, 1, 2), VX_Success);
+        stepped.swap(next);
+      }
+      ASSERT_EQ(stepped, chained) << FormatName(src) << " to " << FormatName(dst);
+    }
+}
+
 }  // namespace
 }  // namespace vexel
