@@ -17,6 +17,12 @@
 namespace vexel::bench {
 namespace {
 
+// Cases and contenders in the order of their registration, in which the report lists them.
+std::vector<std::string>& Registered() {
+  static std::vector<std::string> names;
+  return names;
+}
+
 constexpr size_t kFloorStep = 4096;  // bytes of the larger side per step
 
 __attribute__((target("avx2"))) void ReadBytes(const uint8_t* src, size_t bytes) {
@@ -64,7 +70,6 @@ class RatioReporter final : public benchmark::BenchmarkReporter {
       const std::string name = run.run_name.function_name;
       const size_t bar = name.rfind('|');
       const std::string key = name.substr(0, bar), contender = name.substr(bar + 1);
-      if (mTimes.find(key) == mTimes.end()) mOrder.push_back(key);
       auto& times = mTimes[key];
       auto it = std::find_if(times.begin(), times.end(), [&](const auto& t) { return t.first == contender; });
       if (it == times.end()) it = times.insert(times.end(), {contender, std::numeric_limits<double>::max()});
@@ -75,10 +80,22 @@ class RatioReporter final : public benchmark::BenchmarkReporter {
   }
   void Finalize() override {
     std::printf("| case | contender | ns/px | x floor | Vexel is |\n|---|---|---:|---:|---:|\n");
-    for (const std::string& key : mOrder) Print(key, mTimes[key]);
+    for (const std::string& name : Registered()) {
+      const std::string key = name.substr(0, name.rfind('|'));
+      const auto times = mTimes.find(key);
+      if (times == mTimes.end()) continue;
+      std::stable_sort(times->second.begin(), times->second.end(), [&](const auto& a, const auto& b) {
+        return RankOf(key + "|" + a.first) < RankOf(key + "|" + b.first);
+      });
+      Print(key, times->second);
+      mTimes.erase(times);
+    }
   }
 
  private:
+  static ptrdiff_t RankOf(const std::string& name) {
+    return std::find(Registered().begin(), Registered().end(), name) - Registered().begin();
+  }
   using Times = std::vector<std::pair<std::string, double>>;
   static void Print(const std::string& key, const Times& times) {
     double floor = 0, ours = 0;
@@ -101,7 +118,6 @@ class RatioReporter final : public benchmark::BenchmarkReporter {
     }
   }
 
-  std::vector<std::string> mOrder;
   std::map<std::string, Times> mTimes;
 };
 
@@ -142,6 +158,7 @@ void FloorStreamed(const uint8_t* src, size_t srcBytes, uint8_t* dst, size_t dst
 
 BenchCase& BenchCase::Add(const std::string& contender, std::function<void()> work) {
   const std::string name = mName + "|" + contender;
+  Registered().push_back(name);
   benchmark::RegisterBenchmark(name.c_str(), [work = std::move(work), pixels = mPixels](benchmark::State& state) {
     work();
     for (auto _ : state) work();
