@@ -10,10 +10,10 @@
 namespace vexel {
 
 // Exact moves (ReorderKernels.cpp).
-extern const RowKernelSet kCopy4, kCopy8, kCopy16;                    // whole pixels of 4, 8, 16 bytes
-extern const RowKernelSet kCopy422_8u, kCopy422_32f, kCopyV210;       // pixel pairs of 4 and 16 bytes; groups of 6
-extern const RowKernelSet kReverse8u, kReverse15u, kReverse32f;       // BGRA <-> ARGB
-extern const RowKernelSet kBgrx8ToXrgb8, kXrgb8ToBgrx8;               // the same, alpha written opaque
+extern const RowKernelSet kCopy4, kCopy8, kCopy16;               // whole pixels of 4, 8, 16 bytes
+extern const RowKernelSet kCopy422_8u, kCopy422_32f, kCopyV210;  // pixel pairs of 4 and 16 bytes; groups of 6
+extern const RowKernelSet kReverse8u, kReverse15u, kReverse32f;  // BGRA <-> ARGB
+extern const RowKernelSet kBgrx8ToXrgb8, kXrgb8ToBgrx8;          // the same, alpha written opaque
 extern const RowKernelSet kBgrx15ToXrgb15, kXrgb15ToBgrx15, kBgrx32fToXrgb32f, kXrgb32fToBgrx32f;
 extern const RowKernelSet kOpaqueLast8u, kOpaqueLast15u, kOpaqueLast32f;
 extern const RowKernelSet kOpaqueFirst8u, kOpaqueFirst15u, kOpaqueFirst32f;
@@ -40,8 +40,8 @@ extern const RowKernelSet kRgb10ToBgrx8, kRgb10ToBgrx15, kRgb10ToBgrx32f;
 extern const RowKernelSet kBgrx8ToRgb10, kBgrx15ToRgb10, kBgrx32fToRgb10;
 
 // Working curve: linear = sign(c) |c|^2.4, alpha untouched (LinearKernels.cpp).
-extern const RowKernelSet kBgra32fToLinear, kLinearToBgra32f;   // alpha copied
-extern const RowKernelSet kBgrx32fToLinear, kLinearToBgrx32f;   // alpha written opaque
+extern const RowKernelSet kBgra32fToLinear, kLinearToBgra32f;  // alpha copied
+extern const RowKernelSet kBgrx32fToLinear, kLinearToBgrx32f;  // alpha written opaque
 extern const RowKernelSet kBgra8ToLinear, kLinearToBgra8;
 
 }  // namespace vexel

@@ -34,9 +34,9 @@ extern const RowKernelSet kSwap422_8u;  // UYVY <-> YUYV
 extern const RowKernelSet kUyvy8_601To709, kUyvy8_709To601, kYuyv8_601To709, kYuyv8_709To601;
 // Downwards, chroma is low-passed with (-1, 2, 6, 2, -1) / 8 about the even pixel, in the form that undoes the
 // interpolation exactly: with d[i] = odd[i] - ((even[i] + even[i + 1] + 1) >> 1), chroma is the clamped
-// even[i] + ((d[i - 1] + d[i] + 2) >> 2). An interpolated row has d = 0 and comes back byte for byte, in odd widths too.
-// Beyond either end the row repeats its end pixel (d = 0 before the first pair). The fourth channel is ignored, so that
-// premultiplied pixels are served as well (Subsample422Kernels8.cpp).
+// even[i] + ((d[i - 1] + d[i] + 2) >> 2). An interpolated row has d = 0 and comes back byte for byte, in odd widths
+// too. Beyond either end the row repeats its end pixel (d = 0 before the first pair). The fourth channel is ignored, so
+// that premultiplied pixels are served as well (Subsample422Kernels8.cpp).
 extern const RowKernelSet kVuyx8ToUyvy8;
 // In one pass the same bytes as kBgrx8ToVuyx8 then kVuyx8ToUyvy8, and as kPremultiplyLast8u before these.
 extern const RowKernelSet kBgrx8ToUyvy8_601, kBgrx8ToUyvy8_709, kBgra8ToUyvy8_601, kBgra8ToUyvy8_709;

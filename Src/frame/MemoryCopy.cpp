@@ -152,8 +152,8 @@ void StreamFence() noexcept { _mm_sfence(); }
 
 }  // namespace vexel
 
-// Nothing but jumps (which they are only because the kernels cannot throw), the usual one direct: a call, or an indirect
-// jump, would cost as much as a short copy. The AVX-512 variant of the kernel is the same.
+// Nothing but jumps (which they are only because the kernels cannot throw), the usual one direct: a call, or an
+// indirect jump, would cost as much as a short copy. The AVX-512 variant of the kernel is the same.
 VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) noexcept {
   using namespace vexel;
   auto* const to = static_cast<uint8_t*>(dst);

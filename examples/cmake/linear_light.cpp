@@ -18,8 +18,7 @@ int main() {
 
   const std::vector<uint8_t> grey(4, 128);
   std::vector<float> light(4);
-  if (result == VX_Success)
-    result = VX_Convert(grey.data(), 4, kFrom, light.data(), 16, kTo, 1, 1, 3);
+  if (result == VX_Success) result = VX_Convert(grey.data(), 4, kFrom, light.data(), 16, kTo, 1, 1, 3);
   std::printf("\n%s: 128 of 255 is %.4f of full light\n", VX_ResultName(result), light[0]);
 
   VX_Terminate();

@@ -1,11 +1,11 @@
 /* Vexel: image processing for video. The flat C interface.
  *
- * Buffers are described by a base pointer to the first stored row, a signed row stride in bytes (`rowBytes`; row r starts
- * at base + r * rowBytes), a width and a height in pixels, and a VX_PixelFormat. The caller owns every buffer it passes.
- * Whether the first stored row is the top of the picture follows from the format (VX_IsOriginTopLeft).
+ * Buffers are described by a base pointer to the first stored row, a signed row stride in bytes (`rowBytes`; row r
+ * starts at base + r * rowBytes), a width and a height in pixels, and a VX_PixelFormat. The caller owns every buffer it
+ * passes. Whether the first stored row is the top of the picture follows from the format (VX_IsOriginTopLeft).
  *
- * No function throws. Except for VX_Initialize and VX_Terminate, every function may be called from many threads at once.
- * Functions that compute with floats run with flush-to-zero set and put the caller's floating-point mode back. */
+ * No function throws. Except for VX_Initialize and VX_Terminate, every function may be called from many threads at
+ * once. Functions that compute with floats run with flush-to-zero set and put the caller's floating-point mode back. */
 #ifndef VEXEL_VEXEL_H
 #define VEXEL_VEXEL_H
 
@@ -51,6 +51,7 @@ enum {
 #endif
 
 /* Result of an operation: 0 is success, every failure is negative. */
+/* clang-format off */
 typedef enum VX_Result
 #ifdef __cplusplus
     : int32_t
@@ -72,13 +73,15 @@ typedef enum VX_Result
   VX_ErrFailed = -999,
   VX_ErrFormatNotHandled = -1000
 } VX_Result;
+/* clang-format on */
 
 /* ---- Lifecycle, switches, diagnostics ---------------------------------------------------------------------------- */
 
 /* Starts the library: detects processor features and the cache, reads the configuration keys "VX.disableAVX" and
  * "VX.disableAVX2" (true only if the text is exactly "true"; our own key "VX.disableAVX512" keeps AVX2 kernels but no
  * wider ones), creates the CPU-bound executor. Reference counted; call it
- * and VX_Terminate from one thread. Always VX_Success. Before it, all feature switches are off and plain kernels run. */
+ * and VX_Terminate from one thread. Always VX_Success. Before it, all feature switches are off and plain kernels run.
+ */
 VX_API VX_Result VX_Initialize(void) VX_NOEXCEPT;
 /* Undoes one VX_Initialize; the last one releases the executor. Switches and debug flags keep their values. */
 VX_API VX_Result VX_Terminate(void) VX_NOEXCEPT;
@@ -93,7 +96,8 @@ VX_API bool VX_hasAVX2(void) VX_NOEXCEPT;
  * cannot execute. Always VX_Success. */
 VX_API VX_Result VX_SetDebugFlag(uint32_t index, int32_t value) VX_NOEXCEPT;
 
-/* True if the first stored row is the top of the picture: every format but the 4:4:4:4 ones with an A, P or X channel. */
+/* True if the first stored row is the top of the picture: every format but the 4:4:4:4 ones with an A, P or X channel.
+ */
 VX_API bool VX_IsOriginTopLeft(VX_PixelFormat format) VX_NOEXCEPT;
 VX_API bool VX_IsOriginBottomLeft(VX_PixelFormat format) VX_NOEXCEPT;
 
@@ -146,17 +150,17 @@ VX_API VX_Result VX_ClipBufferToRect(void* base, int32_t rowBytes, VX_PixelForma
 
 /* ---- Conversion -------------------------------------------------------------------------------------------------- */
 
-/* Converts width x height pixels from one format to another; never scales. Each buffer is walked from its bottom picture
- * row, so pictures keep their orientation. Source and destination must not overlap.
+/* Converts width x height pixels from one format to another; never scales. Each buffer is walked from its bottom
+ * picture row, so pictures keep their orientation. Source and destination must not overlap.
  *
  * A 4:2:0 picture is one block laid out as VX_GetPlanarBuffers says, its row bytes argument is not used. renderQuality
  * above 1 interpolates chroma where 4:2:2 in 32f becomes 4:4:4:4; below 3 it lets special sources decode reduced.
  *
  * 0 done, and for height < 1; -3 a special source without a decoder; -4 a special destination inside a chain; -13 a
  * special source that cannot be decoded to exactly width x height; -16 out of memory; -999 no chain of at most eight
- * steps; -1000 a special destination without an encoder. Ours, tested after the chain is found and for height >= 1: -17 a
- * negative width or one whose row exceeds 2^31 - 1 bytes, -11 and -12 a null source or destination. Nothing is written
- * on failure. Width 0 does nothing. */
+ * steps; -1000 a special destination without an encoder. Ours, tested after the chain is found and for height >= 1: -17
+ * a negative width or one whose row exceeds 2^31 - 1 bytes, -11 and -12 a null source or destination. Nothing is
+ * written on failure. Width 0 does nothing. */
 VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                             int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                             int32_t renderQuality) VX_NOEXCEPT;
@@ -167,8 +171,8 @@ VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat
 VX_API VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
                                       VX_PixelFormat formats[9], int32_t* count) VX_NOEXCEPT;
 
-/* Plane pointers and row bytes of a 4:2:0 picture held in one block: luma pitch = width (2 * width above 8 bits) to 128,
- * chroma pitch = width / 2 to 128 (the luma pitch above 8 bits), planes of height rounded up to 32 rows; biplanar
+/* Plane pointers and row bytes of a 4:2:0 picture held in one block: luma pitch = width (2 * width above 8 bits) to
+ * 128, chroma pitch = width / 2 to 128 (the luma pitch above 8 bits), planes of height rounded up to 32 rows; biplanar
  * pictures have no height padding, chroma pitch = luma pitch and no third plane (null). Only computes. */
 VX_API VX_Result VX_GetPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, int32_t height, void* planes[3],
                                      int32_t rowBytes[3]) VX_NOEXCEPT;
@@ -188,16 +192,16 @@ VX_API VX_Result VX_CopyBiPlanar_8u(const void* const srcPlanes[2], const int32_
 
 /* ---- Transpose and rotation -------------------------------------------------------------------------------------- */
 
-/* Mirrors about the main diagonal: destination element (row x, column y) = source element (row y, column x). `width` and
- * `height` describe the source; the destination has `height` elements per row and `width` rows. Elements have 1 to 16
- * bytes, any other size is VX_ErrUnsupportedFormat; strides are rounded toward zero to whole elements. The areas must not
- * overlap. A size below 1 does nothing. */
+/* Mirrors about the main diagonal: destination element (row x, column y) = source element (row y, column x). `width`
+ * and `height` describe the source; the destination has `height` elements per row and `width` rows. Elements have 1 to
+ * 16 bytes, any other size is VX_ErrUnsupportedFormat; strides are rounded toward zero to whole elements. The areas
+ * must not overlap. A size below 1 does nothing. */
 VX_API VX_Result VX_Transpose(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes, int32_t width,
                               int32_t height, uint8_t elementSize) VX_NOEXCEPT;
-/* Rotates stored rows by a multiple of 90 degrees: for 90 the destination's first stored row is the source's last column
- * read from its first row on. Angles 0, +-90, +-180, +-270, others are VX_ErrFormatNotHandled. `flip` reads the source from
- * its last row first. 4:4:4:4 formats with a fourth channel only, others are VX_ErrUnsupportedFormat. `width` and `height`
- * describe the source. Every pixel is copied bit for bit; the areas must not overlap. */
+/* Rotates stored rows by a multiple of 90 degrees: for 90 the destination's first stored row is the source's last
+ * column read from its first row on. Angles 0, +-90, +-180, +-270, others are VX_ErrFormatNotHandled. `flip` reads the
+ * source from its last row first. 4:4:4:4 formats with a fourth channel only, others are VX_ErrUnsupportedFormat.
+ * `width` and `height` describe the source. Every pixel is copied bit for bit; the areas must not overlap. */
 VX_API VX_Result VX_RotateImageAndFlip(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
                                        int32_t width, int32_t height, VX_PixelFormat format, int32_t angle,
                                        bool flip) VX_NOEXCEPT;
