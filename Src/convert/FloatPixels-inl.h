@@ -23,12 +23,6 @@ namespace hn = hwy::HWY_NAMESPACE;
 using FloatTag = hn::ScalableTag<float>;
 constexpr size_t kVectorPixels = kLanes<float> / 4;
 
-// One value per channel, repeated for each pixel of a vector.
-struct Channels {
-  alignas(16) float lanes[4];
-  HWY_INLINE F32 Vector() const { return hn::LoadDup128(FloatTag(), lanes); }
-};
-
 // The channels whose bits are set in kMask from `second`, the others from `first`.
 template <int kMask>
 HWY_INLINE F32 TakeChannels(F32 first, F32 second) {

@@ -36,28 +36,6 @@ inline void ExtendPairs(const uint8_t* row, size_t pixels, ptrdiff_t first, size
   }
 }
 
-// The same for pixels. Even pixels repeat the first or last one. Odd pixels that the row does not have are those that
-// interpolation would make, so that they pull on no chroma; their luma is that of the even pixel.
-inline void ExtendPixels(const uint8_t* row, size_t pixels, ptrdiff_t first, size_t count, uint8_t* out) {
-  const auto last = static_cast<ptrdiff_t>(PairsOf(pixels)) - 1;
-  const auto even = [row, last](ptrdiff_t pair) {
-    return plain::LoadQuad(row + 32 * (pair < 0 ? 0 : pair > last ? last : pair));
-  };
-  for (size_t i = 0; i < count; ++i) {
-    const ptrdiff_t pair = first + static_cast<ptrdiff_t>(i);
-    const plain::Quad own = even(pair);
-    plain::Quad odd = own;
-    if (pair >= 0 && 2 * static_cast<size_t>(pair) + 1 < pixels) {
-      odd = plain::LoadQuad(row + 32 * pair + 16);
-    } else {
-      const plain::Quad before = even(pair - 1), next = even(pair + 1), after = even(pair + 2);
-      for (int c = 0; c < 2; ++c) odd.c[c] = Between(before.c[c], own.c[c], next.c[c], after.c[c]);
-    }
-    plain::StoreQuad(own, out + 32 * i);
-    plain::StoreQuad(odd, out + 32 * i + 16);
-  }
-}
-
 }  // namespace
 }  // namespace vexel
 #endif
@@ -111,26 +89,7 @@ void Yuyv32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
   RowLoop<kBlockPairs, 16, 4>(src, dst, PairsOf(count), NarrowBlock<kYuyv8Scale>());
 }
 
-// The even pixels of kVectorPairs pixel pairs, or the odd ones.
-HWY_INLINE F32 LoadEvenPixels(const uint8_t* HWY_RESTRICT p) {
-#if HWY_TARGET == HWY_AVX3
-  return F32{_mm512_shuffle_f32x4(LoadVector<float>(p, 0).raw, LoadVector<float>(p, 1).raw, 0x88)};
-#elif HWY_TARGET == HWY_AVX2
-  return F32{_mm256_permute2f128_ps(LoadVector<float>(p, 0).raw, LoadVector<float>(p, 1).raw, 0x20)};
-#else
-  return LoadVector<float>(p, 0);
-#endif
-}
-HWY_INLINE F32 LoadOddPixels(const uint8_t* HWY_RESTRICT p) {
-#if HWY_TARGET == HWY_AVX3
-  return F32{_mm512_shuffle_f32x4(LoadVector<float>(p, 0).raw, LoadVector<float>(p, 1).raw, 0xDD)};
-#elif HWY_TARGET == HWY_AVX2
-  return F32{_mm256_permute2f128_ps(LoadVector<float>(p, 0).raw, LoadVector<float>(p, 1).raw, 0x31)};
-#else
-  return LoadVector<float>(p, 1);
-#endif
-}
-
+// kVectorPairs pixel pairs from their even and their odd pixels.
 HWY_INLINE void StorePixelPairs(F32 even, F32 odd, uint8_t* HWY_RESTRICT p) {
 #if HWY_TARGET == HWY_AVX3
   const __m512i lower = _mm512_setr_epi64(0, 1, 8, 9, 2, 3, 10, 11),
@@ -147,16 +106,15 @@ HWY_INLINE void StorePixelPairs(F32 even, F32 odd, uint8_t* HWY_RESTRICT p) {
 #endif
 }
 
-// Between of all channels of four vectors.
-HWY_INLINE F32 VectorBetween(F32 before, F32 c0, F32 c1, F32 after) {
-  const FloatTag d;
+// Between of all lanes of four vectors.
+template <class V>
+HWY_INLINE V VectorBetween(V before, V c0, V c1, V after) {
+  const hn::DFromV<V> d;
   return hn::Mul(hn::Sub(hn::Mul(hn::Set(d, 9.0f), hn::Add(c0, c1)), hn::Add(before, after)), hn::Set(d, 0.0625f));
 }
 
 struct Interpolated {
-  static constexpr size_t kBefore = 1, kAfter = 2, kSrcPair = 16, kDstPair = 32;
-  static constexpr auto kExtend = ExtendPairs;
-  static size_t DstBytes(size_t count) { return 16 * count; }
+  static constexpr size_t kBefore = 1, kAfter = 2;
   static HWY_INLINE void Apply(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
     const auto own = LoadVector<float>(src);
     const auto between =
@@ -168,9 +126,7 @@ struct Interpolated {
 };
 
 struct Nearest {
-  static constexpr size_t kBefore = 0, kAfter = 0, kSrcPair = 16, kDstPair = 32;
-  static constexpr auto kExtend = ExtendPairs;
-  static size_t DstBytes(size_t count) { return 16 * count; }
+  static constexpr size_t kBefore = 0, kAfter = 0;
   static HWY_INLINE void Apply(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
     const auto own = LoadVector<float>(src);
     const auto even = PermuteChannels<2, 0, 1, 3>(own), odd = PermuteChannels<2, 0, 3, 3>(own);
@@ -178,48 +134,137 @@ struct Nearest {
   }
 };
 
-struct Filtered {
-  static constexpr size_t kBefore = 2, kAfter = 2, kSrcPair = 32, kDstPair = 16;
-  static constexpr auto kExtend = ExtendPixels;
-  static size_t DstBytes(size_t count) { return 16 * PairsOf(count); }
-  static HWY_INLINE void Apply(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
-    const FloatTag d;
-    const auto before2 = LoadEvenPixels(src - 64), before = LoadEvenPixels(src - 32), own = LoadEvenPixels(src);
-    const auto after = LoadEvenPixels(src + 32), after2 = LoadEvenPixels(src + 64);
-    const auto oddBefore = LoadOddPixels(src - 32), odd = LoadOddPixels(src);
-    const auto left = hn::Sub(VectorBetween(before2, before, own, after), oddBefore);
-    const auto right = hn::Sub(VectorBetween(before, own, after, after2), odd);
-    const auto chroma = hn::Sub(own, hn::Mul(hn::Add(left, right), hn::Set(d, 0.25f)));
-    const auto luma = hn::InterleaveUpper(d, own, odd);  // Y0 Y1 in the lower half
-    StoreVector(hn::InterleaveLower(d, hn::Shuffle2301(chroma), luma), dst);
-  }
-};
-
 // Calls Step::Apply for blocks of pairs that may look at their neighbours; where those are not in the row, on a copy
 // that continues beyond its ends.
 template <class Step>
-HWY_INLINE void NeighbourLoop(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
   constexpr size_t kBlock = kVectorPairs, kSeen = Step::kBefore + kBlock + Step::kAfter;
-  const size_t dstBytes = Step::DstBytes(count);
   for (size_t pair = 0; 2 * pair < count; pair += kBlock) {
     if (pair >= Step::kBefore)
-      for (; 2 * (pair + kBlock + Step::kAfter) <= count; pair += kBlock)
-        Step::Apply(src + pair * Step::kSrcPair, dst + pair * Step::kDstPair);
+      for (; 2 * (pair + kBlock + Step::kAfter) <= count; pair += kBlock) Step::Apply(src + 16 * pair, dst + 32 * pair);
     if (2 * pair >= count) break;
-    alignas(64) uint8_t in[kSeen * Step::kSrcPair];
-    alignas(64) uint8_t out[kBlock * Step::kDstPair];
-    Step::kExtend(src, count, static_cast<ptrdiff_t>(pair) - static_cast<ptrdiff_t>(Step::kBefore), kSeen, in);
-    Step::Apply(in + Step::kBefore * Step::kSrcPair, out);
-    const size_t at = pair * Step::kDstPair;
-    std::memcpy(dst + at, out, dstBytes - at < sizeof out ? dstBytes - at : sizeof out);
+    alignas(64) uint8_t in[16 * kSeen];
+    alignas(64) uint8_t out[32 * kBlock];
+    ExtendPairs(src, count, static_cast<ptrdiff_t>(pair) - static_cast<ptrdiff_t>(Step::kBefore), kSeen, in);
+    Step::Apply(in + 16 * Step::kBefore, out);
+    const size_t left = 16 * (count - 2 * pair);
+    std::memcpy(dst + 32 * pair, out, left < sizeof out ? left : sizeof out);
   }
 }
 
-void Uyvy32fToVuyx32f(const uint8_t* src, uint8_t* dst, size_t count) { NeighbourLoop<Interpolated>(src, dst, count); }
-void Uyvy32fToVuyx32fNearest(const uint8_t* src, uint8_t* dst, size_t count) {
-  NeighbourLoop<Nearest>(src, dst, count);
+void Uyvy32fToVuyx32f(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<Interpolated>(src, dst, count); }
+void Uyvy32fToVuyx32fNearest(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<Nearest>(src, dst, count); }
+
+// Channels 0 and 1 of the even and of the odd pixels of two pairs, or channels 2 and 3.
+struct PixelHalves {
+  hn::Vec128<float> even, odd;
+};
+template <bool kUpper>
+HWY_INLINE PixelHalves LoadHalves(const uint8_t* HWY_RESTRICT p) {
+#if HWY_TARGET <= HWY_AVX2
+  const auto* doubles = reinterpret_cast<const double*>(p);
+  const __m256d first = _mm256_loadu_pd(doubles), second = _mm256_loadu_pd(doubles + 4);
+  const __m256 both = _mm256_castpd_ps(kUpper ? _mm256_unpackhi_pd(first, second) : _mm256_unpacklo_pd(first, second));
+  return {hn::Vec128<float>{_mm256_castps256_ps128(both)}, hn::Vec128<float>{_mm256_extractf128_ps(both, 1)}};
+#else
+  const hn::Full128<double> d;
+  const hn::Full128<float> df;
+  const auto* doubles = reinterpret_cast<const double*>(p);
+  const auto join = [d](const double* first, const double* second) HWY_ATTR {
+    const auto a = hn::LoadU(d, first), b = hn::LoadU(d, second);
+    return kUpper ? hn::InterleaveUpper(d, a, b) : hn::InterleaveLower(d, a, b);
+  };
+  return {hn::BitCast(df, join(doubles, doubles + 4)), hn::BitCast(df, join(doubles + 2, doubles + 6))};
+#endif
 }
-void Vuyx32fToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) { NeighbourLoop<Filtered>(src, dst, count); }
+
+// Runs of a row in planes of V U V U ... that stay in the cache, so that every lane of the filter has work. The planes
+// have room for a last vector that is not full.
+class ChromaFilter {
+ public:
+  void Row(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+    const size_t pairs = PairsOf(count), wholePairs = count / 2;
+    if (count > 0) Move(src, Even(-1));
+    for (size_t first = 0; first < pairs; first += kRun, src += 32 * kRun, dst += 16 * kRun) {
+      mRun = pairs - first < kRun ? pairs - first : kRun;
+      mWhole = wholePairs - first < kRun ? wholePairs - first : kRun;
+      if (first > 0) {
+        Move(Even(kRun - 1), Even(-1));
+        Move(Detail(kRun - 1), Detail(-1));
+      }
+      Split(src);
+      for (size_t i = mRun; i < mRun + 2; ++i)
+        Move(src + 32 * (first + i < pairs ? i : pairs - 1 - first), Even(static_cast<ptrdiff_t>(i)));
+      Filter();
+      Join(src, dst);
+    }
+  }
+
+ private:
+  static constexpr size_t kRun = 64, kPair = 2 * sizeof(float), kSpare = HWY_MAX_BYTES;
+
+  uint8_t* Even(ptrdiff_t pair) { return mEven + kPair * static_cast<size_t>(pair + 1); }
+  uint8_t* Odd(ptrdiff_t pair) { return mOdd + kPair * static_cast<size_t>(pair); }
+  uint8_t* Detail(ptrdiff_t pair) { return mDetail + kPair * static_cast<size_t>(pair + 1); }
+  static void Move(const uint8_t* from, uint8_t* to) { std::memcpy(to, from, kPair); }
+
+  HWY_INLINE void Split(const uint8_t* HWY_RESTRICT src) {
+    const hn::Full128<float> d;
+    const size_t paired = mWhole / 2 * 2;
+    size_t i = 0;
+    for (; i < paired; i += 2) {
+      const PixelHalves chroma = LoadHalves<false>(src + 32 * i);
+      hn::StoreU(chroma.even, d, reinterpret_cast<float*>(Even(static_cast<ptrdiff_t>(i))));
+      hn::StoreU(chroma.odd, d, reinterpret_cast<float*>(Odd(static_cast<ptrdiff_t>(i))));
+    }
+    for (; i < mRun; ++i) {
+      Move(src + 32 * i, Even(static_cast<ptrdiff_t>(i)));
+      if (i < mWhole) Move(src + 32 * i + 16, Odd(static_cast<ptrdiff_t>(i)));
+    }
+  }
+
+  // Leaves the row's chroma where that of the odd pixels was.
+  HWY_INLINE void Filter() {
+    const size_t vectors = (mRun * kPair + HWY_MAX_BYTES - 1) / HWY_MAX_BYTES;
+    for (size_t i = 0; i < vectors; ++i) {
+      const auto middle = VectorBetween(LoadVector<float>(Even(-1), i), LoadVector<float>(Even(0), i),
+                                        LoadVector<float>(Even(1), i), LoadVector<float>(Even(2), i));
+      StoreVector(hn::Sub(middle, LoadVector<float>(mOdd, i)), Detail(0), i);
+    }
+    if (mWhole < mRun) std::memset(Detail(static_cast<ptrdiff_t>(mWhole)), 0, kPair);
+    const auto quarter = hn::Set(FloatTag(), 0.25f);
+    for (size_t i = 0; i < vectors; ++i) {
+      const auto details = hn::Add(LoadVector<float>(Detail(-1), i), LoadVector<float>(Detail(0), i));
+      StoreVector(hn::Sub(LoadVector<float>(Even(0), i), hn::Mul(details, quarter)), mOdd, i);
+    }
+  }
+
+  HWY_INLINE void Join(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
+    const hn::Full128<float> d;
+    const size_t paired = mWhole / 2 * 2;
+    size_t i = 0;
+    for (; i < paired; i += 2) {
+      const PixelHalves upper = LoadHalves<true>(src + 32 * i);
+      const auto luma = hn::OddEven(hn::DupEven(upper.odd), upper.even);
+      const auto chroma = hn::Shuffle2301(hn::LoadU(d, reinterpret_cast<const float*>(Odd(static_cast<ptrdiff_t>(i)))));
+      auto* out = reinterpret_cast<float*>(dst + 16 * i);
+      hn::StoreU(hn::InterleaveLower(d, chroma, luma), d, out);
+      hn::StoreU(hn::InterleaveUpper(d, chroma, luma), d, out + 4);
+    }
+    for (; i < mRun; ++i) {
+      const uint8_t* parts[4] = {mOdd + kPair * i + 4, src + 32 * i + 8, mOdd + kPair * i,
+                                 src + 32 * i + (i < mWhole ? 24 : 8)};
+      for (size_t c = 0; c < 4; ++c) std::memcpy(dst + 16 * i + 4 * c, parts[c], 4);
+    }
+  }
+
+  alignas(64) uint8_t mEven[kPair * (kRun + 3) + kSpare] = {};
+  alignas(64) uint8_t mOdd[kPair * kRun + kSpare] = {};
+  alignas(64) uint8_t mDetail[kPair * (kRun + 1) + kSpare] = {};
+  size_t mRun = 0, mWhole = 0;
+};
+
+void Vuyx32fToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) { ChromaFilter().Row(src, dst, count); }
 
 }  // namespace
 }  // namespace HWY_NAMESPACE
@@ -290,25 +335,28 @@ void Uyvy32fToVuyx32fNearest(const uint8_t* src, uint8_t* dst, size_t count) {
   }
 }
 
-// What interpolation gets wrong at the odd pixel of a pair, per chroma channel.
-Chroma Detail(const Quad* pairs) {
-  const auto detail = [pairs](int c) {
-    return Between(pairs[-2].c[c], pairs[0].c[c], pairs[2].c[c], pairs[4].c[c]) - pairs[1].c[c];
-  };
-  return {detail(0), detail(1)};
+// Channel `c` (V or U) of the even pixel of a pair, or the end's.
+float EvenChroma(const uint8_t* row, size_t pixels, ptrdiff_t pair, size_t c) {
+  const auto last = static_cast<ptrdiff_t>(PairsOf(pixels)) - 1;
+  return LoadQuad(row + 32 * (pair < 0 ? 0 : pair > last ? last : pair)).c[c];
+}
+
+// What interpolation gets wrong at the odd pixel of a pair; nothing where there is none.
+float Detail(const uint8_t* row, size_t pixels, ptrdiff_t pair, size_t c) {
+  if (pair < 0 || 2 * static_cast<size_t>(pair) + 1 >= pixels) return 0.0f;
+  const auto even = [=](ptrdiff_t offset) { return EvenChroma(row, pixels, pair + offset, c); };
+  return Between(even(-1), even(0), even(1), even(2)) - LoadQuad(row + 32 * pair + 16).c[c];
 }
 
 void Vuyx32fToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) {
   for (size_t i = 0; i < PairsOf(count); ++i) {
-    uint8_t bytes[5 * 32];
-    ExtendPixels(src, count, static_cast<ptrdiff_t>(i) - 2, 5, bytes);
-    Quad near[10];
-    std::memcpy(near, bytes, sizeof near);
-    const Quad *even = near + 4, *odd = even + 1;
-    const Chroma left = Detail(even - 2), right = Detail(even);
-    StoreQuad(
-        {{even->c[1] - (left.u + right.u) * 0.25f, even->c[2], even->c[0] - (left.v + right.v) * 0.25f, odd->c[2]}},
-        dst + 16 * i);
+    const auto chroma = [=](size_t c) {
+      const auto pair = static_cast<ptrdiff_t>(i);
+      return EvenChroma(src, count, pair, c) - (Detail(src, count, pair - 1, c) + Detail(src, count, pair, c)) * 0.25f;
+    };
+    const float luma = LoadQuad(src + 32 * i).c[2];
+    StoreQuad({{chroma(1), luma, chroma(0), 2 * i + 1 < count ? LoadQuad(src + 32 * i + 16).c[2] : luma}},
+              dst + 16 * i);
   }
 }
 

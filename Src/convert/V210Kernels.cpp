@@ -100,9 +100,11 @@ template <size_t kBlock, size_t kSrcGroup, size_t kDstGroup, size_t kSrcOver, si
 HWY_INLINE void GroupLoop(const uint8_t* HWY_RESTRICT src, size_t srcBytes, uint8_t* HWY_RESTRICT dst, size_t dstBytes,
                           const Body& body) {
   constexpr size_t kSrcBlock = kBlock * kSrcGroup, kDstBlock = kBlock * kDstGroup;
-  size_t s = 0, d = 0;
-  for (; s + kSrcBlock + kSrcOver <= srcBytes && d + kDstBlock + kDstOver <= dstBytes; s += kSrcBlock, d += kDstBlock)
-    body(src + s, dst + d);
+  const size_t srcBlocks = srcBytes < kSrcOver ? 0 : (srcBytes - kSrcOver) / kSrcBlock;
+  const size_t dstBlocks = dstBytes < kDstOver ? 0 : (dstBytes - kDstOver) / kDstBlock;
+  const size_t blocks = srcBlocks < dstBlocks ? srcBlocks : dstBlocks;
+  for (size_t i = 0; i < blocks; ++i) body(src + i * kSrcBlock, dst + i * kDstBlock);
+  size_t s = blocks * kSrcBlock, d = blocks * kDstBlock;
   for (; d < dstBytes; s += kSrcBlock, d += kDstBlock) {
     alignas(64) uint8_t in[kSrcBlock + kSrcOver];
     alignas(64) uint8_t out[kDstBlock + kDstOver];
@@ -114,23 +116,48 @@ HWY_INLINE void GroupLoop(const uint8_t* HWY_RESTRICT src, size_t srcBytes, uint
   }
 }
 
-// The 12 bytes of each group at the front of a block of 16, and back.
-HWY_INLINE U8 SpreadGroups(U8 v) {
+// Between groups of 12 bytes and vectors with each group at the front of a block of 16. The widest target takes four
+// vectors at once, so that no load or store straddles a cache line of its own making; the others reach over the groups.
 #if HWY_TARGET == HWY_AVX3
-  return U8{_mm512_permutexvar_epi32(_mm512_setr_epi32(0, 1, 2, 3, 3, 4, 5, 6, 6, 7, 8, 9, 9, 10, 11, 12), v.raw)};
-#elif HWY_TARGET == HWY_AVX2
-  return U8{_mm256_permutevar8x32_epi32(v.raw, _mm256_setr_epi32(0, 1, 2, 3, 3, 4, 5, 6))};
+constexpr size_t kByteVectors = 4, kByteOver = 0;
 #else
-  return v;
+constexpr size_t kByteVectors = 1, kByteOver = 4 * kVectorGroups;
+#endif
+constexpr size_t kByteGroups = kByteVectors * kVectorGroups;
+
+HWY_INLINE void LoadGroups(const uint8_t* HWY_RESTRICT src, U8* HWY_RESTRICT v) {
+#if HWY_TARGET == HWY_AVX3
+  const __m512i a = LoadVector<uint8_t>(src, 0).raw, b = LoadVector<uint8_t>(src, 1).raw;
+  const __m512i c = LoadVector<uint8_t>(src, 2).raw;
+  const __m512i first = _mm512_setr_epi32(0, 1, 2, 3, 3, 4, 5, 6, 6, 7, 8, 9, 9, 10, 11, 12);
+  const __m512i second = _mm512_add_epi32(first, _mm512_set1_epi32(12));
+  const __m512i third = _mm512_add_epi32(first, _mm512_set1_epi32(8));
+  const __m512i last = _mm512_add_epi32(first, _mm512_set1_epi32(4));
+  v[0] = U8{_mm512_permutexvar_epi32(first, a)};
+  v[1] = U8{_mm512_permutex2var_epi32(a, second, b)};
+  v[2] = U8{_mm512_permutex2var_epi32(b, third, c)};
+  v[3] = U8{_mm512_permutexvar_epi32(last, c)};
+#elif HWY_TARGET == HWY_AVX2
+  const __m256i order = _mm256_setr_epi32(0, 1, 2, 3, 3, 4, 5, 6);
+  v[0] = U8{_mm256_permutevar8x32_epi32(LoadVector<uint8_t>(src).raw, order)};
+#else
+  v[0] = LoadVector<uint8_t>(src);
 #endif
 }
-HWY_INLINE U8 GatherGroups(U8 v) {
+
+HWY_INLINE void StoreGroups(const U8* HWY_RESTRICT v, uint8_t* HWY_RESTRICT dst) {
 #if HWY_TARGET == HWY_AVX3
-  return U8{_mm512_permutexvar_epi32(_mm512_setr_epi32(0, 1, 2, 4, 5, 6, 8, 9, 10, 12, 13, 14, 3, 7, 11, 15), v.raw)};
+  const __m512i first = _mm512_setr_epi32(0, 1, 2, 4, 5, 6, 8, 9, 10, 12, 13, 14, 16, 17, 18, 20);
+  const __m512i second = _mm512_setr_epi32(5, 6, 8, 9, 10, 12, 13, 14, 16, 17, 18, 20, 21, 22, 24, 25);
+  const __m512i third = _mm512_setr_epi32(10, 12, 13, 14, 16, 17, 18, 20, 21, 22, 24, 25, 26, 28, 29, 30);
+  StoreVector(U8{_mm512_permutex2var_epi32(v[0].raw, first, v[1].raw)}, dst, 0);
+  StoreVector(U8{_mm512_permutex2var_epi32(v[1].raw, second, v[2].raw)}, dst, 1);
+  StoreVector(U8{_mm512_permutex2var_epi32(v[2].raw, third, v[3].raw)}, dst, 2);
 #elif HWY_TARGET == HWY_AVX2
-  return U8{_mm256_permutevar8x32_epi32(v.raw, _mm256_setr_epi32(0, 1, 2, 4, 5, 6, 3, 7))};
+  const __m256i order = _mm256_setr_epi32(0, 1, 2, 4, 5, 6, 3, 7);
+  StoreVector(U8{_mm256_permutevar8x32_epi32(v[0].raw, order)}, dst);
 #else
-  return v;
+  StoreVector(v[0], dst);
 #endif
 }
 
@@ -140,45 +167,62 @@ HWY_INLINE Full<T> Repeat(const T* lanes) {
 }
 
 struct PackBytes {
-  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+  static HWY_INLINE U32 Pack(U8 groups) {
     static constexpr uint8_t Z = 0x80;
     alignas(16) static constexpr uint8_t kOuter[16] = {0, Z, 2, Z, 3, Z, 5, Z, 6, Z, 8, Z, 9, Z, 11, Z};
     alignas(16) static constexpr uint8_t kMiddle[16] = {Z, 1, Z, Z, Z, 4, Z, Z, Z, 7, Z, Z, Z, 10, Z, Z};
     alignas(16) static constexpr uint16_t kShift[8] = {4, 64, 4, 64, 4, 64, 4, 64};
     const hn::ScalableTag<uint16_t> d16;
     const hn::ScalableTag<uint32_t> d32;
-    const auto groups = SpreadGroups(LoadVector<uint8_t>(in));
     const auto outer = hn::BitCast(d16, hn::TableLookupBytesOr0(groups, Repeat(kOuter)));
     const auto middle = hn::BitCast(d32, hn::TableLookupBytesOr0(groups, Repeat(kMiddle)));
-    StoreVector(hn::Or(hn::BitCast(d32, hn::Mul(outer, Repeat(kShift))), hn::ShiftLeft<4>(middle)), out);
+    return hn::Or(hn::BitCast(d32, hn::Mul(outer, Repeat(kShift))), hn::ShiftLeft<4>(middle));
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    U8 groups[kByteVectors];
+    LoadGroups(in, groups);
+    StoreVector(Pack(groups[0]), out, 0);
+    if constexpr (kByteVectors == 4) {  // by hand: as a loop the vectors would go through memory
+      StoreVector(Pack(groups[1]), out, 1);
+      StoreVector(Pack(groups[2]), out, 2);
+      StoreVector(Pack(groups[3]), out, 3);
+    }
   }
 };
 
 void Uyvy8ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kVectorGroups, 12, 16, 4 * kVectorGroups, 0, kBlackUyvy8>(src, 4 * PairsOf(count), dst,
-                                                                      16 * GroupsOf(count), PackBytes());
+  GroupLoop<kByteGroups, 12, 16, kByteOver, 0, kBlackUyvy8>(src, 4 * PairsOf(count), dst, 16 * GroupsOf(count),
+                                                            PackBytes());
 }
 
 struct UnpackBytes {
-  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+  static HWY_INLINE U8 Unpack(U32 words) {
     alignas(16) static constexpr uint8_t kOrder[16] = {0, 8, 1, 2, 10, 3, 4, 12, 5, 6, 14, 7, 9, 11, 13, 15};
     // A rounded product with 2^13 is a rounded shift by 2; the third sample stands 4 bits higher.
     alignas(16) static constexpr int16_t kShift[8] = {1 << 13, 1 << 9, 1 << 13, 1 << 9,
                                                       1 << 13, 1 << 9, 1 << 13, 1 << 9};
     const hn::ScalableTag<int16_t> d16;
     const hn::ScalableTag<uint32_t> d32;
-    const auto words = LoadVector<uint32_t>(in);
     const auto outer = hn::BitCast(d16, hn::And(words, hn::Set(d32, 0x3FF003FF)));
     const auto middle = hn::BitCast(d16, hn::And(hn::ShiftRight<10>(words), hn::Set(d32, 0x3FF)));
     const auto shift = Repeat(kShift);
     const auto bytes = PackBlocks(hn::MulFixedPoint15(outer, shift), hn::MulFixedPoint15(middle, shift));
-    StoreVector(GatherGroups(hn::TableLookupBytes(bytes, Repeat(kOrder))), out);
+    return hn::TableLookupBytes(bytes, Repeat(kOrder));
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    U8 groups[kByteVectors];
+    groups[0] = Unpack(LoadVector<uint32_t>(in, 0));
+    if constexpr (kByteVectors == 4) {
+      groups[1] = Unpack(LoadVector<uint32_t>(in, 1));
+      groups[2] = Unpack(LoadVector<uint32_t>(in, 2));
+      groups[3] = Unpack(LoadVector<uint32_t>(in, 3));
+    }
+    StoreGroups(groups, out);
   }
 };
 
 void V210ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) {
-  GroupLoop<kVectorGroups, 16, 12, 0, 4 * kVectorGroups, 0>(src, 16 * GroupsOf(count), dst, 4 * PairsOf(count),
-                                                            UnpackBytes());
+  GroupLoop<kByteGroups, 16, 12, 0, kByteOver, 0>(src, 16 * GroupsOf(count), dst, 4 * PairsOf(count), UnpackBytes());
 }
 
 // Two groups at a time, one per block; the wider targets gain nothing from four.

@@ -45,87 +45,138 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
 
+// Four vectors of pixels as planes, one vector per channel in memory order. Lane k of block i is pixel i of vector k,
+// which is what transposing every block by itself gives.
+struct Planes {
+  F32 c0, c1, c2, c3;
+};
+
+HWY_INLINE F32 JoinLower(F32 a, F32 b) {
+  const hn::ScalableTag<double> d;
+  return hn::BitCast(FloatTag(), hn::InterleaveLower(d, hn::BitCast(d, a), hn::BitCast(d, b)));
+}
+HWY_INLINE F32 JoinUpper(F32 a, F32 b) {
+  const hn::ScalableTag<double> d;
+  return hn::BitCast(FloatTag(), hn::InterleaveUpper(d, hn::BitCast(d, a), hn::BitCast(d, b)));
+}
+
+// Its own inverse.
+HWY_INLINE Planes Transpose(const Planes& v) {
+  const FloatTag d;
+  const auto lower01 = hn::InterleaveLower(d, v.c0, v.c1), upper01 = hn::InterleaveUpper(d, v.c0, v.c1);
+  const auto lower23 = hn::InterleaveLower(d, v.c2, v.c3), upper23 = hn::InterleaveUpper(d, v.c2, v.c3);
+  return {JoinLower(lower01, lower23), JoinUpper(lower01, lower23), JoinLower(upper01, upper23),
+          JoinUpper(upper01, upper23)};
+}
+
 struct Float {
   static constexpr size_t kBytes = 16;
-  static HWY_INLINE F32 Load(const uint8_t* HWY_RESTRICT src, size_t index) { return LoadVector<float>(src, index); }
-  static HWY_INLINE void Store(F32 a, F32 b, F32 c, F32 d, uint8_t* HWY_RESTRICT dst) {
-    StoreVector(a, dst, 0);
-    StoreVector(b, dst, 1);
-    StoreVector(c, dst, 2);
-    StoreVector(d, dst, 3);
+  static HWY_INLINE Planes Load(const uint8_t* HWY_RESTRICT src) {
+    return Transpose(
+        {LoadVector<float>(src, 0), LoadVector<float>(src, 1), LoadVector<float>(src, 2), LoadVector<float>(src, 3)});
+  }
+  static HWY_INLINE void Store(const Planes& planes, uint8_t* HWY_RESTRICT dst) {
+    const Planes pixels = Transpose(planes);
+    StoreVector(pixels.c0, dst, 0);
+    StoreVector(pixels.c1, dst, 1);
+    StoreVector(pixels.c2, dst, 2);
+    StoreVector(pixels.c3, dst, 3);
   }
 };
 
 struct Vuya8 {
   static constexpr size_t kBytes = 4;
-  static HWY_INLINE F32 Load(const uint8_t* HWY_RESTRICT src, size_t index) {
-    return WidenCodes<kVuya8Scale>(src + index * kLanes<float>);
+
+  template <int kChannel>
+  static HWY_INLINE F32 ToFloat(I32 codes) {
+    const hn::RebindToSigned<FloatTag> di;
+    const auto zeroBased = hn::Sub(codes, hn::Set(di, kVuya8Scale.zero[kChannel]));
+    return hn::Mul(hn::ConvertTo(FloatTag(), zeroBased), hn::Set(FloatTag(), kVuya8Scale.toFloat[kChannel]));
   }
-  static HWY_INLINE void Store(F32 a, F32 b, F32 c, F32 d, uint8_t* HWY_RESTRICT dst) {
-    StoreVector(PackTo8(ScaleToCodes<kVuya8Scale>(a), ScaleToCodes<kVuya8Scale>(b), ScaleToCodes<kVuya8Scale>(c),
-                        ScaleToCodes<kVuya8Scale>(d)),
-                dst);
+  template <int kChannel>
+  static HWY_INLINE I32 ToCodes(F32 v) {
+    const FloatTag d;
+    return ConvertNearest(
+        hn::Add(hn::Mul(v, hn::Set(d, kVuya8Scale.fromFloat[kChannel])), hn::Set(d, kVuya8Scale.offset[kChannel])));
+  }
+
+  static HWY_INLINE Planes Load(const uint8_t* HWY_RESTRICT src) {
+    const hn::ScalableTag<uint32_t> du;
+    const hn::RebindToSigned<FloatTag> di;
+    const auto pixels = UnorderPacked4(LoadVector<uint32_t>(src));
+    const auto byte = hn::Set(du, 0xFF);
+    return {ToFloat<0>(hn::BitCast(di, hn::And(pixels, byte))),
+            ToFloat<1>(hn::BitCast(di, hn::And(hn::ShiftRight<8>(pixels), byte))),
+            ToFloat<2>(hn::BitCast(di, hn::And(hn::ShiftRight<16>(pixels), byte))),
+            ToFloat<3>(hn::BitCast(di, hn::ShiftRight<24>(pixels)))};
+  }
+  static HWY_INLINE void Store(const Planes& planes, uint8_t* HWY_RESTRICT dst) {
+    alignas(16) static constexpr uint8_t kByPixel[16] = {0, 4, 8, 12, 1, 5, 9, 13, 2, 6, 10, 14, 3, 7, 11, 15};
+    const hn::ScalableTag<int16_t> d16;
+    const auto channels = PackBlocks(hn::ReorderDemote2To(d16, ToCodes<0>(planes.c0), ToCodes<1>(planes.c1)),
+                                     hn::ReorderDemote2To(d16, ToCodes<2>(planes.c2), ToCodes<3>(planes.c3)));
+    const hn::ScalableTag<uint8_t> d8;
+    StoreVector(OrderPacked4(hn::TableLookupBytes(channels, hn::LoadDup128(d8, kByPixel))), dst);
+  }
+
+ private:
+  // The inverse of OrderPacked4.
+  static HWY_INLINE U32 UnorderPacked4(U32 v) {
+#if HWY_TARGET == HWY_AVX2
+    return U32{_mm256_permutevar8x32_epi32(v.raw, _mm256_setr_epi32(0, 2, 4, 6, 1, 3, 5, 7))};
+#else
+    const hn::ScalableTag<uint8_t> d8;
+    return hn::BitCast(hn::ScalableTag<uint32_t>(), OrderPacked4(hn::BitCast(d8, v)));  // a square, or nothing
+#endif
   }
 };
 
-constexpr Channels MakeChannels(double c0, double c1, double c2) {
-  return {{static_cast<float>(c0), static_cast<float>(c1), static_cast<float>(c2), 0.0f}};
+HWY_INLINE F32 Times(double coefficient, F32 v) {
+  return hn::Mul(hn::Set(FloatTag(), static_cast<float>(coefficient)), v);
 }
 
-// The matrix steps leave the fourth channel undefined. They broadcast each source channel over its pixel and multiply
-// it with its column of the matrix, which costs fewer shuffles than transposing pixels to planes and back. Subtracting
-// a product is adding that of the negated coefficient.
+// The steps leave the fourth channel alone.
 template <const YuvMatrix& kM>
 struct ToYuv {
-  static HWY_INLINE F32 Apply(F32 bgra) {
-    static constexpr Channels kR = MakeChannels(kM.vR, kM.uR, kM.yR);
-    static constexpr Channels kG = MakeChannels(kM.vG, kM.uG, kM.yG);
-    static constexpr Channels kB = MakeChannels(kM.vB, kM.uB, kM.yB);
-    const auto r = hn::Mul(hn::Broadcast<2>(bgra), kR.Vector());
-    const auto g = hn::Mul(hn::Broadcast<1>(bgra), kG.Vector());
-    const auto b = hn::Mul(hn::Broadcast<0>(bgra), kB.Vector());
-    return hn::Add(hn::Add(r, g), b);
+  static HWY_INLINE Planes Apply(const Planes& bgra) {
+    const F32 b = bgra.c0, g = bgra.c1, r = bgra.c2;
+    return {hn::Add(hn::Add(Times(kM.vR, r), Times(kM.vG, g)), Times(kM.vB, b)),
+            hn::Add(hn::Add(Times(kM.uR, r), Times(kM.uG, g)), Times(kM.uB, b)),
+            hn::Add(hn::Add(Times(kM.yR, r), Times(kM.yG, g)), Times(kM.yB, b)), bgra.c3};
   }
 };
 
-// No zero coefficients here: zero times infinity would leak NaN into channels that do not use the factor.
 template <const YuvMatrix& kM>
 struct ToBgr {
-  static HWY_INLINE F32 Apply(F32 vuya) {
-    static constexpr Channels kFirst = MakeChannels(kM.bU, kM.gU, kM.rV);
-    static constexpr Channels kSecond = MakeChannels(0, kM.gV, 0);
-    const auto uuv = PermuteChannels<1, 1, 0, 3>(vuya);
-    const auto oneTerm = hn::Add(hn::Broadcast<2>(vuya), hn::Mul(uuv, kFirst.Vector()));
-    const auto twoTerms = hn::Add(oneTerm, hn::Mul(hn::Broadcast<0>(vuya), kSecond.Vector()));
-    return TakeChannels<2>(oneTerm, twoTerms);
+  static HWY_INLINE Planes Apply(const Planes& vuya) {
+    const F32 v = vuya.c0, u = vuya.c1, y = vuya.c2;
+    return {hn::Add(y, Times(kM.bU, u)), hn::Add(hn::Add(y, Times(kM.gU, u)), Times(kM.gV, v)),
+            hn::Add(y, Times(kM.rV, v)), vuya.c3};
   }
 };
 
 template <const YuvRecoding& kR>
 struct RecodeYuv {
-  static HWY_INLINE F32 Apply(F32 vuya) {
-    static constexpr Channels kU = MakeChannels(kR.vU, kR.uU, kR.yU);
-    static constexpr Channels kV = MakeChannels(kR.vV, kR.uV, kR.yV);
-    const auto chroma =
-        hn::Add(hn::Mul(hn::Broadcast<1>(vuya), kU.Vector()), hn::Mul(hn::Broadcast<0>(vuya), kV.Vector()));
-    return TakeChannels<4>(chroma, hn::Add(chroma, vuya));
+  static HWY_INLINE Planes Apply(const Planes& vuya) {
+    const F32 v = vuya.c0, u = vuya.c1, y = vuya.c2;
+    return {hn::Add(Times(kR.vU, u), Times(kR.vV, v)), hn::Add(Times(kR.uU, u), Times(kR.uV, v)),
+            hn::Add(hn::Add(Times(kR.yU, u), Times(kR.yV, v)), y), vuya.c3};
   }
 };
 
 template <class Source, class Step, class Destination, bool kOpaque>
 struct MatrixBlock {
-  static constexpr size_t kPixels = 4 * kVectorPixels;
   HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
-    const F32 a = Source::Load(in, 0), b = Source::Load(in, 1), c = Source::Load(in, 2), d = Source::Load(in, 3);
-    Destination::Store(FinishAlpha<kOpaque>(Step::Apply(a), a), FinishAlpha<kOpaque>(Step::Apply(b), b),
-                       FinishAlpha<kOpaque>(Step::Apply(c), c), FinishAlpha<kOpaque>(Step::Apply(d), d), out);
+    Planes pixels = Step::Apply(Source::Load(in));
+    if (kOpaque) pixels.c3 = hn::Set(FloatTag(), 1.0f);
+    Destination::Store(pixels, out);
   }
 };
 
-#define VX_VECTOR_KERNEL(name, Source, Step, Destination, opaque)                           \
-  void name(const uint8_t* src, uint8_t* dst, size_t count) {                               \
-    using Block = MatrixBlock<Source, Step, Destination, opaque>;                           \
-    RowLoop<Block::kPixels, Source::kBytes, Destination::kBytes>(src, dst, count, Block()); \
+#define VX_VECTOR_KERNEL(name, Source, Step, Destination, opaque)                              \
+  void name(const uint8_t* src, uint8_t* dst, size_t count) {                                  \
+    using Block = MatrixBlock<Source, Step, Destination, opaque>;                              \
+    RowLoop<4 * kVectorPixels, Source::kBytes, Destination::kBytes>(src, dst, count, Block()); \
   }
 VX_YUV_MATRIX_KERNELS(VX_VECTOR_KERNEL)
 #undef VX_VECTOR_KERNEL
