@@ -26,9 +26,11 @@ struct TopDown {
 constexpr int32_t kStreamPixels = 1024;
 static_assert(kStreamPixels % 2 == 0);
 
+// A destination that the cache cannot hold. One that just fits is written faster through the cache: the decoder does
+// enough work per byte to hide what that costs.
 bool GoesPastCache(const TopDown& dst) noexcept {
   const uint32_t cache = VX_GetCacheSize();
-  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= static_cast<int64_t>(cache / 2);
+  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= int64_t{cache};
 }
 
 // What the decoder makes for a destination: its own format if it can, else one on the way that loses least. 8-bit RGB

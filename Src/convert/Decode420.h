@@ -88,7 +88,7 @@ class Rows420 {
   decode420::ResampleRow mResample = nullptr;
   decode420::MakePixels mMakePixels = nullptr;
   decode420::Matrix mMatrix{};
-  bool mHalfChroma = true, mLumaFromSource = true;
+  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false;
 
   // Scratch: averaged rows, resampled ones, a row or two on their way, sums, and what is being averaged.
   uint16_t *mY = nullptr, *mU = nullptr, *mV = nullptr;
@@ -101,8 +101,8 @@ class Rows420 {
   // The chroma rows behind mU and mV, where single lines are decoded: lines that share them need them once.
   Tap mHeld[2] = {{-1, 0}, {-1, 0}};
   // What Pixels reads.
-  const uint8_t* mRowY = nullptr;
-  const uint16_t *mRowU = nullptr, *mRowV = nullptr;
+  const uint8_t *mRowY = nullptr, *mRowU = nullptr, *mRowV = nullptr;
+  ptrdiff_t mLumaBytes = 1, mChromaBytes = 2;  // per pixel; per two or, where not halved, per pixel
 };
 
 }  // namespace vexel

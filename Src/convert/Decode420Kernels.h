@@ -50,13 +50,14 @@ struct Matrix {
   int16_t chroma[3][2];  // of each channel, for (U, V)
 };
 
-// `count` pixels from samples at the pixels' resolution ("Full") or chroma at half of it, interpolated or nearest. The
-// fourth channel is written opaque. `y` is bytes, or 16-bit samples ("Wide", "Full"); interpolation reads one chroma
-// sample more than there are pairs.
-using MakePixels = void (*)(const void* y, const uint16_t* u, const uint16_t* v, const Matrix& matrix, uint8_t* dst,
+// `count` pixels of a row. Luma is bytes, or 16-bit samples ("wide", "full"). Chroma is 16-bit samples at half the
+// resolution, the nearest ones or interpolated (which reads one sample more than there are pairs of pixels), or at the
+// pixels' own ("full"); or of a picture's own rows and nearest: bytes, or pairs of them, then all in `u`. The fourth
+// channel is written opaque.
+using MakePixels = void (*)(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst,
                             size_t count);
 struct PixelKernels {
-  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full;
+  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full, bytes, pairs, swappedPairs;
 };
 extern const PixelKernels kToBgrx, kToVuyx;
 

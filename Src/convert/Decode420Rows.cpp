@@ -73,12 +73,19 @@ void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   mLumaFromSource = mHalfChroma && mLines == 1;
   if (mRatio != HorizontalRatio::None)
     mResample = (mRatio == HorizontalRatio::FourThirds ? kFourThirds : kThreeHalves)[mVariant];
-  const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
+  // The nearest bytes need no stage of their own, if none is missing.
+  mChromaFromSource = mLumaFromSource && !mLinear && !wide && ChromaWidth(mSrc) == (int64_t{mSrc.width} + 1) / 2;
   const bool wideLuma = wide || !mLumaFromSource;
-  mMakePixels = (!mHalfChroma ? pixels.full
-                 : wideLuma   ? mLinear ? pixels.wideLinear : pixels.wideNearest
-                 : mLinear    ? pixels.linear
-                              : pixels.nearest)[mVariant];
+  mLumaBytes = wideLuma ? 2 : 1;
+  mChromaBytes = mChromaFromSource && !pairs ? 1 : 2;
+  const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
+  mMakePixels = (!mHalfChroma        ? pixels.full
+                 : mChromaFromSource ? !pairs                    ? pixels.bytes
+                                       : IsReversed(mSrc.format) ? pixels.swappedPairs
+                                                                 : pixels.pairs
+                 : wideLuma          ? mLinear ? pixels.wideLinear : pixels.wideNearest
+                 : mLinear           ? pixels.linear
+                                     : pixels.nearest)[mVariant];
   mMatrix = MakeMatrix420(mSrc.format, format);
 }
 
@@ -95,8 +102,8 @@ size_t Rows420::PlaceRows(uint8_t* scratch) noexcept {
   };
   const auto width = static_cast<size_t>(mSrc.width), chroma = width / 2 + 1;
   if (!mLumaFromSource) placeRow(mY, width);
-  placeRow(mU, chroma);
-  placeRow(mV, chroma);
+  if (!mChromaFromSource)
+    for (uint16_t** row : {&mU, &mV}) placeRow(*row, chroma);
   if (mResample)
     for (uint16_t** row : {&mWideY, &mWideU, &mWideV}) placeRow(*row, static_cast<size_t>(mWidth));
   if (mResample || mLines > 1) {
@@ -215,12 +222,18 @@ const uint16_t* Rows420::ResampleChroma(uint16_t* samples, uint16_t* resampled) 
 void Rows420::MakeChroma(int32_t row) noexcept {
   mTapCount = 0;
   for (int32_t i = 0; i < mLines; ++i) AddChromaTaps(LineOf(row, i));
+  const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
+  if (mChromaFromSource) {
+    mRowU = mSrc.planes[1] + mTaps[0].row * mSrc.rowBytes[1];
+    mRowV = pairs ? mRowU : mSrc.planes[2] + mTaps[0].row * mSrc.rowBytes[2];
+    if (reversed && !pairs) std::swap(mRowU, mRowV);
+    return;
+  }
   if (mLines == 1) {
     const Tap taps[2] = {mTaps[0], mTapCount > 1 ? mTaps[1] : Tap{mTaps[0].row, 0}};
     if (std::equal(taps, taps + 2, mHeld)) return;
     std::copy(taps, taps + 2, mHeld);
   }
-  const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
   uint16_t* const out[2] = {reversed ? mV : mU, reversed ? mU : mV};
   const auto samples = static_cast<size_t>(ChromaWidth(mSrc));
   const uint64_t total = uint64_t{kLineWeight} * static_cast<uint64_t>(mLines);
@@ -230,8 +243,8 @@ void Rows420::MakeChroma(int32_t row) noexcept {
     MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], nullptr}, samples}, total);
     MeanOfRows({mSrc.planes[2], mSrc.rowBytes[2], mMixChroma, {out[1], nullptr}, samples}, total);
   }
-  mRowU = ResampleChroma(mU, mWideU);
-  mRowV = ResampleChroma(mV, mWideV);
+  mRowU = reinterpret_cast<const uint8_t*>(ResampleChroma(mU, mWideU));
+  mRowV = reinterpret_cast<const uint8_t*>(ResampleChroma(mV, mWideV));
 }
 
 void Rows420::BeginRow(int32_t row) noexcept {
@@ -240,10 +253,8 @@ void Rows420::BeginRow(int32_t row) noexcept {
 }
 
 void Rows420::Pixels(int32_t first, int32_t count, uint8_t* dst) const noexcept {
-  const bool wideLuma = HasWideSamples(mSrc.format) || !mLumaFromSource;
-  const ptrdiff_t chroma = mHalfChroma ? first / 2 : first;
-  mMakePixels(mRowY + (wideLuma ? 2 * ptrdiff_t{first} : first), mRowU + chroma, mRowV + chroma, mMatrix, dst,
-              static_cast<size_t>(count));
+  const ptrdiff_t chroma = (mHalfChroma ? first / 2 : first) * mChromaBytes;
+  mMakePixels(mRowY + first * mLumaBytes, mRowU + chroma, mRowV + chroma, mMatrix, dst, static_cast<size_t>(count));
 }
 
 }  // namespace vexel

@@ -151,8 +151,8 @@ TEST(Decode420, MatricesOverAllCodes) {
       double worst = 0;
       for (int u = 0; u < 256; u += all ? 1 : 5)
         for (int v = 0; v < 256; v += all ? 1 : 5) {
-          const std::vector<uint16_t> us(256 + 64, static_cast<uint16_t>(u << 8)), vs(us.size(), v << 8);
-          kernels.nearest[ActiveKernelVariant()](luma.data(), us.data(), vs.data(), matrix, pixels.data(), 256);
+          const std::vector<uint8_t> us(128, static_cast<uint8_t>(u)), vs(128, static_cast<uint8_t>(v));
+          kernels.bytes[ActiveKernelVariant()](luma.data(), us.data(), vs.data(), matrix, pixels.data(), 256);
           const auto black = ToCodes({0, double(u), double(v)}, src, dst), step = ToCodes({1, 128, 128}, src, dst),
                      zero = ToCodes({0, 128, 128}, src, dst);
           for (int y = 0; y < 256; ++y)
@@ -301,7 +301,7 @@ TEST(Decode420, EveryRasterFormat) {
 
 // Destinations larger than the cache take another way to memory.
 TEST(Decode420, LargeDestinations) {
-  const int width = 3001, height = static_cast<int>(VX_GetCacheSize() / 2 / 4 / width) + 3;
+  const int width = 3001, height = static_cast<int>(VX_GetCacheSize() / 4 / width) + 3;
   Block420 src(F::YUV_420_MPEG4_FRAME_709, width, height);
   src.Randomize(6);
   std::vector<uint8_t> dst(static_cast<size_t>(width) * height * 4 + 1), row(width * 4);

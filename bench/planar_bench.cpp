@@ -1,0 +1,169 @@
+// 4:2:0 decoding and encoding of whole frames, one thread, beside libyuv and swscale.
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <string>
+
+#include "convert/Planar420.h"
+#include "support/Bench.h"
+#include "support/Swscale.h"
+#include "vexel/host_types.h"
+
+#ifdef VEXEL_PEER_YUV
+#include <libyuv.h>
+#endif
+
+namespace {
+
+using namespace vexel;
+using namespace vexel::bench;
+using F = VX_PixelFormat;
+
+struct Size {
+  const char* name;
+  int width, height;
+};
+constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
+
+struct Block {
+  Block(F f, Size s) : format(f), size(s), memory(static_cast<size_t>(VX_PixelFormatSize(f, s.width, s.height))) {
+    memory.FillBytes();
+    VX_GetPlanarBuffers(memory.data(), f, s.width, s.height, planes, rowBytes);
+  }
+  const uint8_t* plane(int i) const { return static_cast<const uint8_t*>(planes[i]); }
+  // Bytes of the picture itself.
+  size_t pixelBytes() const {
+    return static_cast<size_t>(size.width) * size.height * 3 / 2 * (HasWideSamples(format) ? 2 : 1);
+  }
+  F format;
+  Size size;
+  Memory memory;
+  void* planes[3];
+  int32_t rowBytes[3];
+};
+
+void Check(VX_Result result, const std::string& what) {
+  if (result == VX_Success) return;
+  std::fprintf(stderr, "benchmark set-up failed: %s (%s)\n", what.c_str(), VX_ResultName(result));
+  std::exit(1);
+}
+
+struct Job {
+  std::shared_ptr<Block> src;
+  std::shared_ptr<Memory> dst;
+  int rowBytes;
+  Size size;
+  BenchCase report;
+};
+
+// Decoding to BGRA8 at a size and a field, with interpolated and with nearest chroma.
+Job Decode(const std::string& name, F format, Size size, Size dstSize, int field = 0) {
+  const auto src = std::make_shared<Block>(format, size);
+  const int rowBytes = dstSize.width * 4;
+  const auto dst = std::make_shared<Memory>(static_cast<size_t>(rowBytes) * dstSize.height);
+  Job job{src, dst, rowBytes, size,
+          BenchCase("decode " + name + " to BGRA8 " + size.name, static_cast<size_t>(size.width) * size.height)};
+  for (const int quality : {2, 1}) {
+    const auto work = [=] {
+      return VX::DecompressYUV_420_8u(src->planes, src->rowBytes, size.width, size.height, format, dst->data(),
+                                      rowBytes, dstSize.width, dstSize.height, F::BGRA_4444_8u,
+                                      static_cast<zovmediatypes::FieldType>(field),
+                                      static_cast<zovmediatypes::RenderQuality>(quality));
+    };
+    Check(work(), name);
+    job.report.Add(quality == 2 ? "vexel (interpolated)" : "vexel (nearest)", work);
+  }
+  job.report.AddFloor(src->pixelBytes(), dst->size());
+  return job;
+}
+
+void AddSwscale(Job& job, const char* format) {
+  for (const bool accurate : {false, true}) {
+    const auto scaler = std::make_shared<Swscale>(format, "bgra", job.size.width, job.size.height, accurate);
+    if (!scaler->valid()) continue;
+    job.report.Add(scaler->name(), [=, src = job.src, dst = job.dst, rowBytes = job.rowBytes] {
+      const uint8_t* planes[4] = {src->plane(0), src->plane(1), src->plane(2)};
+      const int rows[4] = {src->rowBytes[0], src->rowBytes[1], src->rowBytes[2]};
+      scaler->RunPlanes(planes, rows, dst->data(), rowBytes);
+    });
+  }
+}
+
+void FullSizeCases(Size size) {
+  for (const bool is709 : {false, true}) {
+    const std::string suffix = is709 ? " 709" : " 601";
+    Job planar = Decode("I420" + suffix, is709 ? F::YUV_420_MPEG4_FRAME_709 : F::YUV_420_MPEG4_FRAME, size, size);
+    Job pairs = Decode("NV12" + suffix, FromBits(is709 ? 0x0E000A31 : 0x0E000831), size, size);
+#ifdef VEXEL_PEER_YUV
+    const auto* matrix = is709 ? &libyuv::kYuvH709Constants : &libyuv::kYuvI601Constants;
+    planar.report.Add("libyuv (nearest)", [=, src = planar.src, dst = planar.dst, rowBytes = planar.rowBytes] {
+      libyuv::I420ToARGBMatrix(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], src->plane(2),
+                               src->rowBytes[2], dst->data(), rowBytes, matrix, size.width, size.height);
+    });
+    planar.report.Add("libyuv (bilinear)", [=, src = planar.src, dst = planar.dst, rowBytes = planar.rowBytes] {
+      libyuv::I420ToARGBMatrixFilter(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], src->plane(2),
+                                     src->rowBytes[2], dst->data(), rowBytes, matrix, size.width, size.height,
+                                     libyuv::kFilterBilinear);
+    });
+    pairs.report.Add("libyuv (nearest)", [=, src = pairs.src, dst = pairs.dst, rowBytes = pairs.rowBytes] {
+      libyuv::NV12ToARGBMatrix(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], dst->data(), rowBytes,
+                               matrix, size.width, size.height);
+    });
+#endif
+    AddSwscale(planar, "yuv420p");
+    AddSwscale(pairs, "nv12");
+  }
+  Job deep = Decode("P010 709", FromBits(0x0E000A71), size, size);
+#ifdef VEXEL_PEER_YUV
+  deep.report.Add("libyuv (nearest)", [=, src = deep.src, dst = deep.dst, rowBytes = deep.rowBytes] {
+    libyuv::P010ToARGBMatrix(reinterpret_cast<const uint16_t*>(src->plane(0)), src->rowBytes[0] / 2,
+                             reinterpret_cast<const uint16_t*>(src->plane(1)), src->rowBytes[1] / 2, dst->data(),
+                             rowBytes, &libyuv::kYuvH709Constants, size.width, size.height);
+  });
+#endif
+  AddSwscale(deep, "p010le");
+}
+
+void OtherSizeCases(Size size) {
+  const F frame = F::YUV_420_MPEG4_FRAME_709, fields = F::YUV_420_MPEG2_FIELD_709;
+  const auto reduced = [&](int across, int down) { return Size{"", size.width / across, size.height / down}; };
+  Decode("I420, one field,", fields, size, reduced(1, 2), 1);
+  Decode("I420 / 2 x 2", frame, size, reduced(2, 2));
+  Decode("I420 / 4 x 4", frame, size, reduced(4, 4));
+  Decode("I420 * 4/3", frame, {size.name, size.width / 4 * 3, size.height}, size);
+}
+
+void EncodeCases(Size size) {
+  for (const F format : {F::YUV_420_MPEG4_FRAME_FullRange, F::YUV_420_MPEG4_FRAME_709}) {
+    const bool video = format == F::YUV_420_MPEG4_FRAME_709;
+    const F input = video ? F::VUYX_4444_8u_709 : F::BGRX_4444_8u;
+    const auto src = std::make_shared<Memory>(static_cast<size_t>(size.width) * size.height * 4);
+    const auto dst = std::make_shared<Block>(format, size);
+    src->FillBytes();
+    const auto work = [=] {
+      return Encode420(src->data(), size.width * 4, input, dst->memory.data(), format, size.width, size.height);
+    };
+    const std::string name = std::string("encode ") + (video ? "VUYX8 to I420 709 " : "BGRX8 to I420 full range ");
+    Check(work(), name);
+    BenchCase report(name + size.name, static_cast<size_t>(size.width) * size.height);
+    report.Add("vexel", work).AddFloor(src->size(), dst->pixelBytes());
+#ifdef VEXEL_PEER_YUV
+    if (!video)
+      report.Add("libyuv (ARGBToJ420)", [=] {
+        libyuv::ARGBToJ420(src->data(), size.width * 4, static_cast<uint8_t*>(dst->planes[0]), dst->rowBytes[0],
+                           static_cast<uint8_t*>(dst->planes[1]), dst->rowBytes[1],
+                           static_cast<uint8_t*>(dst->planes[2]), dst->rowBytes[2], size.width, size.height);
+      });
+#endif
+  }
+}
+
+}  // namespace
+
+void RegisterBenchmarks() {
+  for (const Size& size : kSizes) {
+    FullSizeCases(size);
+    OtherSizeCases(size);
+    EncodeCases(size);
+  }
+}
