@@ -190,6 +190,80 @@ VX_API VX_Result VX_CopyBiPlanar_8u(const void* const srcPlanes[2], const int32_
 
 /* ---- Codec and camera formats ------------------------------------------------------------------------------------ */
 
+/* Each repacks rows of samples; a width or height below 1 does nothing. Row bytes may be negative, pixels have any
+ * alignment, source and destination must not overlap. All give VX_Success. A 15u sample is 0..32768 (32768 is 1.0), a
+ * 16u sample 0..65535 (65535 is 1.0). The 10-bit RGB word holds R in bits 2-11, G in 12-21, B in 22-31. */
+
+/* Rescales every sample of four-channel 16-bit pixels from 15u to 16u: (s + 0.5) * 65535 / 32768 in floats, at most
+ * 65535, truncated. The second stores the result big-endian. */
+VX_API VX_Result VX_Convert_15u_To_16u_InPlace(void* base, int32_t rowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
+VX_API VX_Result VX_Convert_15u_To_16u_BigEndian_InPlace(void* base, int32_t rowBytes, int32_t width,
+                                                         int32_t height) VX_NOEXCEPT;
+/* Reverses the bytes of |rowBytes| / 4 words in each row, row padding included; width is not used. */
+VX_API VX_Result VX_Convert_Uint32_BigEndian_InPlace(void* base, int32_t rowBytes, int32_t width,
+                                                     int32_t height) VX_NOEXCEPT;
+
+/* 16-bit samples U Y V Y holding 10 bits at the right, 4 bytes per pixel, to V210 groups of 6 pixels in 16 bytes.
+ * Samples are not masked: one above 1023 runs into its neighbour. Where width is not a multiple of 6, the last group is
+ * filled up with black if dstRowBytes, a signed number, has room for it; otherwise its pixels are left out. */
+VX_API VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBytes, void* dst,
+                                                      int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
+
+/* 10-bit RGB words to and from four 16-bit samples, of which the first three hold R, G and B in their upper ten bits;
+ * the lower six are written as zero and dropped when read. The fourth is not written and has no effect. The 16-bit side
+ * has 8 bytes per pixel and no row padding. */
+VX_API VX_Result VX_Convert_RGB_444_10u_To_DNxHD16u(const void* src, int32_t srcRowBytes, void* dst, int32_t width,
+                                                    int32_t height) VX_NOEXCEPT;
+VX_API VX_Result VX_Convert_DNxHD16u_To_RGB_444_10u(const void* src, void* dst, int32_t dstRowBytes, int32_t width,
+                                                    int32_t height) VX_NOEXCEPT;
+
+/* Pixels of four 16-bit samples A R G B in Canon Log 3, big-endian if the flag is not 0, to floats B G R X, X = 1.
+ * Light is linearized in double precision, kept as a float and raised to the power 0.41666666 with its sign; no linear
+ * toe. A is ignored. The first call of a process computes a table of 256 KiB in a few milliseconds. */
+VX_API VX_Result VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(const void* src, int32_t srcRowBytes,
+                                                                          void* dst, int32_t dstRowBytes, int32_t width,
+                                                                          int32_t height,
+                                                                          uint8_t bigEndian) VX_NOEXCEPT;
+/* Sony S-Gamut3 to S-Gamut3.Cine in place on the first three of four 16-bit samples: the matrix in double precision,
+ * truncated; results outside 0..65535 wrap around modulo 65536. The fourth sample stays as it is. */
+VX_API VX_Result VX_Convert_SGamut3_16u_To_SGamut3Cine_16u(void* base, int32_t rowBytes, int32_t width,
+                                                           int32_t height) VX_NOEXCEPT;
+
+/* Bytes R G B, 3 per pixel, to B G R A with A = 255. */
+VX_API VX_Result VX_ConvertRGB_444_8uToBGRA_4444_8u(const void* src, int32_t srcRowBytes, void* dst,
+                                                    int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
+/* 16u samples R G B, 6 bytes per pixel, to 15u samples X R G B with X = 32768, rounded to the nearest code. */
+VX_API VX_Result VX_ConvertRGB_444_16u_To_XRGB_4444_15u(const void* src, int32_t srcRowBytes, void* dst,
+                                                        int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
+/* `count` samples from 16u to 15u, rounded to the nearest code; dst may be src. */
+VX_API VX_Result VX_Scale16uBufferTo15uSIMD(const uint16_t* src, uint16_t* dst, size_t count) VX_NOEXCEPT;
+
+/* `count` floats times 2^-scaleFactor, rounded to the nearest integer (ties to even) and saturated; NaN gives 0. */
+VX_API VX_Result VX_Convert_32f16sSfs(const float* src, int16_t* dst, int32_t count, int32_t scaleFactor) VX_NOEXCEPT;
+VX_API VX_Result VX_Convert_32f32sSfs(const float* src, int32_t* dst, int32_t count, int32_t scaleFactor) VX_NOEXCEPT;
+
+/* For JPEG 2000. 16u samples B G R, 6 bytes per pixel, to 10-bit RGB words: the upper ten bits of each sample. */
+VX_API VX_Result VX_Convert_j2k_BGR16u_To_RGB_444_10u(const void* src, int32_t srcRowBytes, void* dst,
+                                                      int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
+/* 10-bit RGB words to 16-bit samples B G R, 6 bytes per pixel, with the ten bits at the right. */
+VX_API VX_Result VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(const void* src, int32_t srcRowBytes, void* dst,
+                                                                     int32_t dstRowBytes, int32_t width,
+                                                                     int32_t height) VX_NOEXCEPT;
+/* V210 to 16-bit samples U Y V Y with ten bits at the right, 4 bytes per pixel. The last group of each source row is
+ * whole, whatever the width. */
+VX_API VX_Result VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(const void* src, int32_t srcRowBytes, void* dst,
+                                                               int32_t dstRowBytes, int32_t width,
+                                                               int32_t height) VX_NOEXCEPT;
+/* Adds `offset` to U and V of 4:2:2 float pairs U Y V Y: -0.5 takes a codec's unsigned chroma to our centre of 0, 0.5
+ * back. Of an odd width, the last pair counts as whole. */
+VX_API VX_Result VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(void* base, int32_t rowBytes, int32_t width,
+                                                             int32_t height, float offset) VX_NOEXCEPT;
+/* Digital cinema codes Z' Y' X' (SMPTE ST 428-1: gamma 2.6, 1.0 is 52.37 cd/m2 where white is 48) to B G R on BT.709
+ * primaries with D65 white and a display gamma of 2.4; negative values keep their sign, nothing is clamped. The fourth
+ * float stays as it is. */
+VX_API VX_Result VX_Convert_j2k_ZYXx_32f_To_BGRX_32f_In_Place(void* base, int32_t rowBytes, int32_t width,
+                                                              int32_t height) VX_NOEXCEPT;
+
 /* ---- Transpose and rotation -------------------------------------------------------------------------------------- */
 
 /* Mirrors about the main diagonal: destination element (row x, column y) = source element (row y, column x). `width`

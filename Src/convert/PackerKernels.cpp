@@ -1,0 +1,535 @@
+#include "convert/PackerKernels.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <limits>
+
+#include "frame/Power.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "convert/PackerKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "frame/KernelTable.h"
+#include "frame/Power-inl.h"
+#include "frame/RowLoop-inl.h"
+
+#ifndef VEXEL_CONVERT_PACKERKERNELS_ONCE
+#define VEXEL_CONVERT_PACKERKERNELS_ONCE
+namespace vexel {
+namespace {
+
+constexpr size_t kGroupSamples = 12;
+constexpr uint16_t kTopTen = 0xFFC0;  // the bits of a 10-bit value at the top of a 16-bit sample
+
+// S-Gamut3 to S-Gamut3.Cine, Sony's matrix between the two camera gamuts.
+constexpr double kSGamut3ToCine[3][3] = {{1.1642234944, -0.1768455024, 0.012622008},
+                                         {0.0260509511, 0.9341657009, 0.039783348},
+                                         {0.0246996363, 0.0215592309, 0.9537411328}};
+
+// SMPTE ST 428-1: X'Y'Z' codes are (48 / 52.37 * XYZ)^(1 / 2.6). XYZ to BT.709 primaries with D65 white.
+constexpr float kDcdmGamma = 2.6f;
+constexpr float kDisplayGamma = 1 / 2.4f;
+constexpr double kDcdmPeak = 52.37 / 48;
+constexpr float Weight(double v) { return static_cast<float>(v * kDcdmPeak); }
+constexpr float kXyzToRgb[3][3] = {
+    {Weight(3.2409699419045226), Weight(-1.5373831775700939), Weight(-0.4986107602930034)},
+    {Weight(-0.9692436362808796), Weight(1.8759675015077202), Weight(0.0415550574071756)},
+    {Weight(0.0556300796969936), Weight(-0.2039769588889765), Weight(1.0569715142428786)}};
+
+// The two bytes of a V210 group that hold a sample, and the factor that moves it to the top of their 16 bits.
+struct UnpackTable {
+  alignas(16) uint8_t bytes[2][16] = {};
+  alignas(16) uint16_t factors[2][8] = {};
+  constexpr UnpackTable() {
+    for (size_t i = 0; i < kGroupSamples; ++i) {
+      const auto first = static_cast<uint8_t>(i / 3 * 4 + i % 3);
+      bytes[i / 8][i % 8 * 2] = first;
+      bytes[i / 8][i % 8 * 2 + 1] = static_cast<uint8_t>(first + 1);
+      factors[i / 8][i % 8] = static_cast<uint16_t>(64 >> 2 * (i % 3));
+    }
+  }
+};
+constexpr UnpackTable kUnpack;
+
+}  // namespace
+}  // namespace vexel
+#endif
+
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace hn = hwy::HWY_NAMESPACE;
+namespace {
+
+// Repacking is bound by memory from 16 bytes at a time on; arithmetic uses whole vectors.
+using D8 = hn::Full128<uint8_t>;
+using D16 = hn::Full128<uint16_t>;
+using D32 = hn::Full128<uint32_t>;
+using D64 = hn::Full128<uint64_t>;
+using V8 = hn::VFromD<D8>;
+using V64 = hn::VFromD<D64>;
+
+constexpr uint8_t Z = 0x80;
+
+HWY_INLINE V8 Shuffle(V8 v, const uint8_t* table) { return hn::TableLookupBytes(v, hn::Load(D8(), table)); }
+HWY_INLINE V64 Mask(V64 v, uint64_t mask) { return hn::And(v, hn::Set(D64(), mask)); }
+
+// As RowLoop, for rows that are their own destination.
+template <size_t kBlock, size_t kBytes, class Body>
+HWY_INLINE void InPlaceLoop(uint8_t* row, size_t units, const Body& body) {
+  size_t i = 0;
+  for (; i + kBlock <= units; i += kBlock) body(row + i * kBytes);
+  if (const size_t rest = (units - i) * kBytes) {
+    alignas(64) uint8_t block[kBlock * kBytes] = {};
+    std::memcpy(block, row + i * kBytes, rest);
+    body(block);
+    std::memcpy(row + i * kBytes, block, rest);
+  }
+}
+
+// Three samples at bits 0, 16 and 32 of each lane become one word in its lower half.
+HWY_INLINE V64 PackSamples(V64 v) {
+  return hn::Or(hn::Or(Mask(v, 0xFFFF), Mask(hn::ShiftRight<6>(v), 0x03FFFC00)),
+                Mask(hn::ShiftRight<12>(v), 0xFFF00000));
+}
+
+void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kFirst[16] = {0, 1, 2, 3, 4, 5, Z, Z, 6, 7, 8, 9, 10, 11, Z, Z};
+  alignas(16) static constexpr uint8_t kSecond[16] = {4, 5, 6, 7, 8, 9, Z, Z, 10, 11, 12, 13, 14, 15, Z, Z};
+  RowLoop<1, kUyvy16GroupBytes, kV210GroupBytes>(
+      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        const auto lower = PackSamples(hn::BitCast(D64(), Shuffle(hn::LoadU(D8(), in), kFirst)));
+        const auto upper = PackSamples(hn::BitCast(D64(), Shuffle(hn::LoadU(D8(), in + 8), kSecond)));
+        const D32 d;
+        hn::StoreU(hn::ConcatEven(d, hn::BitCast(d, upper), hn::BitCast(d, lower)), d,
+                   reinterpret_cast<uint32_t*>(out));
+      });
+}
+
+void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<1, kV210GroupBytes, kUyvy16GroupBytes>(
+      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        const D16 d;
+        const auto group = hn::LoadU(D8(), in);
+        const auto samples = [&](size_t half) HWY_ATTR {
+          const auto v = hn::BitCast(d, Shuffle(group, kUnpack.bytes[half]));
+          return hn::ShiftRight<6>(hn::Mul(v, hn::Load(d, kUnpack.factors[half])));
+        };
+        hn::StoreU(samples(0), d, reinterpret_cast<uint16_t*>(out));
+        hn::StoreU(hn::LowerHalf(samples(1)), hn::Half<D16>(), reinterpret_cast<uint16_t*>(out + 16));
+      });
+}
+
+#if HWY_TARGET == HWY_AVX3
+void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
+  const hn::ScalableTag<uint64_t> d;
+  const hn::ScalableTag<uint16_t> d16;
+  const hn::Rebind<uint32_t, decltype(d)> dWords;
+  const size_t lanes = hn::Lanes(d);
+  const auto pixels = [&](const uint32_t* words) HWY_ATTR {
+    const auto w = hn::PromoteTo(d, hn::LoadU(dWords, words));
+    const auto first = hn::And(hn::ShiftLeft<4>(w), hn::Set(d, kTopTen));
+    const auto second = hn::And(hn::ShiftLeft<10>(w), hn::Set(d, uint64_t{kTopTen} << 16));
+    const auto third = hn::And(hn::ShiftLeft<16>(w), hn::Set(d, uint64_t{kTopTen} << 32));
+    return hn::BitCast(d16, hn::Or(hn::Or(first, second), third));
+  };
+  const auto samples = [&](size_t n) HWY_ATTR {
+    const auto colour = hn::MaskFromVec(hn::BitCast(d16, hn::Set(d, 0x0000FFFFFFFFFFFF)));
+    return hn::And(colour, hn::FirstN(d16, 4 * n));
+  };
+  const auto full = samples(lanes);
+  size_t i = 0;
+  for (; i + lanes <= count; i += lanes)
+    hn::BlendedStore(pixels(reinterpret_cast<const uint32_t*>(src) + i), full, d16,
+                     reinterpret_cast<uint16_t*>(dst) + 4 * i);
+  if (i == count) return;
+  alignas(64) uint32_t words[HWY_MAX_BYTES / 8] = {};
+  std::memcpy(words, src + 4 * i, 4 * (count - i));
+  hn::BlendedStore(pixels(words), samples(count - i), d16, reinterpret_cast<uint16_t*>(dst) + 4 * i);
+}
+#else
+// Without masked stores of 16-bit lanes, the fourth sample is stepped over with ordinary stores of 4 and 2 bytes, two
+// pixels being computed at once.
+void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
+  const auto both = [](uint32_t mask) { return mask * 0x100000001u; };
+  const auto store = [](uint8_t* to, uint64_t lower, uint64_t upper) {
+    const auto two = static_cast<uint32_t>(lower);
+    const auto third = static_cast<uint16_t>(upper);
+    std::memcpy(to, &two, 4);
+    std::memcpy(to + 4, &third, 2);
+  };
+  const auto pixels = [&](uint64_t w, uint8_t* to, size_t n) {
+    const uint64_t lower = ((w << 4) & both(uint64_t{kTopTen})) | ((w << 10) & both(uint64_t{kTopTen} << 16));
+    const uint64_t upper = (w >> 16) & both(uint64_t{kTopTen});
+    store(to, lower, upper);
+    if (n == 2) store(to + 8, lower >> 32, upper >> 32);
+  };
+  for (size_t i = 0; i < count; i += 2) {
+    const size_t n = count - i == 1 ? 1 : 2;
+    uint64_t w = 0;
+    std::memcpy(&w, src + 4 * i, 4 * n);
+    pixels(w, dst + 8 * i, n);
+  }
+}
+#endif
+
+// The first three samples of each pixel, left-aligned 10-bit values, as a word in the lower half of its lane.
+HWY_INLINE V64 PackTopTen(V64 v) {
+  return hn::Or(hn::Or(Mask(hn::ShiftRight<4>(v), 0xFFC), Mask(hn::ShiftRight<10>(v), 0x3FF000)),
+                Mask(hn::ShiftRight<16>(v), 0xFFC00000));
+}
+HWY_INLINE void StoreWords(V64 lower, V64 upper, uint8_t* HWY_RESTRICT to) {
+  const D32 d;
+  hn::StoreU(hn::ConcatEven(d, hn::BitCast(d, upper), hn::BitCast(d, lower)), d, reinterpret_cast<uint32_t*>(to));
+}
+
+void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<4, 8, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const auto half = [&](size_t at)
+                          HWY_ATTR { return PackTopTen(hn::LoadU(D64(), reinterpret_cast<const uint64_t*>(in + at))); };
+    StoreWords(half(0), half(16), out);
+  });
+}
+
+// Calls each(i, v) with the 48 bytes at `in` as four vectors of 12 bytes each, which `table` moves; nothing beyond the
+// 48 bytes is read.
+template <class Each>
+HWY_INLINE void SpreadTwelves(const uint8_t* HWY_RESTRICT in, const uint8_t* table, const Each& each) {
+  const auto v2 = hn::LoadU(D8(), in + 24), v3 = hn::ShiftRightBytes<4>(D8(), hn::LoadU(D8(), in + 32));
+  each(0, Shuffle(hn::LoadU(D8(), in), table));
+  each(1, Shuffle(hn::LoadU(D8(), in + 12), table));
+  each(2, Shuffle(v2, table));
+  each(3, Shuffle(v3, table));
+}
+
+void Bgr16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kToRgb[16] = {4, 5, 2, 3, 0, 1, Z, Z, 10, 11, 8, 9, 6, 7, Z, Z};
+  RowLoop<8, 6, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    V64 words[4];
+    SpreadTwelves(in, kToRgb, [&](int i, V8 v) HWY_ATTR { words[i] = PackTopTen(hn::BitCast(D64(), v)); });
+    StoreWords(words[0], words[1], out);
+    StoreWords(words[2], words[3], out + 16);
+  });
+}
+
+void Rgb10ToBgr10In16(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kClose[16] = {0, 1, 2, 3, 4, 5, 8, 9, 10, 11, 12, 13, Z, Z, Z, Z};
+  RowLoop<8, 4, 6>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const D8 d8;
+    const auto twelve = [&](size_t at) HWY_ATTR {
+      const auto w = hn::PromoteTo(D64(), hn::LoadU(hn::Half<D32>(), reinterpret_cast<const uint32_t*>(in + at)));
+      const auto v = hn::Or(hn::Or(hn::ShiftRight<22>(w), Mask(hn::ShiftLeft<4>(w), 0x03FF0000)),
+                            Mask(hn::ShiftLeft<30>(w), uint64_t{0x3FF} << 32));
+      return Shuffle(hn::BitCast(d8, v), kClose);
+    };
+    const auto a = twelve(0), b = twelve(8), c = twelve(16), e = twelve(24);
+    const auto store = [&](V8 v, size_t at) HWY_ATTR { hn::StoreU(v, d8, out + at); };
+    store(hn::Or(a, hn::ShiftLeftBytes<12>(d8, b)), 0);
+    store(hn::Or(hn::ShiftRightBytes<4>(d8, b), hn::ShiftLeftBytes<8>(d8, c)), 16);
+    store(hn::Or(hn::ShiftRightBytes<8>(d8, c), hn::ShiftLeftBytes<4>(d8, e)), 32);
+  });
+}
+
+void Rgb8ToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kToBgr[16] = {2, 1, 0, Z, 5, 4, 3, Z, 8, 7, 6, Z, 11, 10, 9, Z};
+  RowLoop<16, 3, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const auto alpha = hn::BitCast(D8(), hn::Set(D32(), 0xFF000000));
+    SpreadTwelves(in, kToBgr, [&](int i, V8 v) HWY_ATTR { hn::StoreU(hn::Or(v, alpha), D8(), out + 16 * i); });
+  });
+}
+
+void Rgb16ToXrgb15(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kAfterX[16] = {Z, Z, 0, 1, 2, 3, 4, 5, Z, Z, 6, 7, 8, 9, 10, 11};
+  RowLoop<8, 6, 8>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const D16 d;
+    const auto x = hn::BitCast(d, hn::Set(D64(), 32768));
+    SpreadTwelves(in, kAfterX, [&](int i, V8 v) HWY_ATTR {
+      const auto half = hn::AverageRound(hn::BitCast(d, v), hn::Zero(d));
+      hn::StoreU(hn::Or(half, x), d, reinterpret_cast<uint16_t*>(out + 16 * i));
+    });
+  });
+}
+
+// (s + 0.5) * 65535 / 32768 truncated is 2 s up to 32767, also in floats, whose error is far below what is cut off;
+// from 32768 on it is above 65535.
+template <bool kSwap>
+HWY_INLINE void Scale15(uint8_t* row, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  InPlaceLoop<HWY_MAX_BYTES / 2, 2>(row, count, [&](uint8_t* p) HWY_ATTR {
+    auto* samples = reinterpret_cast<uint16_t*>(p);
+    const auto s = hn::LoadU(d, samples);
+    auto v = hn::SaturatedAdd(s, s);
+    if constexpr (kSwap) v = hn::Or(hn::ShiftLeft<8>(v), hn::ShiftRight<8>(v));
+    hn::StoreU(v, d, samples);
+  });
+}
+void Scale15To16(uint8_t* row, size_t count) { Scale15<false>(row, count); }
+void Scale15To16BigEndian(uint8_t* row, size_t count) { Scale15<true>(row, count); }
+
+void SwapBytes32(uint8_t* row, size_t count) {
+  alignas(16) static constexpr uint8_t kReversed[16] = {3, 2, 1, 0, 7, 6, 5, 4, 11, 10, 9, 8, 15, 14, 13, 12};
+  const hn::ScalableTag<uint8_t> d;
+  const auto table = hn::LoadDup128(d, kReversed);
+  InPlaceLoop<HWY_MAX_BYTES / 4, 4>(
+      row, count, [&](uint8_t* p) HWY_ATTR { hn::StoreU(hn::TableLookupBytes(hn::LoadU(d, p), table), d, p); });
+}
+
+void SGamut3ToSGamut3Cine(uint8_t* row, size_t count) {
+  const hn::ScalableTag<double> d;
+  const hn::ScalableTag<uint64_t> d64;
+  const hn::ScalableTag<int64_t> dSigned;
+  const hn::Rebind<int32_t, decltype(d)> d32;
+  InPlaceLoop<HWY_MAX_BYTES / 8, 8>(row, count, [&](uint8_t* p) HWY_ATTR {
+    auto* pixels = reinterpret_cast<uint64_t*>(p);
+    const auto q = hn::LoadU(d64, pixels);
+    const auto low = hn::Set(d64, 0xFFFF);
+    // As the low bits of 2^52, an integer is a double.
+    const auto magic = hn::Set(d, 0x1p52);
+    const auto sample = [&](auto v) HWY_ATTR {
+      return hn::Sub(hn::BitCast(d, hn::Or(hn::And(v, low), hn::BitCast(d64, magic))), magic);
+    };
+    const auto s0 = sample(q), s1 = sample(hn::ShiftRight<16>(q)), s2 = sample(hn::ShiftRight<32>(q));
+    const auto result = [&](const double* m) HWY_ATTR {
+      const auto sum =
+          hn::Add(hn::Add(hn::Mul(hn::Set(d, m[0]), s0), hn::Mul(hn::Set(d, m[1]), s1)), hn::Mul(hn::Set(d, m[2]), s2));
+      return hn::And(hn::BitCast(d64, hn::PromoteTo(dSigned, hn::DemoteTo(d32, sum))), low);
+    };
+    const auto out = hn::Or(result(kSGamut3ToCine[0]), hn::Or(hn::ShiftLeft<16>(result(kSGamut3ToCine[1])),
+                                                              hn::ShiftLeft<32>(result(kSGamut3ToCine[2]))));
+    hn::StoreU(hn::Or(out, hn::And(q, hn::Set(d64, 0xFFFF000000000000))), d64, pixels);
+  });
+}
+
+void ZyxToBgr32f(uint8_t* row, size_t count) {
+  static constexpr PowerExponent kDecode(kDcdmGamma), kEncode(kDisplayGamma);
+  const hn::ScalableTag<float> d;
+  InPlaceLoop<HWY_MAX_BYTES / 4, 16>(row, count, [&](uint8_t* p) HWY_ATTR {
+    auto* pixels = reinterpret_cast<float*>(p);
+    hn::VFromD<decltype(d)> z, y, x, rest;
+    hn::LoadInterleaved4(d, pixels, z, y, x, rest);
+    SignedPower3<PowerCore::Float>(x, y, z, kDecode);
+    const auto light = [&](const float* m) HWY_ATTR {
+      return hn::Add(hn::Add(hn::Mul(hn::Set(d, m[0]), x), hn::Mul(hn::Set(d, m[1]), y)), hn::Mul(hn::Set(d, m[2]), z));
+    };
+    auto r = light(kXyzToRgb[0]), g = light(kXyzToRgb[1]), b = light(kXyzToRgb[2]);
+    SignedPower3<PowerCore::Float>(r, g, b, kEncode);
+    hn::StoreInterleaved4(b, g, r, rest, d, pixels);
+  });
+}
+
+void Scale16To15(const uint8_t* src, uint8_t* dst, size_t count) {
+  const hn::ScalableTag<uint16_t> d;
+  const size_t lanes = hn::Lanes(d);
+  const auto scale = [&](const uint8_t* from, uint8_t* to) HWY_ATTR {
+    hn::StoreU(hn::AverageRound(hn::LoadU(d, reinterpret_cast<const uint16_t*>(from)), hn::Zero(d)), d,
+               reinterpret_cast<uint16_t*>(to));
+  };
+  size_t i = 0;
+  for (; i + lanes <= count; i += lanes) scale(src + 2 * i, dst + 2 * i);
+  if (i == count) return;
+  alignas(64) uint8_t block[HWY_MAX_BYTES] = {};
+  std::memcpy(block, src + 2 * i, 2 * (count - i));
+  scale(block, block);
+  std::memcpy(dst + 2 * i, block, 2 * (count - i));
+}
+
+// Calls store(values, destination) for scaled values without NaN.
+template <size_t kBytes, class Store>
+HWY_INLINE void Narrow(const float* src, uint8_t* dst, size_t count, float first, float second, const Store& store) {
+  const hn::ScalableTag<float> d;
+  const auto f = hn::Set(d, first), s = hn::Set(d, second);
+  RowLoop<HWY_MAX_BYTES / 4, 4, kBytes>(reinterpret_cast<const uint8_t*>(src), dst, count,
+                                        [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+                                          const auto v =
+                                              hn::Mul(hn::Mul(hn::LoadU(d, reinterpret_cast<const float*>(in)), f), s);
+                                          store(hn::IfThenElseZero(hn::Eq(v, v), v), out);
+                                        });
+}
+
+void NarrowToInt16(const float* src, uint8_t* dst, size_t count, float first, float second) {
+  const hn::ScalableTag<float> d;
+  const hn::Rebind<int16_t, decltype(d)> d16;
+  Narrow<2>(src, dst, count, first, second, [&](auto v, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const auto clamped = hn::Min(hn::Max(v, hn::Set(d, -32768.0f)), hn::Set(d, 32767.0f));
+    hn::StoreU(hn::DemoteTo(d16, ConvertNearest(clamped)), d16, reinterpret_cast<int16_t*>(out));
+  });
+}
+void NarrowToInt32(const float* src, uint8_t* dst, size_t count, float first, float second) {
+  const hn::ScalableTag<float> d;
+  const hn::ScalableTag<int32_t> d32;
+  Narrow<4>(src, dst, count, first, second, [&](auto v, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const auto above = hn::VecFromMask(d32, hn::RebindMask(d32, hn::Ge(v, hn::Set(d, 0x1p31f))));
+    hn::StoreU(hn::Xor(ConvertNearest(v), above), d32, reinterpret_cast<int32_t*>(out));
+  });
+}
+
+void OffsetChroma32f(uint8_t* row, size_t count, float offset) {
+  const hn::ScalableTag<float> d;
+  // Luma keeps its bits: even a sum with zero would not be the same for NaN and -0.
+  const auto chroma = hn::MaskFromVec(hn::BitCast(d, hn::Set(hn::ScalableTag<uint64_t>(), 0xFFFFFFFF)));
+  InPlaceLoop<HWY_MAX_BYTES / 16 * 2, 16>(row, count, [&](uint8_t* p) HWY_ATTR {
+    for (size_t at = 0; at < HWY_MAX_BYTES / 16 * 32; at += HWY_MAX_BYTES) {
+      auto* samples = reinterpret_cast<float*>(p + at);
+      const auto v = hn::LoadU(d, samples);
+      hn::StoreU(hn::IfThenElse(chroma, hn::Add(v, hn::Set(d, offset)), v), d, samples);
+    }
+  });
+}
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif
+
+#if HWY_ONCE
+namespace vexel {
+namespace plain {
+namespace {
+
+template <class T>
+T Get(const uint8_t* row, size_t index) {
+  T v;
+  std::memcpy(&v, row + index * sizeof(T), sizeof(T));
+  return v;
+}
+template <class T>
+void Put(uint8_t* row, size_t index, T v) {
+  std::memcpy(row + index * sizeof(T), &v, sizeof(T));
+}
+
+void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < 4 * count; ++i) {
+    const auto s = [&](size_t k) { return uint32_t{Get<uint16_t>(src, 3 * i + k)}; };
+    Put(dst, i, s(0) | s(1) << 10 | s(2) << 20);
+  }
+}
+void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < kGroupSamples * count; ++i)
+    Put(dst, i, static_cast<uint16_t>(Get<uint32_t>(src, i / 3) >> (10 * (i % 3)) & 0x3FF));
+}
+void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    const auto w = Get<uint32_t>(src, i);
+    Put(dst, 4 * i, static_cast<uint16_t>(w >> 2 << 6));
+    Put(dst, 4 * i + 1, static_cast<uint16_t>(w >> 12 << 6));
+    Put(dst, 4 * i + 2, static_cast<uint16_t>(w >> 22 << 6));
+  }
+}
+
+constexpr uint32_t Word(uint32_t r, uint32_t g, uint32_t b) { return r << 2 | g << 12 | b << 22; }
+
+void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    const auto s = [&](size_t k) { return uint32_t{Get<uint16_t>(src, 4 * i + k)} >> 6; };
+    Put(dst, i, Word(s(0), s(1), s(2)));
+  }
+}
+void Bgr16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    const auto s = [&](size_t k) { return uint32_t{Get<uint16_t>(src, 3 * i + k)} >> 6; };
+    Put(dst, i, Word(s(2), s(1), s(0)));
+  }
+}
+void Rgb10ToBgr10In16(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i)
+    for (size_t k = 0; k < 3; ++k)
+      Put(dst, 3 * i + k, static_cast<uint16_t>(Get<uint32_t>(src, i) >> (22 - 10 * k) & 0x3FF));
+}
+void Rgb8ToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i, src += 3, dst += 4) {
+    for (size_t k = 0; k < 3; ++k) dst[k] = src[2 - k];
+    dst[3] = 255;
+  }
+}
+constexpr uint16_t To15(uint16_t s) { return static_cast<uint16_t>((uint32_t{s} + 1) / 2); }
+void Rgb16ToXrgb15(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    Put(dst, 4 * i, uint16_t{32768});
+    for (size_t k = 0; k < 3; ++k) Put(dst, 4 * i + 1 + k, To15(Get<uint16_t>(src, 3 * i + k)));
+  }
+}
+void Scale16To15(const uint8_t* src, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) Put(dst, i, To15(Get<uint16_t>(src, i)));
+}
+
+constexpr uint16_t To16(uint16_t s) {
+  return static_cast<uint16_t>(std::min((s + 0.5f) * 65535.0f * 0x1p-15f, 65535.0f));
+}
+void Scale15To16(uint8_t* row, size_t count) {
+  for (size_t i = 0; i < count; ++i) Put(row, i, To16(Get<uint16_t>(row, i)));
+}
+void Scale15To16BigEndian(uint8_t* row, size_t count) {
+  for (size_t i = 0; i < count; ++i) Put(row, i, __builtin_bswap16(To16(Get<uint16_t>(row, i))));
+}
+void SwapBytes32(uint8_t* row, size_t count) {
+  for (size_t i = 0; i < count; ++i) Put(row, i, __builtin_bswap32(Get<uint32_t>(row, i)));
+}
+void SGamut3ToSGamut3Cine(uint8_t* row, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    double s[3];
+    for (size_t k = 0; k < 3; ++k) s[k] = Get<uint16_t>(row, 4 * i + k);
+    for (size_t k = 0; k < 3; ++k) {
+      const double* m = kSGamut3ToCine[k];
+      Put(row, 4 * i + k, static_cast<uint16_t>(static_cast<int32_t>(m[0] * s[0] + m[1] * s[1] + m[2] * s[2])));
+    }
+  }
+}
+void ZyxToBgr32f(uint8_t* row, size_t count) {
+  static constexpr PowerExponent kDecode(kDcdmGamma), kEncode(kDisplayGamma);
+  for (size_t i = 0; i < count; ++i) {
+    float xyz[3];
+    for (size_t k = 0; k < 3; ++k) xyz[k] = SignedPower(Get<float>(row, 4 * i + 2 - k), kDecode);
+    for (size_t k = 0; k < 3; ++k) {
+      const float* m = kXyzToRgb[k];
+      Put(row, 4 * i + 2 - k, SignedPower(m[0] * xyz[0] + m[1] * xyz[1] + m[2] * xyz[2], kEncode));
+    }
+  }
+}
+
+template <class T>
+void Narrow(const float* src, uint8_t* dst, size_t count, float first, float second) {
+  constexpr auto kLeast = std::numeric_limits<T>::min(), kMost = std::numeric_limits<T>::max();
+  for (size_t i = 0; i < count; ++i) {
+    const double v = src[i] * first * second;
+    const double inside = std::isnan(v) ? 0 : std::clamp<double>(v, kLeast, kMost);
+    Put(dst, i, static_cast<T>(std::nearbyint(inside)));
+  }
+}
+void NarrowToInt16(const float* src, uint8_t* dst, size_t count, float first, float second) {
+  Narrow<int16_t>(src, dst, count, first, second);
+}
+void NarrowToInt32(const float* src, uint8_t* dst, size_t count, float first, float second) {
+  Narrow<int32_t>(src, dst, count, first, second);
+}
+void OffsetChroma32f(uint8_t* row, size_t count, float offset) {
+  for (size_t i = 0; i < 2 * count; ++i) Put(row, 2 * i, Get<float>(row, 2 * i) + offset);
+}
+
+}  // namespace
+}  // namespace plain
+
+const RowKernelSet kUyvy10ToV210 = VX_KERNEL_VARIANTS(Uyvy10ToV210);
+const RowKernelSet kV210ToUyvy10 = VX_KERNEL_VARIANTS(V210ToUyvy10);
+const RowKernelSet kRgb10ToDnxhd16 = VX_KERNEL_VARIANTS(Rgb10ToDnxhd16);
+const RowKernelSet kDnxhd16ToRgb10 = VX_KERNEL_VARIANTS(Dnxhd16ToRgb10);
+const RowKernelSet kBgr16ToRgb10 = VX_KERNEL_VARIANTS(Bgr16ToRgb10);
+const RowKernelSet kRgb10ToBgr10In16 = VX_KERNEL_VARIANTS(Rgb10ToBgr10In16);
+const RowKernelSet kRgb8ToBgra8 = VX_KERNEL_VARIANTS(Rgb8ToBgra8);
+const RowKernelSet kRgb16ToXrgb15 = VX_KERNEL_VARIANTS(Rgb16ToXrgb15);
+const InPlaceKernelSet kScale15To16 = VX_KERNEL_VARIANTS(Scale15To16);
+const InPlaceKernelSet kScale15To16BigEndian = VX_KERNEL_VARIANTS(Scale15To16BigEndian);
+const InPlaceKernelSet kSwapBytes32 = VX_KERNEL_VARIANTS(SwapBytes32);
+const InPlaceKernelSet kSGamut3ToSGamut3Cine = VX_KERNEL_VARIANTS(SGamut3ToSGamut3Cine);
+const InPlaceKernelSet kZyxToBgr32f = VX_KERNEL_VARIANTS(ZyxToBgr32f);
+const KernelVariants<ScaleKernel> kScale16To15 = VX_KERNEL_VARIANTS(Scale16To15);
+const KernelVariants<NarrowKernel> kNarrowToInt16 = VX_KERNEL_VARIANTS(NarrowToInt16);
+const KernelVariants<NarrowKernel> kNarrowToInt32 = VX_KERNEL_VARIANTS(NarrowToInt32);
+const KernelVariants<OffsetKernel> kOffsetChroma32f = VX_KERNEL_VARIANTS(OffsetChroma32f);
+
+}  // namespace vexel
+#endif

@@ -1,0 +1,374 @@
+// Codec packers and camera converters against formulas of their own, sample by sample.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <bit>
+#include <climits>
+#include <cmath>
+#include <cstring>
+#include <functional>
+#include <limits>
+#include <numeric>
+#include <vector>
+
+#include "frame/KernelVariant.h"
+#include "support/Random.h"
+#include "vexel/vexel.h"
+
+namespace vexel {
+namespace {
+
+using Samples = std::vector<uint16_t>;
+constexpr int kSizes[] = {1, 2, 3, 5, 6, 7, 8, 11, 13, 16, 17, 31, 33, 64, 67, 131};
+
+// Rows of any bytes inside a larger block whose rest must stay as it was.
+struct Rows {
+  Rows(size_t bytes, int height, int padding, bool upsideDown, uint64_t seed)
+      : memory((bytes + static_cast<size_t>(padding)) * static_cast<size_t>(height) + 7) {
+    testing::Random(seed).Fill(memory.data(), memory.size());
+    rowBytes = static_cast<int>(bytes) + padding;
+    first = 3;
+    if (!upsideDown) return;
+    first += static_cast<size_t>(rowBytes * (height - 1));
+    rowBytes = -rowBytes;
+  }
+  uint8_t* base() { return memory.data() + first; }
+  template <class T>
+  T Get(int row, size_t index) const {
+    T v;
+    std::memcpy(&v, memory.data() + At(row) + index * sizeof(T), sizeof(T));
+    return v;
+  }
+  template <class T>
+  void Put(int row, size_t index, T v) {
+    std::memcpy(memory.data() + At(row) + index * sizeof(T), &v, sizeof(T));
+  }
+  size_t At(int row) const { return static_cast<size_t>(static_cast<ptrdiff_t>(first) + ptrdiff_t{row} * rowBytes); }
+
+  std::vector<uint8_t> memory;
+  size_t first;
+  int rowBytes;
+};
+
+constexpr uint32_t Top(uint32_t sample) { return sample / 64; }
+uint32_t Word(uint32_t r, uint32_t g, uint32_t b) { return r * 4 + g * 4096 + b * 4194304; }
+uint32_t Component(uint32_t word, int k) { return word / (4u << 10 * k) % 1024; }
+
+// A packer and what it writes to pixel x of a row.
+struct Packer {
+  const char* name;
+  size_t srcBytes, dstBytes;  // per pixel
+  bool tightSource, tightDestination;
+  std::function<void(Rows& src, Rows& dst, int width, int height)> run;
+  std::function<void(const Rows& src, Rows& dst, int row, size_t x)> expected;
+};
+
+const std::vector<Packer>& Packers() {
+  static const std::vector<Packer> packers = {
+      {"RGB10 to DNxHD", 4, 8, false, true,
+       [](Rows& s, Rows& d, int w, int h) { VX_Convert_RGB_444_10u_To_DNxHD16u(s.base(), s.rowBytes, d.base(), w, h); },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         for (int k = 0; k < 3; ++k)
+           d.Put(row, 4 * x + k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k) * 64));
+       }},
+      {"DNxHD to RGB10", 8, 4, true, false,
+       [](Rows& s, Rows& d, int w, int h) { VX_Convert_DNxHD16u_To_RGB_444_10u(s.base(), d.base(), d.rowBytes, w, h); },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 4 * x + k)); };
+         d.Put(row, x, Word(at(0), at(1), at(2)));
+       }},
+      {"BGR16 to RGB10", 6, 4, false, false,
+       [](Rows& s, Rows& d, int w, int h) {
+         VX_Convert_j2k_BGR16u_To_RGB_444_10u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
+       },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 3 * x + k)); };
+         d.Put(row, x, Word(at(2), at(1), at(0)));
+       }},
+      {"RGB10 to BGR16", 4, 6, false, false,
+       [](Rows& s, Rows& d, int w, int h) {
+         VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
+       },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         for (int k = 0; k < 3; ++k)
+           d.Put(row, 3 * x + 2 - k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k)));
+       }},
+      {"RGB8 to BGRA8", 3, 4, false, false,
+       [](Rows& s, Rows& d, int w, int h) {
+         VX_ConvertRGB_444_8uToBGRA_4444_8u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
+       },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         for (int k = 0; k < 4; ++k) d.Put(row, 4 * x + k, k == 3 ? uint8_t{255} : s.Get<uint8_t>(row, 3 * x + 2 - k));
+       }},
+      {"RGB16 to XRGB15", 6, 8, false, false,
+       [](Rows& s, Rows& d, int w, int h) {
+         VX_ConvertRGB_444_16u_To_XRGB_4444_15u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
+       },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         d.Put(row, 4 * x, uint16_t{32768});
+         for (int k = 0; k < 3; ++k)
+           d.Put(row, 4 * x + 1 + k,
+                 static_cast<uint16_t>(std::lround(s.Get<uint16_t>(row, 3 * x + k) * 32768.0 / 65535)));
+       }},
+      {"V210 to UYVY16", 16, 4, false, false,  // 16 bytes are more than any pixel's share
+       [](Rows& s, Rows& d, int w, int h) {
+         VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
+       },
+       [](const Rows& s, Rows& d, int row, size_t x) {
+         for (size_t i = 2 * x; i < 2 * x + 2; ++i)
+           d.Put(row, i, static_cast<uint16_t>(s.Get<uint32_t>(row, i / 3) / (1u << 10 * (i % 3)) % 1024));
+       }},
+  };
+  return packers;
+}
+
+TEST(Packers, EachPixelAtAnySizeAndStrideAndNothingElse) {
+  for (const Packer& packer : Packers())
+    for (const int width : kSizes)
+      for (const bool upsideDown : {false, true}) {
+        const int height = 1 + width % 4;
+        const auto bytes = [&](size_t perPixel) { return perPixel * static_cast<size_t>(width); };
+        Rows src(bytes(packer.srcBytes), height, packer.tightSource ? 0 : 5, upsideDown && !packer.tightSource, 1);
+        Rows dst(bytes(packer.dstBytes), height, packer.tightDestination ? 0 : 9,
+                 !upsideDown && !packer.tightDestination, 2);
+        Rows expected = dst;
+        packer.run(src, dst, width, height);
+        for (int row = 0; row < height; ++row)
+          for (int x = 0; x < width; ++x) packer.expected(src, expected, row, static_cast<size_t>(x));
+        ASSERT_EQ(dst.memory, expected.memory) << packer.name << ", " << width << " pixels";
+        packer.run(src, dst, 0, height);
+        packer.run(src, dst, width, -1);
+        ASSERT_EQ(dst.memory, expected.memory) << packer.name << " of nothing";
+      }
+}
+
+// Past the cache, rows are staged in pieces.
+TEST(Packers, LargePicturesAreTheSame) {
+  const auto width = static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37);
+  for (const Packer& packer : Packers()) {
+    Rows src(packer.srcBytes * static_cast<size_t>(width), 8, 0, false, 3);
+    Rows dst(packer.dstBytes * static_cast<size_t>(width), 8, packer.tightDestination ? 0 : 2, false, 4);
+    Rows expected = dst;
+    packer.run(src, dst, width, 8);
+    for (int row = 0; row < 8; ++row)
+      for (int x = 0; x < width; ++x) packer.expected(src, expected, row, static_cast<size_t>(x));
+    ASSERT_TRUE(dst.memory == expected.memory) << packer.name;
+  }
+}
+
+TEST(Packers, V210OfUyvyWithItsTail) {
+  for (const int width : {1, 2, 5, 6, 7, 8, 12, 13, 47, 48, 53})
+    for (const int room : {0, 16}) {
+      const int groups = width / 6, height = 3;
+      const size_t dstBytes = static_cast<size_t>(groups) * 16 + static_cast<size_t>(room);
+      Rows src(static_cast<size_t>(width) * 4, height, 6, true, 1), dst(dstBytes, height, 3, false, 2);
+      Rows expected = dst;
+      VX_ConvertUYVY_422_10uToV210_422_10u(src.base(), src.rowBytes, dst.base(), dst.rowBytes, width, height);
+      const int words = 4 * (width % 6 != 0 && room ? groups + 1 : groups);
+      for (int row = 0; row < height; ++row)
+        for (int word = 0; word < words; ++word) {
+          const auto sample = [&](int k) -> uint32_t {
+            const int i = 3 * word + k;
+            if (i < 2 * width) return src.Get<uint16_t>(row, static_cast<size_t>(i));
+            return i % 2 ? 64 : 512;
+          };
+          expected.Put(row, static_cast<size_t>(word), sample(0) | sample(1) << 10 | sample(2) << 20);
+        }
+      ASSERT_EQ(dst.memory, expected.memory) << width << " pixels, room for " << dstBytes;
+    }
+}
+
+Samples WholeDomain() {
+  Samples samples(65536);
+  std::iota(samples.begin(), samples.end(), uint16_t{0});
+  return samples;
+}
+
+TEST(Packers, WholeDomainOf15uTo16u) {
+  const Samples all = WholeDomain();
+  Samples native = all, swapped = all, back(all.size());
+  VX_Convert_15u_To_16u_InPlace(native.data(), 8192, 1021, 16);
+  VX_Convert_15u_To_16u_BigEndian_InPlace(swapped.data(), 8192, 1021, 16);
+  VX_Scale16uBufferTo15uSIMD(all.data(), back.data(), all.size() - 3);
+  for (size_t s = 0; s < all.size(); ++s) {
+    const auto expected =
+        s % 4096 < 4084 ? static_cast<uint16_t>(std::min((s + 0.5) * 65535 / 32768, 65535.0)) : all[s];
+    ASSERT_EQ(native[s], expected) << s;
+    ASSERT_EQ(swapped[s], s % 4096 < 4084 ? static_cast<uint16_t>(expected << 8 | expected >> 8) : all[s]) << s;
+    if (s < all.size() - 3) {
+      ASSERT_EQ(back[s], std::lround(static_cast<double>(s) * 32768 / 65535)) << s;
+    }
+  }
+  EXPECT_EQ(back[65535], 0);
+  VX_Scale16uBufferTo15uSIMD(back.data() + 1, back.data() + 1, 33);
+  EXPECT_EQ(back[33], 9);
+  EXPECT_EQ(back[34], 17);
+}
+
+TEST(Packers, ByteSwapTakesPaddingAndNegativeRows) {
+  for (const int rowBytes : {4, 12, 66, 67, -32, -71}) {
+    const auto bytes = static_cast<size_t>(std::abs(rowBytes));
+    Rows rows(bytes, 3, 0, rowBytes < 0, 5), expected = rows;
+    const Rows original = rows;
+    VX_Convert_Uint32_BigEndian_InPlace(rows.base(), rowBytes, -1, 3);
+    for (int row = 0; row < 3; ++row)
+      for (size_t i = 0; i < bytes / 4 * 4; ++i)
+        expected.Put(row, i, original.Get<uint8_t>(row, i / 4 * 4 + 3 - i % 4));
+    ASSERT_EQ(rows.memory, expected.memory);
+  }
+}
+
+double CanonLight(double x) {
+  if (x < 0.04076162) return -(std::pow(10, (0.07623209 - x) / 0.42889912) - 1) / 14.98325;
+  if (x > 0.105357102) return (std::pow(10, (x - 0.069886632) / 0.42889912) - 1) / 14.98325;
+  return (x - 0.073059361) / 2.3069815;
+}
+
+TEST(Packers, CanonLog3OfEveryCode) {
+  for (const bool bigEndian : {false, true}) {
+    const auto stored = [&](size_t s) { return static_cast<uint16_t>(bigEndian ? s << 8 | s >> 8 : s); };
+    Samples src(4 * 65536);
+    for (size_t s = 0; s < 65536; ++s)
+      for (size_t k = 1; k < 4; ++k) src[4 * s + k] = stored(s * (2 * k - 1) & 0xFFFF);
+    std::vector<float> dst(4 * 65536 + 4, 7.0f);
+    VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(src.data(), 8 * 257, dst.data(), 16 * 257, 255, 255,
+                                                             bigEndian ? 2 : 0);
+    for (size_t s = 0; s < 255 * 257; ++s) {
+      const bool inside = s % 257 < 255;
+      ASSERT_EQ(dst[4 * s + 3], inside ? 1.0f : 7.0f) << s;
+      for (size_t k = 0; k < 3 && inside; ++k) {
+        const float x = static_cast<float>(s * (5 - 2 * k) & 0xFFFF) / 65535.0f;
+        const auto light = static_cast<float>(CanonLight(double{x}));
+        const float expected = std::copysign(std::pow(std::fabs(light), 0.41666666f), light);
+        ASSERT_LE(std::abs(std::bit_cast<int32_t>(dst[4 * s + k]) - std::bit_cast<int32_t>(expected)), 1)
+            << s << ": " << dst[4 * s + k] << " instead of " << expected;
+      }
+    }
+  }
+}
+
+TEST(Packers, SGamut3WrapsAround) {
+  for (const int width : kSizes) {
+    Rows rows(static_cast<size_t>(width) * 8, 9, 4, width % 2 != 0, static_cast<uint64_t>(width)), expected = rows;
+    for (int row = 0; row < 9; ++row)
+      for (size_t x = 0; x < static_cast<size_t>(width); ++x) {
+        for (size_t k = 0; k < 3 && row % 3 == 0; ++k)  // the ends of the range
+          rows.Put(row, 4 * x + k, static_cast<uint16_t>((x + static_cast<size_t>(row)) >> k & 1 ? 65535 : 0));
+        for (size_t k = 0; k < 4; ++k) expected.Put(row, 4 * x + k, rows.Get<uint16_t>(row, 4 * x + k));
+        const auto s = [&](size_t k) { return double{static_cast<double>(rows.Get<uint16_t>(row, 4 * x + k))}; };
+        const double out[] = {1.1642234944 * s(0) - 0.1768455024 * s(1) + 0.012622008 * s(2),
+                              0.0260509511 * s(0) + 0.9341657009 * s(1) + 0.039783348 * s(2),
+                              0.0246996363 * s(0) + 0.0215592309 * s(1) + 0.9537411328 * s(2)};
+        for (size_t k = 0; k < 3; ++k)
+          expected.Put(row, 4 * x + k, static_cast<uint16_t>(static_cast<int64_t>(out[k]) & 0xFFFF));
+      }
+    VX_Convert_SGamut3_16u_To_SGamut3Cine_16u(rows.base(), rows.rowBytes, width, 9);
+    ASSERT_EQ(rows.memory, expected.memory) << width;
+  }
+}
+
+TEST(Packers, FloatsToScaledIntegers) {
+  using Limits = std::numeric_limits<float>;
+  std::vector<float> values = {0.5f,
+                               1.5f,
+                               2.5f,
+                               -0.5f,
+                               -1.5f,
+                               32767.4f,
+                               32767.5f,
+                               -32768.5f,
+                               -32769.0f,
+                               2147483520.0f,
+                               2147483648.0f,
+                               -2147483648.0f,
+                               -3e9f,
+                               Limits::max(),
+                               Limits::lowest(),
+                               Limits::infinity(),
+                               -Limits::infinity(),
+                               -0.0f};
+  testing::Random random(9);
+  while (values.size() < 301) values.push_back(random.Float(-40000, 40000));
+  for (const int scale : {0, 1, -1, 7, -16, 30, -40, 127, 140, -140, INT_MAX, INT_MIN}) {
+    std::vector<int16_t> narrow(values.size() + 1, 77);
+    std::vector<int32_t> wide(values.size() + 1, 77);
+    const auto count = static_cast<int32_t>(values.size());
+    VX_Convert_32f16sSfs(values.data(), narrow.data(), count, scale);
+    VX_Convert_32f32sSfs(values.data(), wide.data(), count, scale);
+    for (size_t i = 0; i < values.size(); ++i) {
+      const double v =
+          std::isinf(values[i]) ? double{values[i]} : std::ldexp(double{values[i]}, -std::clamp(scale, -900, 900));
+      const double rounded = std::nearbyint(v);
+      ASSERT_EQ(narrow[i], std::clamp(rounded, -32768.0, 32767.0)) << values[i] << " scale " << scale;
+      ASSERT_EQ(wide[i], std::clamp(rounded, -2147483648.0, 2147483647.0)) << values[i] << " scale " << scale;
+    }
+    EXPECT_EQ(narrow.back(), 77);
+    EXPECT_EQ(wide.back(), 77);
+  }
+  const std::vector<float> nans(67, Limits::quiet_NaN());
+  std::vector<int32_t> wide(67, 77);
+  VX_Convert_32f32sSfs(nans.data(), wide.data(), 67, 3);
+  EXPECT_EQ(wide, std::vector<int32_t>(67, 0));
+}
+
+// In place on float pixels of every width, run as plain code too.
+struct FloatRows {
+  std::vector<float> values;
+  explicit FloatRows(int width) : values(static_cast<size_t>(width) * 12 + 4) {
+    testing::Random random(3);
+    for (float& v : values) v = random.OneIn(9) ? 0.0f : random.Float(-0.3f, 1.3f);
+  }
+  template <class Run>
+  void Convert(KernelVariant variant, int width, const Run& run) {
+    const KernelVariant active = ActiveKernelVariant();
+    LimitKernelVariant(variant);
+    run(values.data() + static_cast<size_t>(width) * 8, -16 * width);
+    LimitKernelVariant(active);
+  }
+};
+
+TEST(Packers, DigitalCinemaToDisplay) {
+  for (const int width : kSizes) {
+    FloatRows rows(width), plain(width);
+    const FloatRows before(width);
+    const auto run = [&](void* base, int rowBytes) {
+      VX_Convert_j2k_ZYXx_32f_To_BGRX_32f_In_Place(base, rowBytes, width, 3);
+    };
+    rows.Convert(ActiveKernelVariant(), width, run);
+    plain.Convert(KernelVariant::Plain, width, run);
+    ASSERT_EQ(std::memcmp(rows.values.data(), plain.values.data(), rows.values.size() * 4), 0) << width;
+    for (size_t i = 0; i < before.values.size(); ++i) {
+      const size_t k = i % 4, pixel = i - k;
+      if (k == 3 || pixel == static_cast<size_t>(width) * 12) {
+        ASSERT_EQ(rows.values[i], before.values[i]);
+        continue;
+      }
+      static constexpr double kRgb[3][3] = {
+          {0.0556301, -0.2039770, 1.0569715}, {-0.9692436, 1.8759675, 0.0415551}, {3.2409699, -1.5373832, -0.4986108}};
+      double light = 0;
+      for (size_t c = 0; c < 3; ++c) {
+        const double code = before.values[pixel + 2 - c];
+        light += kRgb[k][c] * std::copysign(std::pow(std::fabs(code), 2.6), code) * 52.37 / 48;
+      }
+      // Compared as light, where the matrix's error does not grow.
+      const double result = rows.values[i];
+      ASSERT_NEAR(std::copysign(std::pow(std::fabs(result), 2.4), result), light, 4e-6) << width << ", " << i;
+    }
+  }
+}
+
+TEST(Packers, ChromaOffsetLeavesLuma) {
+  for (const int width : {1, 2, 3, 8, 9, 30, 67, 131}) {
+    const int pairs = (width + 1) / 2;
+    FloatRows rows(pairs), expected(pairs);
+    for (size_t i = 0; i < static_cast<size_t>(pairs) * 12; i += 2) expected.values[i] += -0.5f;
+    rows.values[1] = expected.values[1] = -0.0f;
+    rows.Convert(ActiveKernelVariant(), pairs, [&](void* base, int rowBytes) {
+      VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(base, rowBytes, width, 3, -0.5f);
+    });
+    ASSERT_EQ(std::memcmp(rows.values.data(), expected.values.data(), rows.values.size() * 4), 0) << width;
+  }
+}
+
+}  // namespace
+}  // namespace vexel
