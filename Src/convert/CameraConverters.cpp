@@ -80,7 +80,7 @@ VX_Result VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(const void* s
   const float* table = CanonLog3ToDisplay();
   const auto convert = bigEndian ? CanonLog3Row<true> : CanonLog3Row<false>;
   const auto pixels = static_cast<size_t>(width);
-  const bool stream = VX_GetCacheSize() != 0 && pixels * static_cast<size_t>(height) * 24 >= VX_GetCacheSize();
+  const bool stream = VX_GetCacheSize() != 0 && pixels * static_cast<size_t>(height) * 24 >= VX_GetCacheSize() / 2;
   const KernelVariant variant = ActiveKernelVariant();
   alignas(64) uint8_t staging[8192];
   const size_t piece = stream ? sizeof staging / 16 : pixels;

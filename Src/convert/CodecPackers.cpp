@@ -33,7 +33,7 @@ void ConvertRows(const RowKernelSet& kernels, const Source& src, const Destinati
   if (units == 0 || height < 1) return;
   const RowKernel convert = kernels[variant];
   const size_t bytes = units * (src.unitBytes + dst.unitBytes);
-  const bool stream = VX_GetCacheSize() != 0 && bytes * static_cast<size_t>(height) >= VX_GetCacheSize();
+  const bool stream = VX_GetCacheSize() != 0 && bytes * static_cast<size_t>(height) >= VX_GetCacheSize() / 2;
   alignas(64) uint8_t staging[8192];
   const size_t piece = stream ? sizeof staging / dst.unitBytes : units;
   for (int32_t row = 0; row < height; ++row) {

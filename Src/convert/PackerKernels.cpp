@@ -91,36 +91,65 @@ HWY_INLINE void InPlaceLoop(uint8_t* row, size_t units, const Body& body) {
   }
 }
 
+// V210 groups, one to a 128-bit block, two blocks where vectors have as many.
+using DG8 = hn::CappedTag<uint8_t, 32>;
+using DG16 = hn::Repartition<uint16_t, DG8>;
+using DG64 = hn::Repartition<uint64_t, DG8>;
+using VG8 = hn::VFromD<DG8>;
+using VG64 = hn::VFromD<DG64>;
+constexpr size_t kGroups = HWY_MAX_BYTES >= 32 ? 2 : 1;
+
+HWY_INLINE VG8 ShuffleGroups(VG8 v, const uint8_t* table) {
+  return hn::TableLookupBytes(v, hn::LoadDup128(DG8(), table));
+}
+HWY_INLINE VG8 LoadGroups(const uint8_t* HWY_RESTRICT in) {
+#if HWY_MAX_BYTES >= 32
+  return hn::Combine(DG8(), hn::LoadU(D8(), in + kUyvy16GroupBytes), hn::LoadU(D8(), in));
+#else
+  return hn::LoadU(DG8(), in);
+#endif
+}
+
 // Three samples at bits 0, 16 and 32 of each lane become one word in its lower half.
-HWY_INLINE V64 PackSamples(V64 v) {
-  return hn::Or(hn::Or(Mask(v, 0xFFFF), Mask(hn::ShiftRight<6>(v), 0x03FFFC00)),
-                Mask(hn::ShiftRight<12>(v), 0xFFF00000));
+HWY_INLINE VG64 PackSamples(VG64 v) {
+  const auto part = [](VG64 moved, uint64_t mask) HWY_ATTR { return hn::And(moved, hn::Set(DG64(), mask)); };
+  return hn::Or(hn::Or(part(v, 0xFFFF), part(hn::ShiftRight<6>(v), 0x03FFFC00)),
+                part(hn::ShiftRight<12>(v), 0xFFF00000));
 }
 
 void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kFirst[16] = {0, 1, 2, 3, 4, 5, Z, Z, 6, 7, 8, 9, 10, 11, Z, Z};
   alignas(16) static constexpr uint8_t kSecond[16] = {4, 5, 6, 7, 8, 9, Z, Z, 10, 11, 12, 13, 14, 15, Z, Z};
-  RowLoop<1, kUyvy16GroupBytes, kV210GroupBytes>(
+  alignas(16) static constexpr uint8_t kInOrder[16] = {0, 1, 2, 3, 8, 9, 10, 11, 4, 5, 6, 7, 12, 13, 14, 15};
+  RowLoop<kGroups, kUyvy16GroupBytes, kV210GroupBytes>(
       src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto lower = PackSamples(hn::BitCast(D64(), Shuffle(hn::LoadU(D8(), in), kFirst)));
-        const auto upper = PackSamples(hn::BitCast(D64(), Shuffle(hn::LoadU(D8(), in + 8), kSecond)));
-        const D32 d;
-        hn::StoreU(hn::ConcatEven(d, hn::BitCast(d, upper), hn::BitCast(d, lower)), d,
-                   reinterpret_cast<uint32_t*>(out));
+        const auto first = PackSamples(hn::BitCast(DG64(), ShuffleGroups(LoadGroups(in), kFirst)));
+        const auto second = PackSamples(hn::BitCast(DG64(), ShuffleGroups(LoadGroups(in + 8), kSecond)));
+        const auto words = hn::BitCast(DG8(), hn::Or(first, hn::ShiftLeft<32>(second)));
+        hn::StoreU(ShuffleGroups(words, kInOrder), DG8(), out);
       });
 }
 
 void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
-  RowLoop<1, kV210GroupBytes, kUyvy16GroupBytes>(
+  RowLoop<kGroups, kV210GroupBytes, kUyvy16GroupBytes>(
       src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const D16 d;
-        const auto group = hn::LoadU(D8(), in);
+        const DG16 d;
+        const auto groups = hn::LoadU(DG8(), in);
         const auto samples = [&](size_t half) HWY_ATTR {
-          const auto v = hn::BitCast(d, Shuffle(group, kUnpack.bytes[half]));
-          return hn::ShiftRight<6>(hn::Mul(v, hn::Load(d, kUnpack.factors[half])));
+          const auto v = hn::BitCast(d, ShuffleGroups(groups, kUnpack.bytes[half]));
+          return hn::BitCast(DG8(), hn::ShiftRight<6>(hn::Mul(v, hn::LoadDup128(d, kUnpack.factors[half]))));
         };
-        hn::StoreU(samples(0), d, reinterpret_cast<uint16_t*>(out));
-        hn::StoreU(hn::LowerHalf(samples(1)), hn::Half<D16>(), reinterpret_cast<uint16_t*>(out + 16));
+        const auto store = [](V8 eight, V8 four, uint8_t* HWY_RESTRICT to) HWY_ATTR {
+          hn::StoreU(eight, D8(), to);
+          hn::StoreU(hn::LowerHalf(four), hn::Half<D8>(), to + 16);
+        };
+        const auto eight = samples(0), four = samples(1);
+#if HWY_MAX_BYTES >= 32
+        store(hn::LowerHalf(eight), hn::LowerHalf(four), out);
+        store(hn::UpperHalf(D8(), eight), hn::UpperHalf(D8(), four), out + kUyvy16GroupBytes);
+#else
+        store(eight, four, out);
+#endif
       });
 }
 
@@ -162,37 +191,46 @@ void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
     std::memcpy(to, &two, 4);
     std::memcpy(to + 4, &third, 2);
   };
-  const auto pixels = [&](uint64_t w, uint8_t* to, size_t n) {
-    const uint64_t lower = ((w << 4) & both(uint64_t{kTopTen})) | ((w << 10) & both(uint64_t{kTopTen} << 16));
-    const uint64_t upper = (w >> 16) & both(uint64_t{kTopTen});
+  const auto pixels = [&](uint64_t w, uint8_t* to, bool isPair) {
+    const uint64_t lower = ((w << 4) & both(kTopTen)) | ((w << 10) & both(uint32_t{kTopTen} << 16));
+    const uint64_t upper = (w >> 16) & both(kTopTen);
     store(to, lower, upper);
-    if (n == 2) store(to + 8, lower >> 32, upper >> 32);
+    if (isPair) store(to + 8, lower >> 32, upper >> 32);
   };
-  for (size_t i = 0; i < count; i += 2) {
-    const size_t n = count - i == 1 ? 1 : 2;
-    uint64_t w = 0;
-    std::memcpy(&w, src + 4 * i, 4 * n);
-    pixels(w, dst + 8 * i, n);
+  size_t i = 0;
+  for (; i + 2 <= count; i += 2) {
+    uint64_t two;
+    std::memcpy(&two, src + 4 * i, 8);
+    pixels(two, dst + 8 * i, true);
   }
+  if (i == count) return;
+  uint32_t one;
+  std::memcpy(&one, src + 4 * i, 4);
+  pixels(one, dst + 8 * i, false);
 }
 #endif
 
 // The first three samples of each pixel, left-aligned 10-bit values, as a word in the lower half of its lane.
-HWY_INLINE V64 PackTopTen(V64 v) {
-  return hn::Or(hn::Or(Mask(hn::ShiftRight<4>(v), 0xFFC), Mask(hn::ShiftRight<10>(v), 0x3FF000)),
-                Mask(hn::ShiftRight<16>(v), 0xFFC00000));
+template <class V>
+HWY_INLINE V PackTopTen(V v) {
+  const auto part = [](V moved, uint64_t mask) HWY_ATTR { return hn::And(moved, hn::Set(hn::DFromV<V>(), mask)); };
+  return hn::Or(hn::Or(part(hn::ShiftRight<4>(v), 0xFFC), part(hn::ShiftRight<10>(v), 0x3FF000)),
+                part(hn::ShiftRight<16>(v), 0xFFC00000));
 }
-HWY_INLINE void StoreWords(V64 lower, V64 upper, uint8_t* HWY_RESTRICT to) {
-  const D32 d;
+template <class V>
+HWY_INLINE void StoreWords(V lower, V upper, uint8_t* HWY_RESTRICT to) {
+  const hn::Repartition<uint32_t, hn::DFromV<V>> d;
   hn::StoreU(hn::ConcatEven(d, hn::BitCast(d, upper), hn::BitCast(d, lower)), d, reinterpret_cast<uint32_t*>(to));
 }
 
 void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
-  RowLoop<4, 8, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-    const auto half = [&](size_t at)
-                          HWY_ATTR { return PackTopTen(hn::LoadU(D64(), reinterpret_cast<const uint64_t*>(in + at))); };
-    StoreWords(half(0), half(16), out);
-  });
+  const hn::ScalableTag<uint64_t> d;
+  RowLoop<HWY_MAX_BYTES / 4, 8, 4>(
+      src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        const auto half = [&](size_t at)
+                              HWY_ATTR { return PackTopTen(hn::LoadU(d, reinterpret_cast<const uint64_t*>(in + at))); };
+        StoreWords(half(0), half(HWY_MAX_BYTES), out);
+      });
 }
 
 // Calls each(i, v) with the 48 bytes at `in` as four vectors of 12 bytes each, which `table` moves; nothing beyond the
