@@ -19,6 +19,11 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
+#ifndef VX_COLOR_STAGE
+// Stages are inlined into their loops, where constants stay in registers.
+#define VX_COLOR_STAGE HWY_ATTR __attribute__((always_inline))
+#endif
+
 using ColorTag = hn::ScalableTag<float>;
 using ColorVector = hn::Vec<ColorTag>;
 
@@ -26,27 +31,111 @@ struct RgbVectors {
   ColorVector r, g, b;
 };
 
-// change(RgbVectors&) on whole blocks; the last pixels go through the same body on a copy padded with zeros.
-template <class Change>
-HWY_INLINE void ForEachPixelBlock(const float* src, float* dst, size_t count, const Change& change) {
+// A block of pixels, channel by channel. Blocks hold their pixels in the order that costs least to produce, the same in
+// all channels; only the way back to memory has to know it.
+constexpr size_t kBlockVectors = 16;
+struct PixelBlock {
+  HWY_ALIGN float r[kBlockVectors * hn::MaxLanes(ColorTag())];
+  HWY_ALIGN float g[kBlockVectors * hn::MaxLanes(ColorTag())];
+  HWY_ALIGN float b[kBlockVectors * hn::MaxLanes(ColorTag())];
+  HWY_ALIGN float a[kBlockVectors * hn::MaxLanes(ColorTag())];
+};
+
+#if HWY_TARGET == HWY_SCALAR
+HWY_INLINE void LoadPixels(const float* from, ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
+  hn::LoadInterleaved4(ColorTag(), from, v0, v1, v2, v3);
+}
+HWY_INLINE void StorePixels(ColorVector v0, ColorVector v1, ColorVector v2, ColorVector v3, float* to) {
+  hn::StoreInterleaved4(v0, v1, v2, v3, ColorTag(), to);
+}
+#else
+// 4 x 4 transposition within each 128 bits of four vectors.
+HWY_INLINE void Transpose4(ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
+  const ColorTag d;
+  const hn::Repartition<double, ColorTag> d64;
+  const auto low01 = hn::BitCast(d64, hn::InterleaveLower(d, v0, v1));
+  const auto high01 = hn::BitCast(d64, hn::InterleaveUpper(d, v0, v1));
+  const auto low23 = hn::BitCast(d64, hn::InterleaveLower(d, v2, v3));
+  const auto high23 = hn::BitCast(d64, hn::InterleaveUpper(d, v2, v3));
+  v0 = hn::BitCast(d, hn::InterleaveLower(d64, low01, low23));
+  v1 = hn::BitCast(d, hn::InterleaveUpper(d64, low01, low23));
+  v2 = hn::BitCast(d, hn::InterleaveLower(d64, high01, high23));
+  v3 = hn::BitCast(d, hn::InterleaveUpper(d64, high01, high23));
+}
+HWY_INLINE void LoadPixels(const float* from, ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
   const ColorTag d;
   const size_t lanes = hn::Lanes(d);
-  HWY_ALIGN float block[4 * hn::MaxLanes(ColorTag())];
-  for (size_t i = 0; i < count; i += lanes) {
-    const float* from = src + 4 * i;
-    float* to = dst + 4 * i;
-    const size_t rest = count - i;
-    if (HWY_UNLIKELY(rest < lanes)) {
-      std::memset(block, 0, sizeof block);
-      std::memcpy(block, from, rest * 4 * sizeof(float));
-      from = to = block;
-    }
+  v0 = hn::LoadU(d, from);
+  v1 = hn::LoadU(d, from + lanes);
+  v2 = hn::LoadU(d, from + 2 * lanes);
+  v3 = hn::LoadU(d, from + 3 * lanes);
+  Transpose4(v0, v1, v2, v3);
+}
+HWY_INLINE void StorePixels(ColorVector v0, ColorVector v1, ColorVector v2, ColorVector v3, float* to) {
+  const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
+  Transpose4(v0, v1, v2, v3);
+  hn::StoreU(v0, d, to);
+  hn::StoreU(v1, d, to + lanes);
+  hn::StoreU(v2, d, to + 2 * lanes);
+  hn::StoreU(v3, d, to + 3 * lanes);
+}
+#endif
+
+// One stage over whole vectors: from memory if it is the first, to memory if it is the last.
+template <bool kFirst, bool kLast, class Stage>
+HWY_INLINE void RunStage(const float* src, float* dst, PixelBlock& block, size_t vectors, const Stage& stage) {
+  const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
+  for (size_t i = 0; i < vectors * lanes; i += lanes) {
     RgbVectors c;
     ColorVector a;
-    hn::LoadInterleaved4(d, from, c.b, c.g, c.r, a);
-    change(c);
-    hn::StoreInterleaved4(c.b, c.g, c.r, a, d, to);
-    if (HWY_UNLIKELY(rest < lanes)) std::memcpy(dst + 4 * i, block, rest * 4 * sizeof(float));
+    if constexpr (kFirst) {
+      LoadPixels(src + 4 * i, c.b, c.g, c.r, a);
+      if constexpr (!kLast) hn::Store(a, d, block.a + i);
+    } else {
+      c = {hn::Load(d, block.r + i), hn::Load(d, block.g + i), hn::Load(d, block.b + i)};
+      if constexpr (kLast) a = hn::Load(d, block.a + i);
+    }
+    stage(c);
+    if constexpr (kLast) {
+      StorePixels(c.b, c.g, c.r, a, dst + 4 * i);
+    } else {
+      hn::Store(c.r, d, block.r + i);
+      hn::Store(c.g, d, block.g + i);
+      hn::Store(c.b, d, block.b + i);
+    }
+  }
+}
+
+template <bool kFirst, class Stage, class... Stages>
+HWY_INLINE void RunStages(const float* src, float* dst, PixelBlock& block, size_t vectors, const Stage& stage,
+                          const Stages&... stages) {
+  RunStage<kFirst, sizeof...(Stages) == 0>(src, dst, block, vectors, stage);
+  if constexpr (sizeof...(Stages) != 0) RunStages<false>(src, dst, block, vectors, stages...);
+}
+
+// Calls the stages, each a change of RgbVectors&, one after the other on blocks that stay in the cache. A chain of
+// powers is cut into one stage per power: within a stage the vectors do not depend on each other, so that the long
+// latency of a power hides behind its neighbours. The last pixels go through the same code on a copy padded with zeros.
+template <class... Stages>
+HWY_INLINE void ForEachPixel(const float* src, float* dst, size_t count, const Stages&... stages) {
+  const size_t lanes = hn::Lanes(ColorTag());
+  PixelBlock block;
+  HWY_ALIGN float padded[4 * hn::MaxLanes(ColorTag())];
+  while (count != 0) {
+    const bool whole = count >= lanes;
+    const size_t vectors = whole ? HWY_MIN(count / lanes, kBlockVectors) : 1;
+    const size_t pixels = whole ? vectors * lanes : count;
+    if (!whole) {
+      std::memset(padded, 0, sizeof padded);
+      std::memcpy(padded, src, pixels * 4 * sizeof(float));
+    }
+    RunStages<true>(whole ? src : padded, whole ? dst : padded, block, vectors, stages...);
+    if (!whole) std::memcpy(dst, padded, pixels * 4 * sizeof(float));
+    src += 4 * pixels;
+    dst += 4 * pixels;
+    count -= pixels;
   }
 }
 

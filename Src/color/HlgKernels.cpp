@@ -28,38 +28,51 @@ HWY_INLINE ColorVector HlgLuma(const RgbVectors& c) {
 
 void Rec709ToHlg(const float* src, float* dst, size_t count, const HlgJob& job) {
   const MatrixVectors matrix(job.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4);
-    matrix(c);
-    const RgbVectors linear = c;
-    const auto scene = [&](ColorVector v) HWY_ATTR { return hn::Mul(hn::Abs(v), hn::Set(d, 0.1f)); };
-    c = {scene(c.r), scene(c.g), scene(c.b)};
-    const auto luma = HlgLuma(c);
-    const auto gain = hn::Max(Power<PowerCore::Float>(luma, kHlgInverseGamma), hn::Set(d, kHlgLeastGain));
-    const auto inverse = hn::Div(hn::Set(d, 1.0f), gain);
-    const auto encode = [&](ColorVector v, ColorVector in) HWY_ATTR {
-      const auto e = hn::Mul(v, inverse);
-      const auto root = hn::Sqrt(hn::Mul(e, hn::Set(d, 3.0f)));
-      const auto log = hn::Add(hn::Mul(Log(hn::Sub(e, hn::Set(d, kHlgB))), hn::Set(d, kHlgA)), hn::Set(d, kHlgC));
-      return WithSignOf(hn::IfThenElse(hn::Lt(e, hn::Set(d, kHlgThreshold)), root, log), in);
-    };
-    c = {encode(c.r, linear.r), encode(c.g, linear.g), encode(c.b, linear.b)};
-  });
+  ForEachPixel(
+      src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE { SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4); },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        matrix(c);
+        const RgbVectors linear = c;
+        const auto scene = [&](ColorVector v) HWY_ATTR { return hn::Mul(hn::Abs(v), hn::Set(d, 0.1f)); };
+        c = {scene(c.r), scene(c.g), scene(c.b)};
+        const auto gain = hn::Max(Power<PowerCore::Float>(HlgLuma(c), kHlgInverseGamma), hn::Set(d, kHlgLeastGain));
+        const auto inverse = hn::Div(hn::Set(d, 1.0f), gain);
+        c = {WithSignOf(hn::Mul(c.r, inverse), linear.r), WithSignOf(hn::Mul(c.g, inverse), linear.g),
+             WithSignOf(hn::Mul(c.b, inverse), linear.b)};
+      },
+      [](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        const RgbVectors in = c;
+        const auto shifted = [&](ColorVector v) HWY_ATTR { return hn::Sub(hn::Abs(v), hn::Set(d, kHlgB)); };
+        c = {shifted(c.r), shifted(c.g), shifted(c.b)};
+        Log3(c.r, c.g, c.b);
+        const auto join = [&](ColorVector log, ColorVector v) HWY_ATTR {
+          const auto e = hn::Abs(v);
+          const auto root = hn::Sqrt(hn::Mul(e, hn::Set(d, 3.0f)));
+          const auto curve = hn::Add(hn::Mul(log, hn::Set(d, kHlgA)), hn::Set(d, kHlgC));
+          return WithSignOf(hn::IfThenElse(hn::Lt(e, hn::Set(d, kHlgThreshold)), root, curve), v);
+        };
+        c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+      });
 }
 
 void HlgToRec709(const float* src, float* dst, size_t count, const HlgJob& job) {
   const HlgJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    c = {LookupUnit(c.r, local.table, kHlgTableSize), LookupUnit(c.g, local.table, kHlgTableSize),
-         LookupUnit(c.b, local.table, kHlgTableSize)};
-    const auto gain = hn::Mul(Power<PowerCore::Float>(HlgLuma(c), kHlgSystemGamma), hn::Set(d, 10.0f));
-    c = {hn::Mul(c.r, gain), hn::Mul(c.g, gain), hn::Mul(c.b, gain)};
-    matrix(c);
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
-  });
+  ForEachPixel(
+      src, dst, count,
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        c = {LookupUnit(c.r, local.table, kHlgTableSize), LookupUnit(c.g, local.table, kHlgTableSize),
+             LookupUnit(c.b, local.table, kHlgTableSize)};
+        const auto gain = hn::Mul(Power<PowerCore::Float>(HlgLuma(c), kHlgSystemGamma), hn::Set(d, 10.0f));
+        c = {hn::Mul(c.r, gain), hn::Mul(c.g, gain), hn::Mul(c.b, gain)};
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        matrix(c);
+        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
+      });
 }
 
 }  // namespace HWY_NAMESPACE
@@ -80,11 +93,11 @@ void Rec709ToHlg(const float* src, float* dst, size_t count, const HlgJob& job) 
     const LinearRgb scene{std::fabs(c.r) * 0.1f, std::fabs(c.g) * 0.1f, std::fabs(c.b) * 0.1f};
     const float luma = kHlgLumaR * scene.r + kHlgLumaG * scene.g + kHlgLumaB * scene.b;
     const float inverse = 1.0f / Most(Power(luma, kHlgInverseGamma), kHlgLeastGain);
-    const auto encode = [inverse](float v, float in) {
-      const float e = v * inverse;
+    c = {WithSignOf(scene.r * inverse, c.r), WithSignOf(scene.g * inverse, c.g), WithSignOf(scene.b * inverse, c.b)};
+    ForEachChannel(c, [](float in) {
+      const float e = std::fabs(in);
       return WithSignOf(e < kHlgThreshold ? std::sqrt(3.0f * e) : kHlgA * Log(e - kHlgB) + kHlgC, in);
-    };
-    c = {encode(scene.r, c.r), encode(scene.g, c.g), encode(scene.b, c.b)};
+    });
   });
 }
 

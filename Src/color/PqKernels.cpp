@@ -21,30 +21,35 @@ namespace HWY_NAMESPACE {
 void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4);
-    matrix(c);
-    const RgbVectors linear = c;
-    const auto scaled = [&](ColorVector v) HWY_ATTR { return hn::Mul(hn::Abs(v), hn::Set(d, 0.01f)); };
-    c = {scaled(c.r), scaled(c.g), scaled(c.b)};
-    Power3<PowerCore::Float>(c.r, c.g, c.b, kPqM1);
-    const auto ratio = [&](ColorVector y) HWY_ATTR {
-      return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
-                     hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
-    };
-    c = {ratio(c.r), ratio(c.g), ratio(c.b)};
-    Power3<PowerCore::Double>(c.r, c.g, c.b, kPqM2);
-    const auto scale = hn::Set(d, local.scale);
-    c = {WithSignOf(hn::Mul(c.r, scale), linear.r), WithSignOf(hn::Mul(c.g, scale), linear.g),
-         WithSignOf(hn::Mul(c.b, scale), linear.b)};
-  });
+  ForEachPixel(
+      src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE { SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4); },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        matrix(c);
+        const auto scale = hn::Set(d, 0.01f);
+        c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
+        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPqM1);
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        const RgbVectors in = c;
+        const auto ratio = [&](ColorVector v) HWY_ATTR {
+          const auto y = hn::Abs(v);
+          return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
+                         hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
+        };
+        c = {ratio(c.r), ratio(c.g), ratio(c.b)};
+        Power3<PowerCore::Long>(c.r, c.g, c.b, kPqM2);
+        const auto scale = hn::Set(d, local.scale);
+        c = {WithSignOf(hn::Mul(c.r, scale), in.r), WithSignOf(hn::Mul(c.g, scale), in.g),
+             WithSignOf(hn::Mul(c.b, scale), in.b)};
+      });
 }
 
 void PqTableToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
+  ForEachPixel(src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE {
     c = {LookupUnit(c.r, local.table, kPqTableSize), LookupUnit(c.g, local.table, kPqTableSize),
          LookupUnit(c.b, local.table, kPqTableSize)};
     matrix(c);
@@ -56,25 +61,33 @@ template <bool kCompressed>
 HWY_INLINE void PqToRec709Loop(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    const RgbVectors in = c;
-    const auto scale = hn::Set(d, local.scale);
-    c = {hn::Mul(hn::Abs(c.r), scale), hn::Mul(hn::Abs(c.g), scale), hn::Mul(hn::Abs(c.b), scale)};
-    Power3<PowerCore::Float>(c.r, c.g, c.b, kPqInverseM2);
-    const auto ratio = [&](ColorVector e) HWY_ATTR {
-      return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)))),
-                     hn::Zero(d));
-    };
-    c = {ratio(c.r), ratio(c.g), ratio(c.b)};
-    Power3<PowerCore::Double>(c.r, c.g, c.b, kPqInverseM1);
-    const auto light = [&](ColorVector v, ColorVector signal)
-                           HWY_ATTR { return WithSignOf(hn::Mul(v, hn::Set(d, 100.0f)), signal); };
-    c = {light(c.r, in.r), light(c.g, in.g), light(c.b, in.b)};
-    if (local.applyMatrix) matrix(c);
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
-    if constexpr (kCompressed) CompressGamut(c, local.luma);
-  });
+  ForEachPixel(
+      src, dst, count,
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        const auto scale = hn::Set(d, local.scale);
+        c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
+        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPqInverseM2);
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        const RgbVectors in = c;
+        const auto ratio = [&](ColorVector v) HWY_ATTR {
+          const auto e = hn::Abs(v);
+          const auto below = hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)));
+          return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), below), hn::Zero(d));
+        };
+        c = {ratio(c.r), ratio(c.g), ratio(c.b)};
+        Power3<PowerCore::Long>(c.r, c.g, c.b, kPqInverseM1);
+        const auto light = [&](ColorVector v, ColorVector signal)
+                               HWY_ATTR { return WithSignOf(hn::Mul(v, hn::Set(d, 100.0f)), signal); };
+        c = {light(c.r, in.r), light(c.g, in.g), light(c.b, in.b)};
+        if (local.applyMatrix) matrix(c);
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
+        if constexpr (kCompressed) CompressGamut(c, local.luma);
+      });
 }
 
 void PqToRec709(const float* src, float* dst, size_t count, const PqJob& job) {

@@ -56,39 +56,50 @@ HWY_INLINE void EncodeTones(RgbVectors& c, const ToneCurve& curve) {
   c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
 }
 
-// Luminance to compressed luminance.
-HWY_INLINE ColorVector CompressLuminance(ColorVector y, const ToneJob& job) {
+// The first half of the luminance curve: luminance to its place t on the curve, 0 at mid-tones, +-1 at the ends.
+HWY_INLINE ColorVector CurvePlace(ColorVector y, const ToneJob& job) {
   const ColorTag d;
   const auto one = hn::Set(d, 1.0f);
   const auto scaled = hn::Mul(hn::Mul(hn::Max(y, hn::Zero(d)), hn::Set(d, job.a)), hn::Set(d, kLogScale));
-  const auto t = hn::Sub(hn::Mul(Log10(hn::Add(scaled, one)), hn::Set(d, 0.5f)), one);
+  return hn::Sub(hn::Mul(Log10(hn::Add(scaled, one)), hn::Set(d, 0.5f)), one);
+}
+
+HWY_INLINE ColorVector BendCurve(ColorVector t, const ToneJob& job) {
+  const ColorTag d;
+  const auto one = hn::Set(d, 1.0f);
   const auto u = hn::Min(hn::Abs(t), one);
   const auto s = hn::Div(hn::Sub(u, hn::Set(d, job.k)), hn::Set(d, 1.0f - job.k));
   const auto rest = hn::Sub(one, PowerAny(hn::Sub(one, s), job.shape));
   const auto curved = hn::Add(hn::Mul(rest, hn::Set(d, 1.0f - job.c)), hn::Set(d, job.c));
   const auto straight = hn::Mul(u, hn::Set(d, job.b));
-  const auto w = WithSignOf(hn::IfThenElse(hn::Gt(u, hn::Set(d, job.k)), curved, straight), t);
-  // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
-  return hn::Mul(hn::Sub(Exp10(hn::Add(w, one)), one), hn::Set(d, kLogRange));
+  return WithSignOf(hn::IfThenElse(hn::Gt(u, hn::Set(d, job.k)), curved, straight), t);
 }
 
 void CompressTones(const float* src, float* dst, size_t count, const ToneJob& job) {
   const ToneJob local = job;
   const MatrixVectors toXyz(local.toXyz), fromXyz(local.fromXyz);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    DecodeTones(c, local.decode);
-    toXyz(c);
-    const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
-    const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
-    const auto x = hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX));
-    const auto y = hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY));
-    const auto luminance = CompressLuminance(c.g, local);
-    const auto z = hn::Sub(hn::Sub(hn::Set(d, 1.0f), x), y);
-    c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
-    fromXyz(c);
-    EncodeTones(c, local.encode);
-  });
+  ForEachPixel(
+      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { DecodeTones(c, local.decode); },
+      [&](RgbVectors& c) VX_COLOR_STAGE {  // From here x, t, y stand for red, green, blue.
+        const ColorTag d;
+        toXyz(c);
+        const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
+        const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
+        c = {hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX)), CurvePlace(c.g, local),
+             hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY))};
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE { c.g = BendCurve(c.g, local); },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        const ColorTag d;
+        const auto one = hn::Set(d, 1.0f);
+        const auto x = c.r, y = c.b;
+        // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
+        const auto luminance = hn::Mul(hn::Sub(Exp10(hn::Add(c.g, one)), one), hn::Set(d, kLogRange));
+        const auto z = hn::Sub(hn::Sub(one, x), y);
+        c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
+        fromXyz(c);
+      },
+      [&](RgbVectors& c) VX_COLOR_STAGE { EncodeTones(c, local.encode); });
 }
 
 }  // namespace HWY_NAMESPACE

@@ -41,12 +41,13 @@ template <bool kFloat, GamutStep kStep>
 void PowerToPowerLoop(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;  // Nobody else's pointer reaches it, so constants stay in registers.
   const MatrixVectors matrix(local.matrix);
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    SignedPowerRgb<kFloat>(c, local.decode);
-    if constexpr (kStep != GamutStep::None) matrix(c);
-    if constexpr (kStep == GamutStep::MatrixAndCompression) CompressGamut(c, local.luma);
-    SignedPowerRgb<kFloat>(c, local.encode);
-  });
+  ForEachPixel(
+      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<kFloat>(c, local.decode); },
+      [&](RgbVectors& c) VX_COLOR_STAGE {
+        if constexpr (kStep != GamutStep::None) matrix(c);
+        if constexpr (kStep == GamutStep::MatrixAndCompression) CompressGamut(c, local.luma);
+        SignedPowerRgb<kFloat>(c, local.encode);
+      });
 }
 
 #define VX_POWER_TO_POWER(name, usual, step)                                      \
@@ -61,53 +62,48 @@ VX_POWER_TO_POWER(AnyPowerMatrix, false, GamutStep::Matrix)
 VX_POWER_TO_POWER(AnyPowerCompressed, false, GamutStep::MatrixAndCompression)
 #undef VX_POWER_TO_POWER
 
-// Lanes whose magnitude is above the threshold take the power, the others the linear segment.
-struct SrgbCurve {
-  hn::Mask<ColorTag> curved;
-  ColorVector straight;
-};
-HWY_INLINE SrgbCurve SplitSrgb(ColorVector magnitude, float threshold, float slope) {
+HWY_INLINE void EncodeSrgb(RgbVectors& c, const PowerExponent& exponent) {
   const ColorTag d;
-  return {hn::Gt(magnitude, hn::Set(d, threshold)), hn::Mul(magnitude, hn::Set(d, slope))};
+  const RgbVectors linear = c;
+  c = {hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)};
+  Power3<PowerCore::Float>(c.r, c.g, c.b, exponent);
+  const auto join = [&](ColorVector power, ColorVector in) HWY_ATTR {
+    const auto magnitude = hn::Abs(in);
+    const auto curve = hn::Sub(hn::Mul(power, hn::Set(d, kSrgbEncodeScale)), hn::Set(d, kSrgbOffset));
+    const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbEncodeSlope));
+    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbEncodeThreshold)), curve, straight), in);
+  };
+  c = {join(c.r, linear.r), join(c.g, linear.g), join(c.b, linear.b)};
+}
+
+HWY_INLINE void DecodeSrgb(RgbVectors& c, const PowerExponent& exponent) {
+  const ColorTag d;
+  const RgbVectors in = c;
+  const auto base = [&](ColorVector v) HWY_ATTR {
+    return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, kSrgbOffset)), hn::Set(d, kSrgbDecodeScale));
+  };
+  c = {base(c.r), base(c.g), base(c.b)};
+  Power3<PowerCore::Float>(c.r, c.g, c.b, exponent);
+  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
+    const auto magnitude = hn::Abs(v);
+    const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbDecodeSlope));
+    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbDecodeThreshold)), power, straight), v);
+  };
+  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
 }
 
 void PowerToSrgb(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, local.decode);
-    const RgbVectors linear = c;
-    c = {hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)};
-    const SrgbCurve r = SplitSrgb(c.r, kSrgbEncodeThreshold, kSrgbEncodeSlope);
-    const SrgbCurve g = SplitSrgb(c.g, kSrgbEncodeThreshold, kSrgbEncodeSlope);
-    const SrgbCurve b = SplitSrgb(c.b, kSrgbEncodeThreshold, kSrgbEncodeSlope);
-    Power3<PowerCore::Float>(c.r, c.g, c.b, local.encode);
-    const auto join = [&](const SrgbCurve& part, ColorVector power, ColorVector in) HWY_ATTR {
-      const auto curve = hn::Sub(hn::Mul(power, hn::Set(d, kSrgbEncodeScale)), hn::Set(d, kSrgbOffset));
-      return WithSignOf(hn::IfThenElse(part.curved, curve, part.straight), in);
-    };
-    c = {join(r, c.r, linear.r), join(g, c.g, linear.g), join(b, c.b, linear.b)};
-  });
+  ForEachPixel(
+      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<true>(c, local.decode); },
+      [&](RgbVectors& c) VX_COLOR_STAGE { EncodeSrgb(c, local.encode); });
 }
 
 void SrgbToPower(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;
-  ForEachPixelBlock(src, dst, count, [&](RgbVectors& c) HWY_ATTR {
-    const ColorTag d;
-    const RgbVectors in = c;
-    const SrgbCurve r = SplitSrgb(hn::Abs(c.r), kSrgbDecodeThreshold, kSrgbDecodeSlope);
-    const SrgbCurve g = SplitSrgb(hn::Abs(c.g), kSrgbDecodeThreshold, kSrgbDecodeSlope);
-    const SrgbCurve b = SplitSrgb(hn::Abs(c.b), kSrgbDecodeThreshold, kSrgbDecodeSlope);
-    const auto base = [&](ColorVector v) HWY_ATTR {
-      return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, kSrgbOffset)), hn::Set(d, kSrgbDecodeScale));
-    };
-    c = {base(c.r), base(c.g), base(c.b)};
-    Power3<PowerCore::Float>(c.r, c.g, c.b, local.decode);
-    const auto join = [&](const SrgbCurve& part, ColorVector power, ColorVector v)
-                          HWY_ATTR { return WithSignOf(hn::IfThenElse(part.curved, power, part.straight), v); };
-    c = {join(r, c.r, in.r), join(g, c.g, in.g), join(b, c.b, in.b)};
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, local.encode);
-  });
+  ForEachPixel(
+      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { DecodeSrgb(c, local.decode); },
+      [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<true>(c, local.encode); });
 }
 
 }  // namespace HWY_NAMESPACE

@@ -37,11 +37,11 @@ HWY_INLINE RgbVectors FromYuv(ColorVector y, ColorVector cb, ColorVector cr) {
 
 // The pixel order V, U, Y, A stands where B, G, R, A stands otherwise.
 void Yuv2020ToRgb(const float* src, float* dst, size_t count) {
-  ForEachPixelBlock(src, dst, count, [](RgbVectors& c) HWY_ATTR { c = FromYuv(c.r, c.g, c.b); });
+  ForEachPixel(src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE { c = FromYuv(c.r, c.g, c.b); });
 }
 
 void RgbToYuv2020(const float* src, float* dst, size_t count) {
-  ForEachPixelBlock(src, dst, count, [](RgbVectors& c) HWY_ATTR {
+  ForEachPixel(src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE {
     const ColorTag d;
     const auto product = [&](int i, ColorVector v) HWY_ATTR { return hn::Mul(v, hn::Set(d, kFromRgb[i])); };
     const auto cr = hn::Sub(hn::Sub(product(0, c.r), product(1, c.g)), product(2, c.b));

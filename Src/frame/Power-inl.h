@@ -6,6 +6,7 @@
 #define VEXEL_FRAME_POWER_INL_H_
 #endif
 
+#include <bit>
 #include <cstddef>
 #include <cstdint>
 
@@ -38,6 +39,11 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
 }  // namespace power_detail
 HWY_INLINE power_detail::V Log(power_detail::V x) { return power_detail::V(vexel::Log(x.raw)); }
 HWY_INLINE power_detail::V Log10(power_detail::V x) { return power_detail::V(vexel::Log10(x.raw)); }
+HWY_INLINE void Log3(power_detail::V& a, power_detail::V& b, power_detail::V& c) {
+  a = Log(a);
+  b = Log(b);
+  c = Log(c);
+}
 HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::V(vexel::Exp(x.raw)); }
 HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::V(vexel::Exp10(x.raw)); }
 
@@ -81,151 +87,252 @@ HWY_INLINE hn::Vec<hn::ScalableTag<float>> LookupEighth(const float* table, cons
 }
 #endif
 
+#ifndef VX_POWER_STEP
+#define VX_POWER_STEP HWY_ATTR __attribute__((always_inline))
+#endif
+
 namespace power_detail {
 
 using D = hn::ScalableTag<float>;
 using DI = hn::ScalableTag<int32_t>;
-using DD = hn::ScalableTag<double>;
-using DHalf = hn::Half<D>;
-using DIHalf = hn::Half<DI>;
 using V = hn::Vec<D>;
 using VI = hn::Vec<DI>;
 
-struct SplitArgument {
-  VI eighths;
-  V mantissa;
+// kRoot less the low bits of its index at their place in the exponent's shift.
+struct ShiftedRoot {
+  constexpr ShiftedRoot() : entries{} {
+    for (uint32_t j = 0; j < 8; ++j)
+      entries[j] = std::bit_cast<float>(std::bit_cast<uint32_t>(power::kRoot[j]) - (j << 20));
+  }
+  alignas(32) float entries[8];
 };
+inline constexpr ShiftedRoot kShiftedRoot;
 
-// kAll: denormals too.
-template <bool kAll>
-HWY_INLINE SplitArgument Split(V x) {
+// mantissa * 2^(the whole octaves of a count), the bits of which are given; any count.
+HWY_INLINE V ScaleByEighths(V mantissa, VI countBits) {
   const D d;
   const DI di;
-  VI i = hn::BitCast(di, x);
-  if constexpr (kAll) {
-    const VI renormalised = hn::Sub(hn::BitCast(di, hn::ConvertTo(d, i)), hn::Set(di, 149 << 23));
-    i = hn::IfThenElse(hn::Lt(i, hn::Set(di, 0x00800000)), renormalised, i);
-  }
-  const VI first = hn::Set(di, static_cast<int32_t>(power::kFirstBits));
-  i = hn::Sub(i, first);
-  const VI mantissa = hn::Add(hn::And(i, hn::Set(di, static_cast<int32_t>(power::kMantissaMask))), first);
-  return {hn::ShiftRight<20>(i), hn::BitCast(d, mantissa)};
+  const VI n =
+      hn::ShiftRight<3>(hn::Sub(countBits, hn::Set(di, static_cast<int32_t>(vexel::power::kEighthsMagicBits))));
+  const VI inRange = hn::Min(hn::Max(n, hn::Set(di, -151)), hn::Set(di, 128));
+  const VI infinity = hn::Set(di, 0x7f800000);
+  const VI normal = hn::Min(hn::Add(hn::BitCast(di, mantissa), hn::ShiftLeft<23>(inRange)), infinity);
+  const VI unitExponent = hn::Add(hn::Min(inRange, hn::Set(di, -120)), hn::Set(di, 149 + 127));
+  const VI denormal = ConvertNearest(hn::Mul(mantissa, hn::BitCast(d, hn::ShiftLeft<23>(unitExponent))));
+  VI result = hn::IfThenElse(hn::Lt(n, hn::Set(di, -125)), denormal, normal);
+  result = hn::IfThenElse(hn::Gt(n, hn::Set(di, 128)), infinity, result);
+  return hn::BitCast(d, result);
 }
 
-// `count` is eighths + kEighthsMagic. kAll: results that overflow or are denormal too.
-template <bool kAll>
-HWY_INLINE V Exp2Tail(V count, V f) {
-  const D d;
-  const DI di;
-  const VI bits = hn::BitCast(di, count);
-  const EighthIndex index = MakeEighthIndex(bits);
-  const V f2 = hn::Mul(f, f);
-  const V series = hn::Add(hn::Add(hn::Set(d, power::kExp2[0]), hn::Mul(f, hn::Set(d, power::kExp2[1]))),
-                           hn::Mul(f2, hn::Add(hn::Set(d, power::kExp2[2]), hn::Mul(f, hn::Set(d, power::kExp2[3])))));
-  const V g = hn::Mul(f, series);
-  const V root = LookupEighth(power::kRoot, index);
-  const V mantissa = hn::Add(root, hn::Add(LookupEighth(power::kRootRest, index), hn::Mul(root, g)));
-  if constexpr (!kAll) {
-    // The low bits, shifted to the exponent's place and freed of the eighths.
-    const VI exponent = hn::And(hn::ShiftLeft<20>(bits), hn::Set(di, static_cast<int32_t>(0xff800000)));
-    return hn::BitCast(d, hn::Add(hn::BitCast(di, mantissa), exponent));
+// Several vectors that advance together. The chain of a power is longer than the scheduler of a processor looks ahead,
+// so three powers overlap only if the program lists their instructions step by step. Map keeps that order: the empty
+// statements pin each step's results before the next step.
+template <size_t N>
+struct Bundle {
+  V a;
+};
+template <>
+struct Bundle<3> {  // Not an array, which compilers keep in memory.
+  V a, b, c;
+};
+
+HWY_INLINE void EndStep(V& v) {
+#if defined(__GNUC__)
+  asm volatile("" : "+v"(v.raw));
+#endif
+}
+
+template <size_t N, class F, class... Bundles>
+HWY_INLINE Bundle<N> Map(const F& f, const Bundles&... args) {
+  if constexpr (N == 1) {
+    return {f(args.a...)};
   } else {
-    const VI n = hn::ShiftRight<3>(hn::Sub(bits, hn::Set(di, static_cast<int32_t>(power::kEighthsMagicBits))));
-    const VI inRange = hn::Min(hn::Max(n, hn::Set(di, -151)), hn::Set(di, 128));
-    const VI infinity = hn::Set(di, 0x7f800000);
-    const VI normal = hn::Min(hn::Add(hn::BitCast(di, mantissa), hn::ShiftLeft<23>(inRange)), infinity);
-    const VI unitExponent = hn::Add(hn::Min(inRange, hn::Set(di, -120)), hn::Set(di, 149 + 127));
-    const VI denormal = ConvertNearest(hn::Mul(mantissa, hn::BitCast(d, hn::ShiftLeft<23>(unitExponent))));
-    VI result = hn::IfThenElse(hn::Lt(n, hn::Set(di, -125)), denormal, normal);
-    result = hn::IfThenElse(hn::Gt(n, hn::Set(di, 128)), infinity, result);
-    return hn::BitCast(d, result);
+    static_assert(N == 3);
+    return {f(args.a...), f(args.b...), f(args.c...)};
   }
 }
 
-template <bool kAll>
-HWY_INLINE V Exp2Pair(V high, V low) {
-  const V magic = hn::Set(D(), power::kEighthsMagic);
-  const V count = hn::Add(hn::Add(high, low), magic);
-  return Exp2Tail<kAll>(count, hn::Add(hn::Sub(high, hn::Sub(count, magic)), low));
+template <size_t N, class... Bundles>
+HWY_INLINE void EndStep(Bundles&... bundles) {
+  if constexpr (N == 3) {
+    (EndStep(bundles.a), ...);
+    (EndStep(bundles.b), ...);
+    (EndStep(bundles.c), ...);
+  }
 }
 
-template <bool kAll>
-HWY_INLINE V PowerFloat(V x, const PowerExponent& y) {
+// The bits of x from the first segment on. kAll: denormals too.
+template <bool kAll, size_t N>
+HWY_INLINE Bundle<N> SegmentBits(const Bundle<N>& x) {
   const D d;
-  const SplitArgument s = Split<kAll>(x);
-  const EighthIndex index = MakeEighthIndex(s.eighths);
-  const V k = hn::ConvertTo(d, s.eighths);
-  const V w = hn::Mul(hn::Sub(s.mantissa, LookupEighth(power::kCentre, index)), LookupEighth(y.slope, index));
-  const V w2 = hn::Mul(w, w);
-  const V series = hn::Add(hn::Add(hn::Set(d, y.series[0]), hn::Mul(w, hn::Set(d, y.series[1]))),
-                           hn::Mul(w2, hn::Add(hn::Set(d, y.series[2]), hn::Mul(w, hn::Set(d, y.series[3])))));
-  const V rest = hn::Add(w, hn::Mul(w2, series));
-  return Exp2Pair<kAll>(hn::Mul(hn::Set(d, y.eighthHigh), k),
-                        hn::Add(hn::Mul(hn::Set(d, y.eighthLow), k), hn::Add(LookupEighth(y.offset, index), rest)));
+  const DI di;
+  return Map<N>(
+      [&](V v) VX_POWER_STEP {
+        VI i = hn::BitCast(di, v);
+        if constexpr (kAll) {
+          const VI renormalised = hn::Sub(hn::BitCast(di, hn::ConvertTo(d, i)), hn::Set(di, 149 << 23));
+          i = hn::IfThenElse(hn::Lt(i, hn::Set(di, 0x00800000)), renormalised, i);
+        }
+        return hn::BitCast(d, hn::Sub(i, hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits))));
+      },
+      x);
 }
 
-// log2 of half a vector.
-HWY_INLINE hn::Vec<DD> Log2Double(hn::Vec<DIHalf> eighths, hn::Vec<DHalf> mantissa, hn::Vec<DHalf> reciprocal,
-                                  hn::Vec<DHalf> offset) {
-  const DD dd;
-  const auto r = hn::Sub(hn::Mul(hn::PromoteTo(dd, mantissa), hn::PromoteTo(dd, reciprocal)), hn::Set(dd, 1.0));
-  const auto r2 = hn::Mul(r, r);
-  const double* c = power::kLog2;
-  const auto c01 = hn::Add(hn::Set(dd, c[0]), hn::Mul(r, hn::Set(dd, c[1])));
-  const auto c23 = hn::Add(hn::Set(dd, c[2]), hn::Mul(r, hn::Set(dd, c[3])));
-  const auto c45 = hn::Add(hn::Set(dd, c[4]), hn::Mul(r, hn::Set(dd, c[5])));
-  const auto series = hn::Add(hn::Add(c01, hn::Mul(r2, c23)), hn::Mul(hn::Mul(r2, r2), c45));
-  return hn::Add(hn::Mul(hn::PromoteTo(dd, eighths), hn::Set(dd, 0.125)),
-                 hn::Add(hn::PromoteTo(dd, offset), hn::Mul(r, series)));
+// Eighths of an octave, as integers.
+template <size_t N>
+HWY_INLINE Bundle<N> EighthsOf(const Bundle<N>& bits) {
+  return Map<N>([](V v) VX_POWER_STEP { return hn::BitCast(D(), hn::ShiftRight<20>(hn::BitCast(DI(), v))); }, bits);
 }
 
-struct DoublePair {
-  hn::Vec<DD> lower, upper;
-};
-
-template <bool kAll>
-HWY_INLINE DoublePair Log2Double(V x) {
-  const DHalf dh;
-  const DIHalf dih;
-  const SplitArgument s = Split<kAll>(x);
-  const EighthIndex index = MakeEighthIndex(s.eighths);
-  const V reciprocal = LookupEighth(power::kReciprocal, index);
-  const V offset = LookupEighth(power::kReciprocalOffset, index);
-  return {Log2Double(hn::LowerHalf(dih, s.eighths), hn::LowerHalf(dh, s.mantissa), hn::LowerHalf(dh, reciprocal),
-                     hn::LowerHalf(dh, offset)),
-          Log2Double(hn::UpperHalf(dih, s.eighths), hn::UpperHalf(dh, s.mantissa), hn::UpperHalf(dh, reciprocal),
-                     hn::UpperHalf(dh, offset))};
+// The mantissa less the centre of its segment.
+template <size_t N>
+HWY_INLINE Bundle<N> FractionOf(const Bundle<N>& bits, const Bundle<N>& eighths) {
+  const D d;
+  const DI di;
+  return Map<N>(
+      [&](V v, V k) VX_POWER_STEP {
+        const VI mask = hn::Set(di, static_cast<int32_t>(vexel::power::kMantissaMask));
+        const VI first = hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits));
+        const V mantissa = hn::BitCast(d, hn::Add(hn::And(hn::BitCast(di, v), mask), first));
+        return hn::Sub(mantissa, LookupEighth(vexel::power::kCentre, MakeEighthIndex(hn::BitCast(di, k))));
+      },
+      bits, eighths);
 }
 
-HWY_INLINE V DemoteBoth(hn::Vec<DD> lower, hn::Vec<DD> upper) {
-  const DHalf dh;
-  return hn::Combine(D(), hn::DemoteTo(dh, upper), hn::DemoteTo(dh, lower));
+// factor * eighths + offsets[segment].
+template <size_t N>
+HWY_INLINE Bundle<N> Linear(float factor, const float* offsets, const Bundle<N>& eighths) {
+  const D d;
+  const DI di;
+  return Map<N>(
+      [&](V k) VX_POWER_STEP {
+        const V product = hn::Mul(hn::Set(d, factor), hn::ConvertTo(d, hn::BitCast(di, k)));
+        return offsets ? hn::Add(product, LookupEighth(offsets, MakeEighthIndex(hn::BitCast(di, k)))) : product;
+      },
+      eighths);
 }
 
-template <bool kAll>
-HWY_INLINE V PowerDouble(V x, const PowerExponent& y) {
-  const DD dd;
-  const DoublePair log2 = Log2Double<kAll>(x);
-  const auto exponent = hn::Set(dd, static_cast<double>(y.exponent));
-  auto lower = hn::Mul(exponent, log2.lower);
-  auto upper = hn::Mul(exponent, log2.upper);
-  if constexpr (kAll) {
-    const auto most = hn::Set(dd, 1024.0);
-    const auto least = hn::Set(dd, -1024.0);
-    lower = hn::Max(hn::Min(lower, most), least);
-    upper = hn::Max(hn::Min(upper, most), least);
+// start + w^2 * series(w).
+template <size_t N>
+HWY_INLINE Bundle<N> Curve(const Bundle<N>& start, const Bundle<N>& w, const vexel::power::ScaledLog2& log) {
+  const D d;
+  auto s = Map<N>(
+      [&](V v) VX_POWER_STEP { return hn::Add(hn::Mul(v, hn::Set(d, log.series[3])), hn::Set(d, log.series[2])); }, w);
+  s = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), hn::Set(d, log.series[1])); }, w, s);
+  s = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), hn::Set(d, log.series[0])); }, w, s);
+  return Map<N>([&](V a, V v, V p) VX_POWER_STEP { return hn::Add(a, hn::Mul(hn::Mul(v, v), p)); }, start, w, s);
+}
+
+// scale * log2(x) as a sum; the float form has no middle term.
+template <bool kAll, size_t N>
+HWY_INLINE void FloatLog(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& large, Bundle<N>& small) {
+  const auto bits = SegmentBits<kAll>(x);
+  const auto eighths = EighthsOf(bits);
+  const auto fraction = FractionOf(bits, eighths);
+  auto w =
+      Map<N>([&](V r, V k)
+                 VX_POWER_STEP { return hn::Mul(r, LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(DI(), k)))); },
+             fraction, eighths);
+  large = Linear(log.eighthHigh, nullptr, eighths);
+  auto offset = Linear(log.eighthLow, log.offsets, eighths);
+  EndStep<N>(w, large, offset);
+  const auto curve = Curve(w, w, log);
+  small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
+}
+
+template <bool kAll, size_t N>
+HWY_INLINE void LongLog(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& large, Bundle<N>& middle,
+                        Bundle<N>& small) {
+  const DI di;
+  const V mask = hn::BitCast(D(), hn::Set(di, static_cast<int32_t>(0xfffff000)));
+  const auto bits = SegmentBits<kAll>(x);
+  const auto eighths = EighthsOf(bits);
+  const auto fraction = FractionOf(bits, eighths);
+  middle = Map<N>(
+      [&](V r, V k) VX_POWER_STEP {
+        return hn::Mul(hn::And(r, mask), LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(di, k))));
+      },
+      fraction, eighths);
+  auto rest = Map<N>(
+      [&](V r, V k) VX_POWER_STEP {
+        const EighthIndex index = MakeEighthIndex(hn::BitCast(di, k));
+        return hn::Add(hn::Mul(hn::Sub(r, hn::And(r, mask)), LookupEighth(log.slopes, index)),
+                       hn::Mul(r, LookupEighth(log.slopeRests, index)));
+      },
+      fraction, eighths);
+  large = Linear(log.eighthHigh, log.offsetsHigh, eighths);
+  auto offset = Linear(log.eighthLow, log.offsets, eighths);
+  EndStep<N>(rest, large, middle, offset);
+  const auto w = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, middle, rest);
+  const auto curve = Curve(rest, w, log);
+  small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
+}
+
+// 2^(n / 8 + f); `count` is n / 8 + kEighthsMagic, |f| at most 1/16. kAll: results that overflow or are denormal too.
+template <bool kAll, size_t N>
+HWY_INLINE Bundle<N> Exp2Of(const Bundle<N>& count, const Bundle<N>& f) {
+  const D d;
+  const DI di;
+  const auto coefficient = [&](int i) VX_POWER_STEP { return hn::Set(d, vexel::power::kExp2[i]); };
+  auto series = Map<N>([&](V v) VX_POWER_STEP { return hn::Add(hn::Mul(v, coefficient(3)), coefficient(2)); }, f);
+  series = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), coefficient(1)); }, f, series);
+  series = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), coefficient(0)); }, f, series);
+  const auto g = Map<N>(
+      [&](V v, V p, V n) VX_POWER_STEP {
+        return hn::Add(LookupEighth(vexel::power::kRootRest, MakeEighthIndex(hn::BitCast(di, n))), hn::Mul(v, p));
+      },
+      f, series, count);
+  return Map<N>(
+      [&](V n, V part) VX_POWER_STEP {
+        const VI bits = hn::BitCast(di, n);
+        const EighthIndex index = MakeEighthIndex(bits);
+        if constexpr (!kAll) {
+          // The count shifted to the exponent's place; the eighths that come along are taken out of the table's
+          // entries.
+          const VI shifted = hn::BitCast(di, LookupEighth(kShiftedRoot.entries, index));
+          const V root = hn::BitCast(d, hn::Add(shifted, hn::ShiftLeft<20>(bits)));
+          return hn::Add(root, hn::Mul(root, part));
+        } else {
+          const V root = LookupEighth(vexel::power::kRoot, index);
+          return ScaleByEighths(hn::Add(root, hn::Mul(root, part)), bits);
+        }
+      },
+      count, g);
+}
+
+template <bool kAll, size_t N>
+HWY_INLINE Bundle<N> Exp2OfSum(const Bundle<N>& large, const Bundle<N>& small) {
+  const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
+  auto count = Map<N>([&](V a, V c) VX_POWER_STEP { return hn::Add(hn::Add(a, c), magic); }, large, small);
+  auto f = Map<N>([&](V a, V n, V c) VX_POWER_STEP { return hn::Add(hn::Sub(a, hn::Sub(n, magic)), c); }, large, count,
+                  small);
+  EndStep<N>(count, f);
+  return Exp2Of<kAll>(count, f);
+}
+
+template <bool kAll, PowerCore kCore, size_t N>
+HWY_INLINE Bundle<N> PowersOf(const Bundle<N>& x, const PowerExponent& y) {
+  Bundle<N> large, small;
+  if constexpr (kCore == PowerCore::Float) {
+    FloatLog<kAll>(x, y.log, large, small);
+    return Exp2OfSum<kAll>(large, small);
+  } else {
+    Bundle<N> middle;
+    LongLog<kAll>(x, y.log, large, middle, small);
+    const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
+    auto count = Map<N>([&](V a, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Add(a, b), c), magic); }, large,
+                        middle, small);
+    auto f =
+        Map<N>([&](V a, V n, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Sub(a, hn::Sub(n, magic)), b), c); },
+               large, count, middle, small);
+    EndStep<N>(count, f);
+    return Exp2Of<kAll>(count, f);
   }
-  const auto magic = hn::Set(dd, power::kEighthsMagicDouble);
-  const auto lowerEighths = hn::Sub(hn::Add(lower, magic), magic);
-  const auto upperEighths = hn::Sub(hn::Add(upper, magic), magic);
-  const V count = hn::Add(DemoteBoth(lowerEighths, upperEighths), hn::Set(D(), power::kEighthsMagic));
-  return Exp2Tail<kAll>(count, DemoteBoth(hn::Sub(lower, lowerEighths), hn::Sub(upper, upperEighths)));
 }
 
 template <bool kAll, PowerCore kCore>
 HWY_INLINE V PowerCoreOf(V x, const PowerExponent& y) {
-  if constexpr (kCore == PowerCore::Float) return PowerFloat<kAll>(x, y);
-  return PowerDouble<kAll>(x, y);
+  return PowersOf<kAll, kCore>(Bundle<1>{x}, y).a;
 }
 
 // Any argument at all. kSigned: sign(x) * |x|^y, NaN without a sign.
@@ -253,38 +360,52 @@ HWY_NOINLINE V PowerLaneByLane(V x, const PowerExponent& y) {
   return hn::Load(d, lanes);
 }
 
-// Lanes that the fast form does not cover; zero, which is common, it does. `bits` of a magnitude or of any float.
-HWY_INLINE hn::Mask<DI> OutsideFastRange(VI bits, hn::Mask<DI> isZero, const PowerExponent& y) {
+// How far the bits of a magnitude lie above the first of the fast range: beyond FastSpan for those that the fast form
+// does not cover. Both are flipped in the top bit, so that signed comparison orders them.
+constexpr uint32_t kFlip = 0x80000000;
+HWY_INLINE VI AboveFirst(V magnitude, const PowerExponent& y) {
   const DI di;
-  const uint32_t flip = 0x80000000;  // Unsigned comparison by a signed one.
-  const VI above = hn::Sub(bits, hn::Set(di, static_cast<int32_t>(y.firstBits + flip)));
-  const VI span = hn::Set(di, static_cast<int32_t>(y.lastBits - y.firstBits + flip));
-  return hn::AndNot(isZero, hn::Gt(above, span));
+  return hn::Sub(hn::BitCast(di, magnitude), hn::Set(di, static_cast<int32_t>(y.firstBits + kFlip)));
+}
+HWY_INLINE VI FastSpan(const PowerExponent& y) {
+  return hn::Set(DI(), static_cast<int32_t>(y.lastBits - y.firstBits + kFlip));
+}
+
+template <bool kSigned>
+HWY_INLINE V Magnitude(V x) {
+  return kSigned ? hn::Abs(x) : x;
+}
+
+template <bool kSigned>
+HWY_INLINE V WithSign(V power, V x) {
+  return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(D()))) : power;
 }
 
 template <PowerCore kCore, bool kSigned>
-struct FastPower {
-  HWY_INLINE FastPower(V x, const PowerExponent& y)
-      : argument(kSigned ? hn::Abs(x) : x),
-        isZero(hn::Eq(hn::BitCast(DI(), argument), hn::Zero(DI()))),
-        outside(OutsideFastRange(hn::BitCast(DI(), argument), isZero, y)) {}
-  // x again, so that it need not be kept.
-  HWY_INLINE V Result(V x, const PowerExponent& y) const {
-    const V power = hn::IfThenZeroElse(hn::RebindMask(D(), isZero), PowerCoreOf<false, kCore>(argument, y));
-    return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(D()))) : power;
-  }
-  V argument;
-  hn::Mask<DI> isZero, outside;
-};
+HWY_INLINE V FastPower(V x, const PowerExponent& y) {
+  return WithSign<kSigned>(PowerCoreOf<false, kCore>(Magnitude<kSigned>(x), y), x);
+}
+
+// With arguments outside the fast range among them. Zeros, the usual ones, cost little.
+template <PowerCore kCore, bool kSigned>
+HWY_NOINLINE V RarePower(V x, const PowerExponent& y) {
+  const D d;
+  const DI di;
+  const V magnitude = Magnitude<kSigned>(x);
+  const auto isZero = hn::Eq(hn::BitCast(di, magnitude), hn::Zero(di));
+  const auto outside = hn::AndNot(isZero, hn::Gt(AboveFirst(magnitude, y), FastSpan(y)));
+  if (!hn::AllFalse(di, outside)) return PowerAll<kCore, kSigned>(x, y);
+  return hn::IfThenElse(hn::RebindMask(d, isZero), x, FastPower<kCore, kSigned>(x, y));
+}
 
 template <PowerCore kCore, bool kSigned>
 HWY_INLINE V Power1(V x, const PowerExponent& y) {
   if constexpr (kCore == PowerCore::Scalar) {
     return PowerLaneByLane<kSigned>(x, y);
   } else {
-    const FastPower<kCore, kSigned> fast(x, y);
-    if (HWY_UNLIKELY(!hn::AllFalse(DI(), fast.outside))) return PowerAll<kCore, kSigned>(x, y);
-    return fast.Result(x, y);
+    const VI above = AboveFirst(Magnitude<kSigned>(x), y);
+    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Gt(above, FastSpan(y))))) return RarePower<kCore, kSigned>(x, y);
+    return FastPower<kCore, kSigned>(x, y);
   }
 }
 
@@ -295,56 +416,70 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
     b = PowerLaneByLane<kSigned>(b, y);
     c = PowerLaneByLane<kSigned>(c, y);
   } else {
-    const FastPower<kCore, kSigned> fastA(a, y), fastB(b, y), fastC(c, y);
-    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Or(hn::Or(fastA.outside, fastB.outside), fastC.outside)))) {
-      a = PowerAll<kCore, kSigned>(a, y);
-      b = PowerAll<kCore, kSigned>(b, y);
-      c = PowerAll<kCore, kSigned>(c, y);
+    const VI above = hn::Max(hn::Max(AboveFirst(Magnitude<kSigned>(a), y), AboveFirst(Magnitude<kSigned>(b), y)),
+                             AboveFirst(Magnitude<kSigned>(c), y));
+    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Gt(above, FastSpan(y))))) {
+      a = RarePower<kCore, kSigned>(a, y);
+      b = RarePower<kCore, kSigned>(b, y);
+      c = RarePower<kCore, kSigned>(c, y);
     } else {
-      a = fastA.Result(a, y);
-      b = fastB.Result(b, y);
-      c = fastC.Result(c, y);
+      const Bundle<3> powers =
+          PowersOf<false, kCore>(Bundle<3>{Magnitude<kSigned>(a), Magnitude<kSigned>(b), Magnitude<kSigned>(c)}, y);
+      a = WithSign<kSigned>(powers.a, a);
+      b = WithSign<kSigned>(powers.b, b);
+      c = WithSign<kSigned>(powers.c, c);
     }
   }
 }
 
-}  // namespace power_detail
-
-namespace power_detail {
-
-HWY_INLINE V LogOfBase(V x, double scale) {
+template <size_t N>
+HWY_INLINE Bundle<N> LogOfBase(const Bundle<N>& x, const vexel::power::ScaledLog2& log) {
   const D d;
   const DI di;
-  const DD dd;
-  const DoublePair log2 = Log2Double<true>(x);
-  const VI bits = hn::BitCast(di, x);
-  const VI infinity = hn::Set(di, 0x7f800000);
-  VI result =
-      hn::BitCast(di, DemoteBoth(hn::Mul(log2.lower, hn::Set(dd, scale)), hn::Mul(log2.upper, hn::Set(dd, scale))));
-  result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, result);
-  result = hn::IfThenElse(hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, hn::Zero(di))), hn::Set(di, 0x7fc00000), result);
-  result =
-      hn::IfThenElse(hn::Eq(hn::Add(bits, bits), hn::Zero(di)), hn::Set(di, static_cast<int32_t>(0xff800000)), result);
-  return hn::BitCast(d, result);
+  Bundle<N> large, middle, small;
+  LongLog<true>(x, log, large, middle, small);
+  return Map<N>(
+      [&](V in, V a, V b, V c) VX_POWER_STEP {
+        const V sum = hn::Add(a, b);
+        const V value = hn::Add(sum, hn::Add(hn::Sub(b, hn::Sub(sum, a)), c));
+        const VI bits = hn::BitCast(di, in);
+        const VI infinity = hn::Set(di, 0x7f800000);
+        const VI zero = hn::Zero(di);
+        const auto noNumber = hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, zero));
+        VI result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, hn::BitCast(di, value));
+        result = hn::IfThenElse(noNumber, hn::Set(di, 0x7fc00000), result);
+        result =
+            hn::IfThenElse(hn::Eq(hn::Add(bits, bits), zero), hn::Set(di, static_cast<int32_t>(0xff800000)), result);
+        return hn::BitCast(d, result);
+      },
+      x, large, middle, small);
 }
 
 HWY_INLINE V ExpOfBase(V x, const vexel::power::SplitFloat& log2Base) {
   const D d;
   const DI di;
-  const auto isNaN = hn::IsNaN(x);
   const V bounded = hn::Max(hn::Min(x, hn::Set(d, 256.0f)), hn::Set(d, -256.0f));
   const V top = hn::And(bounded, hn::BitCast(d, hn::Set(di, static_cast<int32_t>(0xfffff000))));
-  const V bottom = hn::Sub(bounded, top);
-  const V low =
-      hn::Add(hn::Mul(top, hn::Set(d, log2Base.low)), hn::Mul(bottom, hn::Set(d, log2Base.high + log2Base.low)));
-  const V result = Exp2Pair<true>(hn::Mul(top, hn::Set(d, log2Base.high)), low);
-  return hn::IfThenElse(isNaN, hn::BitCast(d, hn::Set(di, 0x7fc00000)), result);
+  const V low = hn::Add(hn::Mul(top, hn::Set(d, log2Base.low)),
+                        hn::Mul(hn::Sub(bounded, top), hn::Set(d, log2Base.high + log2Base.low)));
+  const Bundle<1> power = Exp2OfSum<true>(Bundle<1>{hn::Mul(top, hn::Set(d, log2Base.high))}, Bundle<1>{low});
+  return hn::IfThenElse(hn::IsNaN(x), hn::BitCast(d, hn::Set(di, 0x7fc00000)), power.a);
 }
 
 }  // namespace power_detail
 
-HWY_INLINE power_detail::V Log(power_detail::V x) { return power_detail::LogOfBase(x, power::kLn2); }
-HWY_INLINE power_detail::V Log10(power_detail::V x) { return power_detail::LogOfBase(x, power::kLog10Of2); }
+HWY_INLINE power_detail::V Log(power_detail::V x) {
+  return power_detail::LogOfBase(power_detail::Bundle<1>{x}, vexel::power::kNaturalLog).a;
+}
+HWY_INLINE power_detail::V Log10(power_detail::V x) {
+  return power_detail::LogOfBase(power_detail::Bundle<1>{x}, vexel::power::kDecimalLog).a;
+}
+HWY_INLINE void Log3(power_detail::V& a, power_detail::V& b, power_detail::V& c) {
+  const auto logs = power_detail::LogOfBase(power_detail::Bundle<3>{a, b, c}, vexel::power::kNaturalLog);
+  a = logs.a;
+  b = logs.b;
+  c = logs.c;
+}
 HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2EShort); }
 HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2Of10Short); }
 
@@ -373,15 +508,15 @@ HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detai
 // For exponents whose core is known only at run time.
 HWY_NOINLINE inline power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
   if (y.core == PowerCore::Float) return Power<PowerCore::Float>(x, y);
-  if (y.core == PowerCore::Double) return Power<PowerCore::Double>(x, y);
+  if (y.core == PowerCore::Long) return Power<PowerCore::Long>(x, y);
   return Power<PowerCore::Scalar>(x, y);
 }
 HWY_NOINLINE inline void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c,
                                          const PowerExponent& y) {
   if (y.core == PowerCore::Float) {
     SignedPower3<PowerCore::Float>(a, b, c, y);
-  } else if (y.core == PowerCore::Double) {
-    SignedPower3<PowerCore::Double>(a, b, c, y);
+  } else if (y.core == PowerCore::Long) {
+    SignedPower3<PowerCore::Long>(a, b, c, y);
   } else {
     SignedPower3<PowerCore::Scalar>(a, b, c, y);
   }

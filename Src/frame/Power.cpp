@@ -32,11 +32,9 @@ SplitArgument Split(float x) {
 float Exp2Tail(float eighths, float f) {
   const uint32_t count = std::bit_cast<uint32_t>(eighths + kEighthsMagic);
   const uint32_t j = count & 7;
-  const float f2 = f * f;
-  const float series = (power::kExp2[0] + f * power::kExp2[1]) + f2 * (power::kExp2[2] + f * power::kExp2[3]);
-  const float g = f * series;
+  const float series = power::kExp2[0] + f * (power::kExp2[1] + f * (power::kExp2[2] + f * power::kExp2[3]));
   const float root = power::kRoot[j];
-  const float mantissa = root + (power::kRootRest[j] + root * g);
+  const float mantissa = root + root * (power::kRootRest[j] + f * series);
   const int32_t n = static_cast<int32_t>(count - power::kEighthsMagicBits) >> 3;
   if (n > 128) return kInfinity;
   if (n < -125) {
@@ -64,15 +62,42 @@ double Log2Double(float x) {
   return static_cast<double>(s.eighths) * 0.125 + (power::kReciprocalOffset[j] + r * series);
 }
 
-float PowerFloat(float x, const PowerExponent& y) {
+float Series(const power::ScaledLog2& log, float w) {
+  return log.series[0] + w * (log.series[1] + w * (log.series[2] + w * log.series[3]));
+}
+
+float PowerFloat(float x, const power::ScaledLog2& log) {
   const SplitArgument s = Split(x);
   const int j = s.eighths & 7;
   const float k = static_cast<float>(s.eighths);
-  const float w = (s.mantissa - power::kCentre[j]) * y.slope[j];
-  const float w2 = w * w;
-  const float series = (y.series[0] + w * y.series[1]) + w2 * (y.series[2] + w * y.series[3]);
-  const float rest = w + w2 * series;
-  return Exp2Pair(y.eighthHigh * k, y.eighthLow * k + (y.offset[j] + rest));
+  const float w = (s.mantissa - power::kCentre[j]) * log.slopes[j];
+  const float rest = w + (w * w) * Series(log, w);
+  return Exp2Pair(log.eighthHigh * k, (log.eighthLow * k + log.offsets[j]) + rest);
+}
+
+// scale * log2(x) as the sum of three: `large` and `middle` exact and with trailing zeros, `small` below 2^-8 of the
+// scale.
+struct LongLog {
+  float large, middle, small;
+};
+
+LongLog LogLong(float x, const power::ScaledLog2& log) {
+  const SplitArgument s = Split(x);
+  const int j = s.eighths & 7;
+  const float k = static_cast<float>(s.eighths);
+  const float r = s.mantissa - power::kCentre[j];
+  const float top = std::bit_cast<float>(std::bit_cast<uint32_t>(r) & 0xfffff000);
+  const float middle = top * log.slopes[j];
+  const float rest = (r - top) * log.slopes[j] + r * log.slopeRests[j];
+  const float w = middle + rest;
+  const float curve = rest + (w * w) * Series(log, w);
+  return {log.eighthHigh * k + log.offsetsHigh[j], middle, (log.eighthLow * k + log.offsets[j]) + curve};
+}
+
+float PowerLong(float x, const power::ScaledLog2& log) {
+  const LongLog t = LogLong(x, log);
+  const float eighths = (((t.large + t.middle) + t.small) + kEighthsMagic) - kEighthsMagic;
+  return Exp2Tail(eighths, ((t.large - eighths) + t.middle) + t.small);
 }
 
 float PowerDouble(float x, float y) {
@@ -83,14 +108,14 @@ float PowerDouble(float x, float y) {
   return Exp2Tail(static_cast<float>(eighths), static_cast<float>(t - eighths));
 }
 
-// What the exponents give that have no core of their own.
+// What the exponents give that have no form of their own.
 float PowerScalar(float x, float y) {
   if (y == 0.0f || x == 1.0f) return 1.0f;
   if (x != x || y != y || x < 0.0f) return kQuietNaN;
   if (y == kInfinity) return x > 1.0f ? kInfinity : 0.0f;
   if (y == -kInfinity) return x > 1.0f ? 0.0f : kInfinity;
-  if (x == 0.0f) return kInfinity;
-  if (x == kInfinity) return 0.0f;
+  if (x == 0.0f) return y > 0.0f ? 0.0f : kInfinity;
+  if (x == kInfinity) return y > 0.0f ? kInfinity : 0.0f;
   return PowerDouble(x, y);
 }
 
@@ -106,12 +131,14 @@ float ExpOfBase(float x, const power::SplitFloat& log2Base) {
   return Exp2Pair(top * log2Base.high, top * log2Base.low + bottom * (log2Base.high + log2Base.low));
 }
 
-float LogOfBase(float x, double scale) {
+float LogOfBase(float x, const power::ScaledLog2& log) {
   if (IsNaN(x)) return kQuietNaN;
   if (x == 0.0f) return -kInfinity;
   if (x < 0.0f) return kQuietNaN;
   if (x == kInfinity) return kInfinity;
-  return static_cast<float>(Log2Double(x) * scale);
+  const LongLog t = LogLong(x, log);
+  const float sum = t.large + t.middle;
+  return sum + ((t.middle - (sum - t.large)) + t.small);
 }
 
 }  // namespace
@@ -122,7 +149,7 @@ float Power(float x, const PowerExponent& y) noexcept {
   if ((bits & 0x7fffffff) == 0) return 0.0f;
   if (bits == kInfinityBits) return kInfinity;
   if (bits > kInfinityBits) return kQuietNaN;
-  return y.core == PowerCore::Float ? PowerFloat(x, y) : PowerDouble(x, y.exponent);
+  return y.core == PowerCore::Float ? PowerFloat(x, y.log) : PowerLong(x, y.log);
 }
 
 float Power(float x, float y) noexcept { return Power(x, PowerExponent(y)); }
@@ -134,8 +161,8 @@ float SignedPower(float x, const PowerExponent& y) noexcept {
   return std::bit_cast<float>(std::bit_cast<uint32_t>(magnitude) | sign);
 }
 
-float Log(float x) noexcept { return LogOfBase(x, power::kLn2); }
-float Log10(float x) noexcept { return LogOfBase(x, power::kLog10Of2); }
+float Log(float x) noexcept { return LogOfBase(x, power::kNaturalLog); }
+float Log10(float x) noexcept { return LogOfBase(x, power::kDecimalLog); }
 float Exp(float x) noexcept { return ExpOfBase(x, power::kLog2EShort); }
 float Exp10(float x) noexcept { return ExpOfBase(x, power::kLog2Of10Short); }
 

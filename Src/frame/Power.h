@@ -6,8 +6,9 @@
 // flush-to-zero says; denormals-are-zero is not supported. Rounding must be to nearest.
 //
 // How: the bits of x split into k, the number of eighths of an octave, and a mantissa in one of eight segments;
-// log2(x) = k / 8 + (what is left, below 1/12), 2^t = 2^(n / 8) * (1 + f * polynomial), |f| <= 1/16. Small exponents
-// work in float with the large term y / 8 * k held exactly; large ones need more digits of the logarithm and work in
+// y log2(x) = y / 8 * k + (what is left of the segment, below y / 12), 2^t = 2^(n / 8) * (1 + f * polynomial), |f| <=
+// 1/16. The large term is exact, because y / 8 is cut into a short number that k multiplies exactly and a small rest.
+// Exponents above 4 carry more digits of what is left (the long form); the rare ones beyond both forms are computed in
 // double.
 #pragma once
 
@@ -36,22 +37,27 @@ inline constexpr double kCentreOffset[8] = {0.0,
 // ln(1 + r) = r + r^2 * (...), |r| < 0.0569, to 2^-32.
 inline constexpr double kLn[4] = {-0.49999925580796534, 0.33333223612080437, -0.25074945919769887, 0.20080257931802578};
 
-// The same split for the double form: reciprocals whose logarithm is a float to 2^-41.
-alignas(32) inline constexpr float kReciprocal[8] = {1.0f,         0.905404091f, 0.813294947f, 0.738525391f,
-                                                     0.675993145f, 0.623168707f, 0.578119814f, 0.539312065f};
-alignas(32) inline constexpr float kReciprocalOffset[8] = {0.0f,          0.0183662698f, 0.0481494442f, 0.062280573f,
-                                                           0.0649194792f, 0.0573053062f, 0.040559575f,  0.015807787f};
-// log2(1 + r) = r * (...), to 2^-36 and to 2^-32 of the result.
+// For the double form: reciprocals whose logarithm is a float to 2^-41, and log2(1 + r) = r * (...) to 2^-36.
+inline constexpr float kReciprocal[8] = {1.0f,         0.905404091f, 0.813294947f, 0.738525391f,
+                                         0.675993145f, 0.623168707f, 0.578119814f, 0.539312065f};
+inline constexpr float kReciprocalOffset[8] = {0.0f,          0.0183662698f, 0.0481494442f, 0.062280573f,
+                                               0.0649194792f, 0.0573053062f, 0.040559575f,  0.015807787f};
 inline constexpr double kLog2[6] = {1.4426950411084996,   -0.72134752104861699, 0.48089712699959069,
                                     -0.36067218359279224, 0.28954285675094638,  -0.24145339859794785};
 
-// 2^f - 1 = f * (...), |f| <= 1/16, to 2^-32, and 2^(j / 8) as a float and what it lacks.
+// 2^f - 1 = f * (...), |f| <= 1/16, to 2^-32, and 2^(j / 8) as a float and what it lacks of 1.
 inline constexpr float kExp2[4] = {0.693147182464599609375f, 0.2402265071868896484375f, 5.5508099496364593505859375e-2f,
                                    9.6186101436614990234375e-3f};
 alignas(32) inline constexpr float kRoot[8] = {1.0f,        1.09050775f, 1.18920708f, 1.29683959f,
                                                1.41421354f, 1.54221082f, 1.68179286f, 1.8340081f};
-alignas(32) inline constexpr float kRootRest[8] = {0.0f,           -1.30775399e-08f, 3.79763527e-08f,  -4.01899953e-08f,
-                                                   2.4203235e-08f, 8.07090483e-09f,  -2.47553267e-08f, -1.1239278e-08f};
+alignas(32) inline constexpr float kRootRest[8] = {0.0f,
+                                                   -1.19921575e-08f,
+                                                   3.19341815e-08f,
+                                                   -3.09907193e-08f,
+                                                   1.71142709e-08f,
+                                                   5.23333421e-09f,
+                                                   -1.47196051e-08f,
+                                                   -6.12825968e-09f};
 
 // Adding these rounds a float or double to eighths, which then stand in the low bits.
 inline constexpr float kEighthsMagic = 1572864.0f;                // 1.5 * 2^20
@@ -72,49 +78,73 @@ struct SplitFloat {
 inline constexpr SplitFloat kLog2EShort{kLog2E, 12};
 inline constexpr SplitFloat kLog2Of10Short{3.3219280948873623, 12};
 
+// What scale * log2(x) needs. In the long form slopes and offsets are a short number and its rest; in the other the
+// high offsets and low slopes are not used.
+struct ScaledLog2 {
+  constexpr ScaledLog2() = default;
+  constexpr ScaledLog2(double scale, bool isLong) {
+    const SplitFloat eighth(scale * 0.125, 13);
+    eighthHigh = eighth.high;
+    eighthLow = eighth.low;
+    double factor = 1.0;
+    for (int i = 0; i < 4; ++i) {
+      factor /= scale * kLog2E;
+      series[i] = static_cast<float>(kLn[i] * factor);
+    }
+    for (int j = 0; j < 8; ++j) {
+      const double slope = scale * kLog2E / kCentre[j], offset = scale * kCentreOffset[j];
+      if (isLong) {
+        const SplitFloat shortSlope(slope, 12);
+        slopes[j] = shortSlope.high;
+        slopeRests[j] = shortSlope.low;
+        // A multiple of 2^-16 below 2^7, like the large term that it joins.
+        offsetsHigh[j] = static_cast<float>(static_cast<int>(offset * 65536.0)) * (1.0f / 65536.0f);
+        offsets[j] = static_cast<float>(offset - offsetsHigh[j]);
+      } else {
+        slopes[j] = static_cast<float>(slope);
+        offsets[j] = static_cast<float>(offset);
+      }
+    }
+  }
+
+  float eighthHigh = 0, eighthLow = 0;
+  float series[4] = {};
+  alignas(32) float slopes[8] = {};
+  alignas(32) float offsets[8] = {};
+  alignas(32) float slopeRests[8] = {};
+  alignas(32) float offsetsHigh[8] = {};
+};
+inline constexpr ScaledLog2 kNaturalLog{kLn2, true};
+inline constexpr ScaledLog2 kDecimalLog{kLog10Of2, true};
+
 }  // namespace power
 
-// How x^y is computed, from y alone: in float for 2^-10 <= y <= 4, in double for other positive exponents, by the
-// scalar function for zero, negative, infinite and NaN exponents.
-enum class PowerCore : uint8_t { Float, Double, Scalar };
+// How x^y is computed, from y alone: Float for 2^-10 <= y <= 4, Long up to 80; Scalar, which has no vector form, for
+// the other exponents.
+enum class PowerCore : uint8_t { Float, Long, Scalar };
 
 // An exponent with all that is derived from it. Making one costs a few dozen operations: make it once per call.
 struct PowerExponent {
   constexpr explicit PowerExponent(float y)
       : exponent(y),
-        core(!(y > 0.0f && y < __builtin_huge_valf()) ? PowerCore::Scalar
-             : y >= 0x1p-10f && y <= 4.0f             ? PowerCore::Float
-                                                      : PowerCore::Double) {
+        core(y >= 0x1p-10f && y <= 4.0f ? PowerCore::Float
+             : y > 4.0f && y <= 80.0f   ? PowerCore::Long
+                                        : PowerCore::Scalar) {
     if (core == PowerCore::Scalar) return;
-    const power::SplitFloat eighth(y * 0.125, 13);
-    eighthHigh = eighth.high;
-    eighthLow = eighth.low;
-    const double inOctaves = y * power::kLog2E;
-    double scale = 1.0;
-    for (int i = 0; i < 4; ++i) {
-      scale /= inOctaves;
-      if (core == PowerCore::Float) series[i] = static_cast<float>(power::kLn[i] * scale);
-    }
-    for (int j = 0; j < 8; ++j) {
-      slope[j] = static_cast<float>(inOctaves / power::kCentre[j]);
-      offset[j] = static_cast<float>(y * power::kCentreOffset[j]);
-    }
-    // Every x between these powers of two gives a normal result.
-    if (y > 0.98f) {
-      const int down = y < 128.0f ? static_cast<int>(125.0f / y) : 0;
-      const int up = y < 128.0f ? static_cast<int>(127.0f / y) : 0;
+    log = power::ScaledLog2(y, core == PowerCore::Long);
+    // Every x between these powers of two gives a result whose smallest terms are normal numbers too.
+    if (y > 0.75f) {
+      const int down = static_cast<int>(95.0f / y);
+      const int up = static_cast<int>(126.0f / y);
       if (down < 126) firstBits = static_cast<uint32_t>(127 - down) << 23;
-      if (up < 127) lastBits = static_cast<uint32_t>(127 + up) << 23;
+      if (up < 128) lastBits = static_cast<uint32_t>(127 + up) << 23;
     }
   }
 
   float exponent;
   PowerCore core;
-  float eighthHigh = 0, eighthLow = 0;
-  float series[4] = {};
-  alignas(32) float slope[8] = {};
-  alignas(32) float offset[8] = {};
   uint32_t firstBits = 0x00800000, lastBits = 0x7f7fffff;
+  power::ScaledLog2 log;
 };
 
 // x^y for x >= 0 (-0 counts as 0); NaN for negative x. As in C: x^0 = 1, 1^y = 1, NaN otherwise stays NaN.

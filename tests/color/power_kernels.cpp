@@ -39,7 +39,7 @@ void PowersOf(const float* src, float* dst, size_t count, const PowerExponent& y
 
 void Powers(const float* src, float* dst, size_t count, const PowerExponent& y) {
   if (y.core == PowerCore::Float) return PowersOf<PowerCore::Float>(src, dst, count, y);
-  if (y.core == PowerCore::Double) return PowersOf<PowerCore::Double>(src, dst, count, y);
+  if (y.core == PowerCore::Long) return PowersOf<PowerCore::Long>(src, dst, count, y);
   return PowersOf<PowerCore::Scalar>(src, dst, count, y);
 }
 
