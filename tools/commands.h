@@ -9,5 +9,7 @@ void AddFormatsCommand(CLI::App& app);
 void AddInfoCommand(CLI::App& app);
 void AddConvertCommand(CLI::App& app);
 void AddDemoCommand(CLI::App& app);
+void AddTransposeCommand(CLI::App& app);
+void AddRotateCommand(CLI::App& app);
 
 }  // namespace tool

@@ -20,6 +20,8 @@ void AddCommands(CLI::App& app) {
   tool::AddInfoCommand(app);
   tool::AddConvertCommand(app);
   tool::AddDemoCommand(app);
+  tool::AddTransposeCommand(app);
+  tool::AddRotateCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".
