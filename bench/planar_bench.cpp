@@ -56,23 +56,23 @@ struct Job {
   BenchCase report;
 };
 
-// Decoding to BGRA8 at a size and a field, with interpolated and with nearest chroma.
-Job Decode(const std::string& name, F format, Size size, Size dstSize, int field = 0) {
+// Decoding to BGRA8 at a size and a field, with interpolated or with nearest chroma.
+Job Decode(const std::string& name, F format, Size size, Size dstSize, bool interpolates, int field = 0) {
   const auto src = std::make_shared<Block>(format, size);
   const int rowBytes = dstSize.width * 4;
   const auto dst = std::make_shared<Memory>(static_cast<size_t>(rowBytes) * dstSize.height);
-  Job job{src, dst, rowBytes, size,
-          BenchCase("decode " + name + " to BGRA8 " + size.name, static_cast<size_t>(size.width) * size.height)};
-  for (const int quality : {2, 1}) {
-    const auto work = [=] {
-      return VX::DecompressYUV_420_8u(src->planes, src->rowBytes, size.width, size.height, format, dst->data(),
-                                      rowBytes, dstSize.width, dstSize.height, F::BGRA_4444_8u,
-                                      static_cast<zovmediatypes::FieldType>(field),
-                                      static_cast<zovmediatypes::RenderQuality>(quality));
-    };
-    Check(work(), name);
-    job.report.Add(quality == 2 ? "vexel (interpolated)" : "vexel (nearest)", work);
-  }
+  const std::string chroma = interpolates ? " (interpolated) " : " (nearest) ";
+  Job job{
+      src, dst, rowBytes, size,
+      BenchCase("decode " + name + " to BGRA8" + chroma + size.name, static_cast<size_t>(size.width) * size.height)};
+  const auto work = [=] {
+    return VX::DecompressYUV_420_8u(src->planes, src->rowBytes, size.width, size.height, format, dst->data(), rowBytes,
+                                    dstSize.width, dstSize.height, F::BGRA_4444_8u,
+                                    static_cast<zovmediatypes::FieldType>(field),
+                                    static_cast<zovmediatypes::RenderQuality>(interpolates ? 2 : 1));
+  };
+  Check(work(), name);
+  job.report.Add("vexel", work);
   job.report.AddFloor(src->pixelBytes(), dst->size());
   return job;
 }
@@ -89,48 +89,58 @@ void AddSwscale(Job& job, const char* format) {
   }
 }
 
+#ifdef VEXEL_PEER_YUV
+void AddLibyuv(Job& job, bool interpolates, bool is709) {
+  const auto* matrix = is709 ? &libyuv::kYuvH709Constants : &libyuv::kYuvI601Constants;
+  job.report.Add(interpolates && !IsBiplanar(job.src->format) ? "libyuv (bilinear)" : "libyuv (nearest)",
+                 [=, src = job.src, dst = job.dst, rowBytes = job.rowBytes, size = job.size] {
+                   const uint8_t *y = src->plane(0), *u = src->plane(1), *v = src->plane(2);
+                   const int32_t* rows = src->rowBytes;
+                   if (HasWideSamples(src->format))
+                     libyuv::P010ToARGBMatrix(reinterpret_cast<const uint16_t*>(y), rows[0] / 2,
+                                              reinterpret_cast<const uint16_t*>(u), rows[1] / 2, dst->data(), rowBytes,
+                                              matrix, size.width, size.height);
+                   else if (IsBiplanar(src->format))
+                     libyuv::NV12ToARGBMatrix(y, rows[0], u, rows[1], dst->data(), rowBytes, matrix, size.width,
+                                              size.height);
+                   else if (interpolates)
+                     libyuv::I420ToARGBMatrixFilter(y, rows[0], u, rows[1], v, rows[2], dst->data(), rowBytes, matrix,
+                                                    size.width, size.height, libyuv::kFilterBilinear);
+                   else
+                     libyuv::I420ToARGBMatrix(y, rows[0], u, rows[1], v, rows[2], dst->data(), rowBytes, matrix,
+                                              size.width, size.height);
+                 });
+}
+#else
+void AddLibyuv(Job&, bool, bool) {}
+#endif
+
 void FullSizeCases(Size size) {
-  for (const bool is709 : {false, true}) {
-    const std::string suffix = is709 ? " 709" : " 601";
-    Job planar = Decode("I420" + suffix, is709 ? F::YUV_420_MPEG4_FRAME_709 : F::YUV_420_MPEG4_FRAME, size, size);
-    Job pairs = Decode("NV12" + suffix, FromBits(is709 ? 0x0E000A31 : 0x0E000831), size, size);
-#ifdef VEXEL_PEER_YUV
-    const auto* matrix = is709 ? &libyuv::kYuvH709Constants : &libyuv::kYuvI601Constants;
-    planar.report.Add("libyuv (nearest)", [=, src = planar.src, dst = planar.dst, rowBytes = planar.rowBytes] {
-      libyuv::I420ToARGBMatrix(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], src->plane(2),
-                               src->rowBytes[2], dst->data(), rowBytes, matrix, size.width, size.height);
-    });
-    planar.report.Add("libyuv (bilinear)", [=, src = planar.src, dst = planar.dst, rowBytes = planar.rowBytes] {
-      libyuv::I420ToARGBMatrixFilter(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], src->plane(2),
-                                     src->rowBytes[2], dst->data(), rowBytes, matrix, size.width, size.height,
-                                     libyuv::kFilterBilinear);
-    });
-    pairs.report.Add("libyuv (nearest)", [=, src = pairs.src, dst = pairs.dst, rowBytes = pairs.rowBytes] {
-      libyuv::NV12ToARGBMatrix(src->plane(0), src->rowBytes[0], src->plane(1), src->rowBytes[1], dst->data(), rowBytes,
-                               matrix, size.width, size.height);
-    });
-#endif
-    AddSwscale(planar, "yuv420p");
-    AddSwscale(pairs, "nv12");
-  }
-  Job deep = Decode("P010 709", FromBits(0x0E000A71), size, size);
-#ifdef VEXEL_PEER_YUV
-  deep.report.Add("libyuv (nearest)", [=, src = deep.src, dst = deep.dst, rowBytes = deep.rowBytes] {
-    libyuv::P010ToARGBMatrix(reinterpret_cast<const uint16_t*>(src->plane(0)), src->rowBytes[0] / 2,
-                             reinterpret_cast<const uint16_t*>(src->plane(1)), src->rowBytes[1] / 2, dst->data(),
-                             rowBytes, &libyuv::kYuvH709Constants, size.width, size.height);
-  });
-#endif
-  AddSwscale(deep, "p010le");
+  const struct {
+    const char* name;
+    F format;
+    bool is709;
+    const char* swscale;
+  } sources[] = {{"I420 601", F::YUV_420_MPEG4_FRAME, false, "yuv420p"},
+                 {"I420 709", F::YUV_420_MPEG4_FRAME_709, true, "yuv420p"},
+                 {"NV12 601", FromBits(0x0E000831), false, "nv12"},
+                 {"NV12 709", FromBits(0x0E000A31), true, "nv12"},
+                 {"P010 709", FromBits(0x0E000A71), true, "p010le"}};
+  for (const auto& source : sources)
+    for (const bool interpolates : {false, true}) {
+      Job job = Decode(source.name, source.format, size, size, interpolates);
+      AddLibyuv(job, interpolates, source.is709);
+      AddSwscale(job, source.swscale);
+    }
 }
 
 void OtherSizeCases(Size size) {
   const F frame = F::YUV_420_MPEG4_FRAME_709, fields = F::YUV_420_MPEG2_FIELD_709;
   const auto reduced = [&](int across, int down) { return Size{"", size.width / across, size.height / down}; };
-  Decode("I420, one field,", fields, size, reduced(1, 2), 1);
-  Decode("I420 / 2 x 2", frame, size, reduced(2, 2));
-  Decode("I420 / 4 x 4", frame, size, reduced(4, 4));
-  Decode("I420 * 4/3", frame, {size.name, size.width / 4 * 3, size.height}, size);
+  Decode("I420, one field,", fields, size, reduced(1, 2), true, 1);
+  Decode("I420 / 2 x 2", frame, size, reduced(2, 2), true);
+  Decode("I420 / 4 x 4", frame, size, reduced(4, 4), true);
+  Decode("I420 * 4/3", frame, {size.name, size.width / 4 * 3, size.height}, size, true);
 }
 
 void EncodeCases(Size size) {

@@ -30,10 +30,11 @@ constexpr BgrFactors Factors(double b, double r, int total) {
 }
 
 struct Encoding {
-  BgrFactors y, u, v;
+  BgrFactors luma;
+  ChromaFactors chroma;
 };
 constexpr Encoding EncodingOf(const YuvMatrix& m) {
-  return {Factors(m.yB, m.yR, 32768), Factors(m.uB, m.uR, 0), Factors(m.vB, m.vR, 0)};
+  return {Factors(m.yB, m.yR, 32768), {Factors(m.uB, m.uR, 0), Factors(m.vB, m.vR, 0)}};
 }
 constexpr Encoding kEncoding601 = EncodingOf(kBt601), kEncoding709 = EncodingOf(kBt709);
 
@@ -55,7 +56,8 @@ class Encoder {
   Encoder(VX_PixelFormat dstFormat, void* dst, int32_t width, int32_t height) noexcept
       : mWidth(width),
         mHeight(height),
-        mIsFullRange(!IsVideoRange(dstFormat)),
+        mMakeLuma((IsVideoRange(dstFormat) ? kLumaFromVuyx : kLumaFromBgrx)[mVariant]),
+        mMakeChroma((IsVideoRange(dstFormat) ? kChromaFromVuyx : kChromaFromBgrx)[mVariant]),
         mEncoding(Colorimetry(dstFormat) == 0 ? kEncoding601 : kEncoding709),
         mOneField(IsFieldPicture(dstFormat)),
         mChromaWidth(ChromaWidth(PictureFromBlock(dst, dstFormat, width, height))) {
@@ -70,12 +72,13 @@ class Encoder {
   uint8_t* PlaneRow(int plane, int64_t row) const noexcept {
     return static_cast<uint8_t*>(mPlanes[plane]) + row * mRowBytes[plane];
   }
-  void WriteLuma(const uint8_t* pixels, int64_t line) const noexcept;
   void WriteChroma(const uint8_t* a, const uint8_t* b, const LinePair& pair, int64_t row,
-                   uint16_t* const sums[3]) const noexcept;
+                   const SumRows& sums) const noexcept;
 
+  KernelVariant mVariant = ActiveKernelVariant();
   int32_t mWidth, mHeight;
-  bool mIsFullRange;
+  MakeLuma mMakeLuma;
+  MakeChroma mMakeChroma;
   const Encoding& mEncoding;
   bool mOneField;
   int32_t mChromaWidth;
@@ -84,7 +87,6 @@ class Encoder {
   const uint8_t* mTop = nullptr;
   ptrdiff_t mSrcRowBytes = 0;
   const RowConverter* mConverter = nullptr;
-  KernelVariant mVariant = ActiveKernelVariant();
 };
 
 const uint8_t* Encoder::Line(int64_t line, uint8_t* converted) const noexcept {
@@ -94,29 +96,14 @@ const uint8_t* Encoder::Line(int64_t line, uint8_t* converted) const noexcept {
   return converted;
 }
 
-void Encoder::WriteLuma(const uint8_t* pixels, int64_t line) const noexcept {
-  const auto width = static_cast<size_t>(mWidth);
-  if (mIsFullRange)
-    kMakeLuma[mVariant](pixels, mEncoding.y, PlaneRow(0, line), width);
-  else
-    kTakeLuma[mVariant](pixels, PlaneRow(0, line), width);
-}
-
 void Encoder::WriteChroma(const uint8_t* a, const uint8_t* b, const LinePair& pair, int64_t row,
-                          uint16_t* const sums[3]) const noexcept {
-  const auto width = static_cast<size_t>(mWidth), chromaWidth = static_cast<size_t>(mChromaWidth);
-  kSumLines[mVariant](a, b, pair.weightA, pair.weightB, sums, width);
-  for (int k = 0; k < 3; ++k) {
-    sums[k][-1] = sums[k][0];
-    sums[k][width] = sums[k][width - 1];
+                          const SumRows& sums) const noexcept {
+  kSumLines[mVariant](a, b, pair.weightA, pair.weightB, sums, static_cast<size_t>(mWidth));
+  for (uint16_t* const pixels : {sums.outer, sums.inner}) {  // the edges go on
+    std::copy_n(pixels, 2, pixels - 2);
+    std::copy_n(pixels + 2 * ptrdiff_t{mWidth} - 2, 2, pixels + 2 * ptrdiff_t{mWidth});
   }
-  if (mIsFullRange) {
-    kMakeChroma[mVariant](sums, mEncoding.u, PlaneRow(1, row), chromaWidth);
-    kMakeChroma[mVariant](sums, mEncoding.v, PlaneRow(2, row), chromaWidth);
-  } else {
-    kFilterChroma[mVariant](sums[1], PlaneRow(1, row), chromaWidth);
-    kFilterChroma[mVariant](sums[0], PlaneRow(2, row), chromaWidth);
-  }
+  mMakeChroma(sums, mEncoding.chroma, PlaneRow(1, row), PlaneRow(2, row), static_cast<size_t>(mChromaWidth));
 }
 
 VX_Result Encoder::Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* converter) noexcept {
@@ -126,13 +113,13 @@ VX_Result Encoder::Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* con
   const auto pad = [](size_t bytes) { return (bytes + 63) & ~size_t{63}; };
   const auto width = static_cast<size_t>(mWidth);
   const size_t pixelBytes = converter ? pad(4 * width) : 0, converterBytes = converter ? converter->ScratchBytes() : 0;
-  const size_t sumSamples = pad(width + 2 * kSumSlack);
-  VX_SCRATCH(scratch, 2 * pixelBytes + 3 * 2 * sumSamples + converterBytes);
+  const size_t sumWords = pad(2 * width + 2 * kSumSlack);
+  VX_SCRATCH(scratch, 2 * pixelBytes + 4 * sumWords + converterBytes);
   if (!scratch) return VX_ErrOutOfMemory;
   uint8_t* const rows[2] = {scratch.get(), scratch.get() + pixelBytes};
-  auto* const firstSums = reinterpret_cast<uint16_t*>(scratch.get() + 2 * pixelBytes) + kSumSlack;
-  uint16_t* const sums[3] = {firstSums, firstSums + sumSamples, firstSums + 2 * sumSamples};
-  if (converter) converter->UseScratch(scratch.get() + 2 * pixelBytes + 3 * 2 * sumSamples);
+  auto* const words = reinterpret_cast<uint16_t*>(scratch.get() + 2 * pixelBytes) + kSumSlack;
+  const SumRows sums = {words, words + sumWords};
+  if (converter) converter->UseScratch(scratch.get() + 2 * pixelBytes + 4 * sumWords);
 
   const int64_t chromaRows = mHeight / 2 + mHeight % 2, pairs = chromaRows + (mOneField ? 1 : 0);
   for (int64_t row = 0; row < pairs; ++row) {
@@ -140,8 +127,8 @@ VX_Result Encoder::Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* con
     if (pair.a >= mHeight) continue;
     const uint8_t* const a = Line(pair.a, rows[0]);
     const uint8_t* const b = pair.b < mHeight ? Line(pair.b, rows[1]) : a;
-    WriteLuma(a, pair.a);
-    if (b != a) WriteLuma(b, pair.b);
+    mMakeLuma(a, mEncoding.luma, PlaneRow(0, pair.a), width);
+    if (b != a) mMakeLuma(b, mEncoding.luma, PlaneRow(0, pair.b), width);
     if (row < chromaRows && mChromaWidth > 0) WriteChroma(a, b, pair, row, sums);
   }
   return VX_Success;

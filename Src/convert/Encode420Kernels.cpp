@@ -9,8 +9,20 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
-#include "convert/PixelVectors-inl.h"
+#include "convert/YuvVectors8-inl.h"
 #include "frame/KernelTable.h"
+
+#ifndef VEXEL_CONVERT_ENCODE420KERNELS_SCALES
+#define VEXEL_CONVERT_ENCODE420KERNELS_SCALES
+namespace vexel::encode420 {
+namespace {
+
+// Fractional bits of luma sums, and of chroma sums: those of the factors and of weights that total 16.
+inline constexpr int kLumaBits = 15, kWeightBits = 4, kChromaBits = kLumaBits + kWeightBits;
+
+}  // namespace
+}  // namespace vexel::encode420
+#endif
 
 #if HWY_TARGET != HWY_BASELINE_SCALAR
 HWY_BEFORE_NAMESPACE();
@@ -20,101 +32,123 @@ namespace {
 using namespace vexel::HWY_NAMESPACE;
 using hwy::HWY_NAMESPACE::ScalableTag;
 
-constexpr size_t kN = kLanes<uint16_t>;
+constexpr size_t kPixels = kLanes<uint32_t>;  // in a vector
+constexpr size_t kOutputs = 4 * kPixels;      // bytes in a vector
 
-struct Channels {
-  U16 c[3];
+HWY_INLINE I32 Set(int32_t value) { return hn::Set(ScalableTag<int32_t>(), value); }
+
+// Channels 0 and 2, or 1 and 3, of each pixel as words.
+HWY_INLINE U16 Outer(U8 pixels) { return AsU16(hn::And(pixels, Dwords(0x00FF00FF))); }
+HWY_INLINE U16 Inner(U8 pixels) { return hn::ShiftRight<8>(AsU16(pixels)); }
+
+// The product of factors and a pixel's channels.
+struct Dot {
+  I16 outer, inner;
+  explicit HWY_INLINE Dot(const BgrFactors& f) : outer(WordPair(f.b, f.r)), inner(WordPair(f.g, 0)) {}
+  HWY_INLINE I32 operator()(U16 outerPixels, U16 innerPixels) const {
+    return hn::Add(MultiplyPairs(AsI16(outerPixels), outer), MultiplyPairs(AsI16(innerPixels), inner));
+  }
 };
 
-// The channels of kN pixels, widened.
-HWY_INLINE Channels LoadPixels(const uint8_t* pixels) {
-  const ScalableTag<uint16_t> d16;
-  const hn::Rebind<uint8_t, decltype(d16)> d8;
-  hn::VFromD<decltype(d8)> c0, c1, c2, c3;
-  hn::LoadInterleaved4(d8, pixels, c0, c1, c2, c3);
-  return {{hn::PromoteTo(d16, c0), hn::PromoteTo(d16, c1), hn::PromoteTo(d16, c2)}};
-}
-
-HWY_INLINE I16 Set(int16_t value) { return hn::Set(ScalableTag<int16_t>(), value); }
-template <int kShift>
-HWY_INLINE I16 Scale(U16 v, int16_t factor) {
-  return hn::MulFixedPoint15(hn::BitCast(ScalableTag<int16_t>(), hn::ShiftLeft<kShift>(v)), Set(factor));
-}
-template <int kShift>
-HWY_INLINE I16 Dot(const Channels& bgr, const BgrFactors& f) {
-  return hn::Add(hn::Add(Scale<kShift>(bgr.c[0], f.b), Scale<kShift>(bgr.c[1], f.g)), Scale<kShift>(bgr.c[2], f.r));
-}
-
-HWY_INLINE void StoreBytes(I16 v, uint8_t* p) {
-  const ScalableTag<int16_t> d16;
-  const hn::Rebind<uint8_t, decltype(d16)> d8;
-  hn::StoreU(hn::DemoteTo(d8, v), d8, p);
-}
-
-// body(pixels, luma) for kN pixels at a time.
-template <class Body>
-HWY_INLINE void LumaLoop(const uint8_t* pixels, uint8_t* luma, size_t count, const Body& body) {
-  RowLoop<kN, 4, 1>(pixels, luma, count, body);
-}
-
-void TakeLuma(const uint8_t* pixels, uint8_t* luma, size_t count) {
-  LumaLoop(pixels, luma, count, [](const uint8_t* in, uint8_t* out) HWY_ATTR {
-    StoreBytes(hn::BitCast(ScalableTag<int16_t>(), LoadPixels(in).c[2]), out);
+void LumaFromBgrx(const uint8_t* pixels, const BgrFactors& factors, uint8_t* luma, size_t count) {
+  const Dot dot(factors);
+  const auto make = [&](const uint8_t* in, size_t index) HWY_ATTR {
+    const U8 p = LoadVector<uint8_t>(in, index);
+    return hn::ShiftRight<kLumaBits>(hn::Add(dot(Outer(p), Inner(p)), Set(1 << (kLumaBits - 1))));
+  };
+  RowLoop<kOutputs, 4, 1>(pixels, luma, count, [&](const uint8_t* in, uint8_t* out) HWY_ATTR {
+    StoreVector(PackTo8(make(in, 0), make(in, 1), make(in, 2), make(in, 3)), out);
   });
 }
 
-void MakeLuma(const uint8_t* pixels, const BgrFactors& factors, uint8_t* luma, size_t count) {
-  LumaLoop(pixels, luma, count, [&](const uint8_t* in, uint8_t* out) HWY_ATTR {
-    StoreBytes(hn::ShiftRight<7>(hn::SaturatedAdd(Dot<7>(LoadPixels(in), factors), Set(64))), out);
+void LumaFromVuyx(const uint8_t* pixels, const BgrFactors&, uint8_t* luma, size_t count) {
+  const auto take = [](const uint8_t* in, size_t index) HWY_ATTR {
+    return AsI32(hn::And(hn::ShiftRight<16>(LoadVector<uint32_t>(in, index)), hn::Set(ScalableTag<uint32_t>(), 255)));
+  };
+  RowLoop<kOutputs, 4, 1>(pixels, luma, count, [&](const uint8_t* in, uint8_t* out) HWY_ATTR {
+    StoreVector(PackTo8(take(in, 0), take(in, 1), take(in, 2), take(in, 3)), out);
   });
 }
 
-void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, uint16_t* const sums[3], size_t count) {
+void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums, size_t count) {
   const ScalableTag<uint16_t> d;
   const U16 wa = hn::Set(d, static_cast<uint16_t>(weightA)), wb = hn::Set(d, static_cast<uint16_t>(weightB));
-  alignas(64) uint8_t tailA[kN * 4] = {};
-  alignas(64) uint8_t tailB[kN * 4] = {};
-  for (size_t i = 0; i < count; i += kN) {
-    const bool isTail = count - i < kN;
-    if (isTail) {
-      std::memcpy(tailA, a + 4 * i, 4 * (count - i));
-      std::memcpy(tailB, b + 4 * i, 4 * (count - i));
+  const auto sum = [&](const uint8_t* inA, const uint8_t* inB, size_t i) HWY_ATTR {
+    const U8 pa = LoadVector<uint8_t>(inA), pb = LoadVector<uint8_t>(inB);
+    hn::StoreU(hn::Add(hn::Mul(Outer(pa), wa), hn::Mul(Outer(pb), wb)), d, sums.outer + 2 * i);
+    hn::StoreU(hn::Add(hn::Mul(Inner(pa), wa), hn::Mul(Inner(pb), wb)), d, sums.inner + 2 * i);
+  };
+  size_t i = 0;
+  for (; i + kPixels <= count; i += kPixels) sum(a + 4 * i, b + 4 * i, i);
+  if (i == count) return;
+  alignas(64) uint8_t tailA[4 * kPixels] = {};
+  alignas(64) uint8_t tailB[4 * kPixels] = {};
+  std::memcpy(tailA, a + 4 * i, 4 * (count - i));
+  std::memcpy(tailB, b + 4 * i, 4 * (count - i));
+  sum(tailA, tailB, i);
+}
+
+// (1, 2, 1) about the even ones of the pixels from `sums` on.
+HWY_INLINE U16 Filter(const uint16_t* sums) {
+  const ScalableTag<uint16_t> d;
+  const ScalableTag<uint32_t> d32;
+  const auto load = [&](ptrdiff_t pixel) HWY_ATTR { return hn::BitCast(d32, hn::LoadU(d, sums + 2 * pixel)); };
+  const U32 low = load(0), high = load(kPixels);
+  const U16 even = AsU16(hn::ConcatEven(d32, high, low)), odd = AsU16(hn::ConcatOdd(d32, high, low));
+  const U16 before = AsU16(hn::ConcatEven(d32, load(kPixels - 1), load(-1)));
+  return hn::Add(hn::Add(even, even), hn::Add(odd, before));
+}
+
+// Two filtered vectors of words, channels by pairs, of kPixels chroma samples.
+struct Filtered {
+  U16 outer, inner;
+  HWY_INLINE Filtered(const SumRows& sums, size_t sample)
+      : outer(Filter(sums.outer + 4 * sample)), inner(Filter(sums.inner + 4 * sample)) {}
+};
+
+// make(filtered, u, v) for each vector of sums, then bytes.
+template <class Make>
+HWY_INLINE void ChromaLoop(const SumRows& sums, uint8_t* u, uint8_t* v, size_t count, const Make& make) {
+  for (size_t i = 0; i < count; i += kOutputs) {
+    I32 us[4], vs[4];
+    for (size_t k = 0; k < 4; ++k) {
+      // Past the end of the row there is nothing to read.
+      if (k != 0 && i + k * kPixels >= count)
+        us[k] = vs[k] = Set(0);
+      else
+        make(Filtered(sums, i + k * kPixels), us[k], vs[k]);
     }
-    const Channels pa = LoadPixels(isTail ? tailA : a + 4 * i), pb = LoadPixels(isTail ? tailB : b + 4 * i);
-    for (int k = 0; k < 3; ++k) hn::StoreU(hn::Add(hn::Mul(pa.c[k], wa), hn::Mul(pb.c[k], wb)), d, sums[k] + i);
+    const U8 bytesU = PackTo8(us[0], us[1], us[2], us[3]), bytesV = PackTo8(vs[0], vs[1], vs[2], vs[3]);
+    if (count - i >= kOutputs) {
+      StoreVector(bytesU, u + i);
+      StoreVector(bytesV, v + i);
+    } else {
+      alignas(64) uint8_t tail[kOutputs];
+      StoreVector(bytesU, tail);
+      std::memcpy(u + i, tail, count - i);
+      StoreVector(bytesV, tail);
+      std::memcpy(v + i, tail, count - i);
+    }
   }
 }
 
-// (1, 2, 1) about the even columns from `sums` on: 16 times the codes.
-HWY_INLINE U16 Filter(const uint16_t* sums) {
-  const ScalableTag<uint16_t> d;
-  const U16 low = hn::LoadU(d, sums), high = hn::LoadU(d, sums + kN);
-  const U16 lowBefore = hn::LoadU(d, sums - 1), highBefore = hn::LoadU(d, sums + kN - 1);
-  const U16 even = hn::ConcatEven(d, high, low), odd = hn::ConcatOdd(d, high, low);
-  return hn::Add(hn::Add(even, even), hn::Add(odd, hn::ConcatEven(d, highBefore, lowBefore)));
-}
-
-template <class Make>
-HWY_INLINE void ChromaLoop(uint8_t* chroma, size_t count, const Make& make) {
-  size_t i = 0;
-  for (; i + kN <= count; i += kN) StoreBytes(make(2 * i), chroma + i);
-  if (i == count) return;
-  alignas(64) uint8_t tail[kN];
-  StoreBytes(make(2 * i), tail);
-  std::memcpy(chroma + i, tail, count - i);
-}
-
-void FilterChroma(const uint16_t* sums, uint8_t* chroma, size_t count) {
-  const ScalableTag<uint16_t> d;
-  ChromaLoop(chroma, count, [&](size_t x) HWY_ATTR {
-    return hn::BitCast(ScalableTag<int16_t>(), hn::ShiftRight<4>(hn::Add(Filter(sums + x), hn::Set(d, 8))));
+void ChromaFromBgrx(const SumRows& sums, const ChromaFactors& factors, uint8_t* u, uint8_t* v, size_t count) {
+  const Dot dotU(factors.u), dotV(factors.v);
+  const I32 bias = Set((128 << kChromaBits) + (1 << (kChromaBits - 1)));
+  ChromaLoop(sums, u, v, count, [&](const Filtered& f, I32& outU, I32& outV) HWY_ATTR {
+    outU = hn::ShiftRight<kChromaBits>(hn::Add(dotU(f.outer, f.inner), bias));
+    outV = hn::ShiftRight<kChromaBits>(hn::Add(dotV(f.outer, f.inner), bias));
   });
 }
 
-void MakeChroma(const uint16_t* const sums[3], const BgrFactors& factors, uint8_t* chroma, size_t count) {
-  ChromaLoop(chroma, count, [&](size_t x) HWY_ATTR {
-    const Channels bgr = {{Filter(sums[0] + x), Filter(sums[1] + x), Filter(sums[2] + x)}};
-    return hn::ShiftRight<7>(hn::SaturatedAdd(Dot<3>(bgr, factors), Set((128 << 7) + 64)));
+void ChromaFromVuyx(const SumRows& sums, const ChromaFactors&, uint8_t* u, uint8_t* v, size_t count) {
+  const auto take = [](U16 pairs) HWY_ATTR {
+    const I32 low = hn::And(AsI32(pairs), Set(0xFFFF));
+    return hn::ShiftRight<kWeightBits>(hn::Add(low, Set(1 << (kWeightBits - 1))));
+  };
+  ChromaLoop(sums, u, v, count, [&](const Filtered& f, I32& outU, I32& outV) HWY_ATTR {
+    outU = take(f.inner);
+    outV = take(f.outer);
   });
 }
 
@@ -129,49 +163,56 @@ namespace vexel::encode420 {
 namespace plain {
 namespace {
 
-int32_t Scale(int32_t value, int32_t factor) { return (value * factor + 0x4000) >> 15; }
-uint8_t ToByte(int32_t sum) {
-  const int32_t code = sum >> 7;
+template <int kBits>
+uint8_t Round(int32_t sum) {
+  const int32_t code = (sum + (1 << (kBits - 1))) >> kBits;
   return static_cast<uint8_t>(code < 0 ? 0 : code > 255 ? 255 : code);
 }
 
-void TakeLuma(const uint8_t* pixels, uint8_t* luma, size_t count) {
-  for (size_t x = 0; x < count; ++x) luma[x] = pixels[4 * x + 2];
-}
-
-void MakeLuma(const uint8_t* pixels, const BgrFactors& f, uint8_t* luma, size_t count) {
+void LumaFromBgrx(const uint8_t* pixels, const BgrFactors& f, uint8_t* luma, size_t count) {
   for (size_t x = 0; x < count; ++x) {
     const uint8_t* p = pixels + 4 * x;
-    luma[x] = ToByte(Scale(p[0] << 7, f.b) + Scale(p[1] << 7, f.g) + Scale(p[2] << 7, f.r) + 64);
+    luma[x] = Round<kLumaBits>(p[0] * f.b + p[1] * f.g + p[2] * f.r);
   }
 }
 
-void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, uint16_t* const sums[3], size_t count) {
-  for (size_t x = 0; x < count; ++x)
-    for (size_t k = 0; k < 3; ++k) sums[k][x] = static_cast<uint16_t>(weightA * a[4 * x + k] + weightB * b[4 * x + k]);
+void LumaFromVuyx(const uint8_t* pixels, const BgrFactors&, uint8_t* luma, size_t count) {
+  for (size_t x = 0; x < count; ++x) luma[x] = pixels[4 * x + 2];
 }
 
-int32_t Filter(const uint16_t* sums) { return *(sums - 1) + 2 * sums[0] + sums[1]; }
-
-void FilterChroma(const uint16_t* sums, uint8_t* chroma, size_t count) {
-  for (size_t i = 0; i < count; ++i) chroma[i] = static_cast<uint8_t>((Filter(sums + 2 * i) + 8) >> 4);
+void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums, size_t count) {
+  for (size_t i = 0; i < 2 * count; ++i) {
+    sums.outer[i] = static_cast<uint16_t>(weightA * a[2 * i] + weightB * b[2 * i]);
+    sums.inner[i] = static_cast<uint16_t>(weightA * a[2 * i + 1] + weightB * b[2 * i + 1]);
+  }
 }
 
-void MakeChroma(const uint16_t* const sums[3], const BgrFactors& f, uint8_t* chroma, size_t count) {
+// (1, 2, 1) about pixel 2 i of every second word.
+int32_t Filter(const uint16_t* words, size_t i) { return *(words + 4 * i - 2) + 2 * words[4 * i] + words[4 * i + 2]; }
+
+void ChromaFromBgrx(const SumRows& sums, const ChromaFactors& f, uint8_t* u, uint8_t* v, size_t count) {
   for (size_t i = 0; i < count; ++i) {
-    const int32_t b = Filter(sums[0] + 2 * i) << 3, g = Filter(sums[1] + 2 * i) << 3, r = Filter(sums[2] + 2 * i) << 3;
-    chroma[i] = ToByte(Scale(b, f.b) + Scale(g, f.g) + Scale(r, f.r) + (128 << 7) + 64);
+    const int32_t b = Filter(sums.outer, i), g = Filter(sums.inner, i), r = Filter(sums.outer + 1, i);
+    u[i] = Round<kChromaBits>(b * f.u.b + g * f.u.g + r * f.u.r + (128 << kChromaBits));
+    v[i] = Round<kChromaBits>(b * f.v.b + g * f.v.g + r * f.v.r + (128 << kChromaBits));
+  }
+}
+
+void ChromaFromVuyx(const SumRows& sums, const ChromaFactors&, uint8_t* u, uint8_t* v, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    u[i] = Round<kWeightBits>(Filter(sums.inner, i));
+    v[i] = Round<kWeightBits>(Filter(sums.outer, i));
   }
 }
 
 }  // namespace
 }  // namespace plain
 
-const KernelVariants<encode420::TakeLuma> kTakeLuma = VX_KERNEL_VARIANTS(TakeLuma);
-const KernelVariants<encode420::MakeLuma> kMakeLuma = VX_KERNEL_VARIANTS(MakeLuma);
+const KernelVariants<MakeLuma> kLumaFromBgrx = VX_KERNEL_VARIANTS(LumaFromBgrx);
+const KernelVariants<MakeLuma> kLumaFromVuyx = VX_KERNEL_VARIANTS(LumaFromVuyx);
 const KernelVariants<encode420::SumLines> kSumLines = VX_KERNEL_VARIANTS(SumLines);
-const KernelVariants<encode420::FilterChroma> kFilterChroma = VX_KERNEL_VARIANTS(FilterChroma);
-const KernelVariants<encode420::MakeChroma> kMakeChroma = VX_KERNEL_VARIANTS(MakeChroma);
+const KernelVariants<MakeChroma> kChromaFromBgrx = VX_KERNEL_VARIANTS(ChromaFromBgrx);
+const KernelVariants<MakeChroma> kChromaFromVuyx = VX_KERNEL_VARIANTS(ChromaFromVuyx);
 
 }  // namespace vexel::encode420
 #endif

@@ -1,6 +1,4 @@
-// The stages of 4:2:0 encoding from four-channel 8-bit pixels. Rows of sums are scratch memory of kSumSlack samples
-// more than they hold on either side, which kernels read and write by whole vectors; rows of pictures are read and
-// written exactly.
+// The stages of 4:2:0 encoding from four-channel 8-bit pixels.
 #pragma once
 
 #include <cstddef>
@@ -10,28 +8,35 @@
 
 namespace vexel::encode420 {
 
-inline constexpr size_t kSumSlack = 64;
-
 // Factors of B, G and R in 1/32768.
 struct BgrFactors {
   int16_t b, g, r;
 };
 
-using TakeLuma = void (*)(const uint8_t* pixels, uint8_t* luma, size_t count);
-extern const KernelVariants<TakeLuma> kTakeLuma;  // from VUYX
 using MakeLuma = void (*)(const uint8_t* pixels, const BgrFactors& factors, uint8_t* luma, size_t count);
-extern const KernelVariants<MakeLuma> kMakeLuma;  // from BGRX, full range
+extern const KernelVariants<MakeLuma> kLumaFromBgrx;  // factors that total 32768
+extern const KernelVariants<MakeLuma> kLumaFromVuyx;  // takes Y, no factors
 
-// Two lines into sums of their channels: weightA a + weightB b, the weights 4 in all.
-using SumLines = void (*)(const uint8_t* a, const uint8_t* b, int weightA, int weightB, uint16_t* const sums[3],
+// A row of sums has a pair of words for each pixel. They are scratch memory of kSumSlack words more than they hold on
+// either side, which kernels read and write by whole vectors; rows of pictures are read and written exactly.
+inline constexpr size_t kSumSlack = 64;
+struct SumRows {
+  uint16_t* outer;  // channels 0 and 2
+  uint16_t* inner;  // channels 1 and 3
+};
+
+// weightA a + weightB b, the weights 4 in all.
+using SumLines = void (*)(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums,
                           size_t count);
 extern const KernelVariants<SumLines> kSumLines;
 
-// Chroma samples at the even columns of sums, filtered with (1, 2, 1) / 4: of one channel as it is, or of BGR through
-// factors that add up to 0, about 128.
-using FilterChroma = void (*)(const uint16_t* sums, uint8_t* chroma, size_t count);
-extern const KernelVariants<FilterChroma> kFilterChroma;
-using MakeChroma = void (*)(const uint16_t* const sums[3], const BgrFactors& factors, uint8_t* chroma, size_t count);
-extern const KernelVariants<MakeChroma> kMakeChroma;
+// Chroma about 128 at the even columns of sums, filtered with (1, 2, 1) / 4. `count` samples, for which the sums reach
+// one pixel beyond both ends.
+struct ChromaFactors {
+  BgrFactors u, v;  // each totals 0
+};
+using MakeChroma = void (*)(const SumRows& sums, const ChromaFactors& factors, uint8_t* u, uint8_t* v, size_t count);
+extern const KernelVariants<MakeChroma> kChromaFromBgrx;
+extern const KernelVariants<MakeChroma> kChromaFromVuyx;  // takes U and V, no factors
 
 }  // namespace vexel::encode420
