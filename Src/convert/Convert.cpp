@@ -69,14 +69,24 @@ bool RowFits(VX_PixelFormat format, int32_t width) noexcept {
   return width >= 0 && UnpaddedRowBytes(format, width) <= INT32_MAX;
 }
 
+// What is asked once the way is known: that there are rows, that their bytes can be expressed, that both buffers are
+// there. Success with *done set means that nothing is to be done.
+VX_Result CheckBuffers(const ConstBuffer& src, VX_PixelFormat srcRaster, const Buffer& dst, VX_PixelFormat dstRaster,
+                       int32_t width, int32_t height, bool* done) noexcept {
+  *done = height < 1 || width == 0;
+  if (*done) return VX_Success;
+  if (!RowFits(srcRaster, width) || !RowFits(dstRaster, width)) return VX_ErrArgumentOutOfRange;
+  if (!src.base) return VX_ErrNullSource;
+  return dst.base ? VX_Success : VX_ErrNullDestination;
+}
+
 VX_Result RunChain(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                    int32_t renderQuality) noexcept {
   RowConverter converter;
   if (const VX_Result result = converter.Prepare(src.format, dst.format, renderQuality, width)) return result;
-  if (height < 1 || width == 0) return VX_Success;
-  if (!RowFits(src.format, width) || !RowFits(dst.format, width)) return VX_ErrArgumentOutOfRange;
-  if (!src.base) return VX_ErrNullSource;
-  if (!dst.base) return VX_ErrNullDestination;
+  bool done;
+  const VX_Result check = CheckBuffers(src, src.format, dst, dst.format, width, height, &done);
+  if (check != VX_Success || done) return check;
   const bool stream = GoesPastCache(src.format, dst.format, width, height);
   if (stream) converter.StreamOutput();
   VX_SCRATCH(scratch, converter.ScratchBytes());
@@ -131,23 +141,30 @@ bool PlanEncode(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) n
   return *input = src, true;
 }
 
-VX_Result EncodeSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height) noexcept {
-  if (!Is420(dst.format)) return VX_ErrFormatNotHandled;  // DV goes through an encoder module that is not there
-  return Encode420(src.base, static_cast<int32_t>(src.rowBytes), src.format, dst.base, dst.format, width, height);
+// Only 4:2:0 has an encoder; DV goes through a module that is not there.
+bool HasEncoder(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) noexcept {
+  return PlanEncode(src, dst, input) && Is420(dst);
 }
 
 VX_Result ConvertToSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                            int32_t renderQuality) noexcept {
   VX_PixelFormat input;
-  if (!PlanEncode(src.format, dst.format, &input)) return VX_ErrFormatNotHandled;
-  if (input == src.format) return EncodeSpecial(src, dst, width, height);
-  if (!Is420(dst.format)) return VX_ErrFormatNotHandled;
-  Intermediate raster;
-  if (const VX_Result result = raster.Allocate(input, width, height)) return result;
-  if (const VX_Result result = VX_Convert(src.base, static_cast<int32_t>(src.rowBytes), src.format, raster.pixels(),
-                                          raster.rowBytes(), input, width, height, renderQuality))
+  if (!HasEncoder(src.format, dst.format, &input)) return VX_ErrFormatNotHandled;
+  Plan chain;
+  const VX_PixelFormat raster = IsSpecial(src.format) ? input : src.format;
+  if (const VX_Result result = MakePlan(raster, input, renderQuality, &chain)) return result;
+  bool done;
+  const VX_Result check = CheckBuffers(src, raster, dst, VX_PixelFormat::BGRX_4444_8u, width, height, &done);
+  if (check != VX_Success || done) return check;
+
+  if (input == src.format)
+    return Encode420(src.base, static_cast<int32_t>(src.rowBytes), src.format, dst.base, dst.format, width, height);
+  Intermediate encoded;
+  if (const VX_Result result = encoded.Allocate(input, width, height)) return result;
+  if (const VX_Result result = VX_Convert(src.base, static_cast<int32_t>(src.rowBytes), src.format, encoded.pixels(),
+                                          encoded.rowBytes(), input, width, height, renderQuality))
     return result;
-  return EncodeSpecial({static_cast<const uint8_t*>(raster.pixels()), raster.rowBytes(), input}, dst, width, height);
+  return Encode420(encoded.pixels(), encoded.rowBytes(), input, dst.base, dst.format, width, height);
 }
 
 VX_Result ConvertRasters(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
@@ -160,14 +177,19 @@ VX_Result ConvertRasters(const ConstBuffer& src, const Buffer& dst, int32_t widt
 VX_Result ConvertFrom420(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                          int32_t renderQuality) noexcept {
   const DecodePlan plan = PlanDecode420(src.format, width, height, dst.format, width, height, renderQuality);
-  if (plan.width != width || plan.height != height) return VX_ErrUnsupportedConversion;
+  if (width >= 1 && height >= 1 && (plan.width != width || plan.height != height)) return VX_ErrUnsupportedConversion;
+  // Refuse what cannot be reached before anything is decoded.
+  Plan chain;
+  VX_PixelFormat raster = dst.format;
+  if (IsSpecial(dst.format) && !HasEncoder(plan.format, dst.format, &raster)) return VX_ErrFormatNotHandled;
+  if (const VX_Result result = MakePlan(plan.format, raster, renderQuality, &chain)) return result;
+  bool done;
+  const VX_Result check = CheckBuffers(src, plan.format, dst, raster, width, height, &done);
+  if (check != VX_Success || done) return check;
+
   if (plan.format == dst.format)
     return Decode420(src.base, src.format, width, height, dst.base, static_cast<int32_t>(dst.rowBytes), dst.format,
                      renderQuality);
-  Plan chain;  // refuses what cannot be reached before anything is decoded
-  if (!IsSpecial(dst.format))
-    if (const VX_Result result = MakePlan(plan.format, dst.format, renderQuality, &chain)) return result;
-  if (height < 1) return VX_Success;
   Intermediate decoded;
   if (const VX_Result result = decoded.Allocate(plan.format, width, height)) return result;
   if (const VX_Result result = Decode420(src.base, src.format, width, height, decoded.pixels(), decoded.rowBytes(),
@@ -179,6 +201,8 @@ VX_Result ConvertFrom420(const ConstBuffer& src, const Buffer& dst, int32_t widt
 
 VX_Result ConvertFromSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                              int32_t renderQuality) noexcept {
+  // The block of a planar picture above 8 bits has no defined size, so only its planes can be decoded.
+  if (Is420(src.format) && HasWideSamples(src.format) && !IsBiplanar(src.format)) return VX_ErrUnsupportedFormat;
   if (Is420(src.format)) return ConvertFrom420(src, dst, width, height, renderQuality);
   const DecodeTarget target = PlanDvDecode(src.format, width, height, renderQuality);
   if (!target.known) return VX_ErrUnsupportedFormat;

@@ -3,6 +3,8 @@
 // Negative and over-range values keep their sign and size, NaN stays NaN (one, the quiet one of the channel's sign).
 // The 8u kernels equal the walk through 32f: 8u is scaled by 1/255 before the curve, and after the curve 32f narrows as
 // always (round to nearest, saturate; NaN and what int32 cannot hold give 0).
+#include <xmmintrin.h>
+
 #include <cstddef>
 #include <cstdint>
 
@@ -18,6 +20,12 @@
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
 #include "frame/Power-inl.h"
+
+namespace vexel::plain {
+namespace {
+void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count);
+}  // namespace
+}  // namespace vexel::plain
 
 #if HWY_TARGET != HWY_BASELINE_SCALAR
 HWY_BEFORE_NAMESPACE();
@@ -118,6 +126,9 @@ HWY_ATTR void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
   RowLoop<kLanes<float>, 16, 16>(src, dst, count, CurveBody<kExponent, kAlpha>());
 }
 HWY_ATTR void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+  // The thresholds are those of rounding to nearest; a caller's other rounding mode takes the definition.
+  constexpr uint32_t kRoundingMode = 0x6000;
+  if (_mm_getcsr() & kRoundingMode) return plain::LinearToBgra8(src, dst, count);
   RowLoop<kLanes<float>, 16, 4>(src, dst, count, LinearToBgra8Body(LightCodes::Get()));
 }
 template <AlphaWrite kAlpha>

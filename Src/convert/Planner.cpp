@@ -154,6 +154,11 @@ bool NeedsSimd(const Step& step) noexcept {
   return (step.from == F::VUYX_4444_8u || step.from == F::VUYX_4444_8u_709) && step.to == F::BGRA_4444_8u;
 }
 
+// The nameless formats inside the walks from `Invalid`; nobody can hold a buffer of them.
+constexpr bool IsPairStorage(F format) noexcept {
+  return IsYuv(format) && Layout(format) == kLayout4444 && AlphaKind(format) == kAlphaNone;
+}
+
 // As a source `Invalid` stands for an 8-bit picture and leads no further than 8-bit Y'CbCr, 4:2:2 and BGR.
 bool InvalidReaches(F dst) noexcept {
   return Depth(dst) == kDepth8u && !IsLinear(dst) && (IsYuv(dst) || !IsReversed(dst)) && dst != F::Invalid;
@@ -232,7 +237,7 @@ VX_Result MakePlan(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality
   if (IsSpecial(dst)) return VX_ErrUnsupportedDestinationFormat;
   const Graph& graph = TheGraph();
   const int from = graph.Find(src), to = graph.Find(dst);
-  if (from == kNoNode || to == kNoNode) return VX_ErrFailed;
+  if (from == kNoNode || to == kNoNode || IsPairStorage(src) || IsPairStorage(dst)) return VX_ErrFailed;
   if (from == to) {
     const RowKernelSet* copy = CopyKernelFor(src);
     if (!copy) return VX_ErrFailed;

@@ -1,9 +1,11 @@
 #include <gtest/gtest.h>
+#include <xmmintrin.h>
 
 #include <climits>
 #include <cstring>
 #include <vector>
 
+#include "frame/KernelVariant.h"
 #include "support/Formats.h"
 #include "support/Random.h"
 
@@ -87,6 +89,18 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
       {F::PALDV25, F::BGRA_4444_8u, 720, 576, VX_ErrUnsupportedFormat},
       {F::NTSCDV25, F::BGRA_4444_8u, 720, 576, VX_ErrUnsupportedConversion},
       {FromBits(0x7F000020), F::BGRA_4444_8u, 4, 4, VX_ErrUnsupportedFormat},
+      // 4:2:0 ends: the way first, then nothing to do, then sizes.
+      {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME_FullRange, 16, -1, VX_Success},
+      {F::YUV_420_MPEG2_FRAME_FullRange, F::YUV_420_MPEG2_FRAME_FullRange, 16, 0, VX_Success},
+      {F::YUV_420_MPEG2_FRAME_FullRange, F::BGRX_4444_8u, 16, -1, VX_Success},
+      {F::YUV_420_MPEG2_FRAME_709, FromBits(0x0E000A31), 16, 0, VX_ErrFormatNotHandled},
+      {F::YUV_420_MPEG2_FRAME_709, F::UYVY_422_8u, -1, 4, VX_ErrArgumentOutOfRange},
+      {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME_709, -1, 4, VX_ErrArgumentOutOfRange},
+      {F::BGRX_4444_8u, F::YUV_420_MPEG2_FRAME_FullRange, INT_MAX, 1, VX_ErrArgumentOutOfRange},
+      {FromBits(0x12345), F::YUV_420_MPEG2_FRAME_709, 16, 16, VX_ErrFailed},
+      {FromBits(0x0A000871), F::BGRA_4444_8u, 200, 64, VX_ErrUnsupportedFormat},
+      {FromBits(0x801), F::VUYA_4444_8u, 3, 1, VX_ErrFailed},
+      {F::Invalid, FromBits(0xA01), 3, 1, VX_ErrFailed},
       // Destinations without an encoder.
       {F::BGRA_4444_8u, F::PALDV25, 720, 576, VX_ErrFormatNotHandled},
       {F::YUYV_422_8u, F::PALDV50, 720, 576, VX_ErrFormatNotHandled},
@@ -126,6 +140,30 @@ TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
       ASSERT_EQ(std::memcmp(&large[static_cast<size_t>(dstRow) * y], small.data(), small.size()), 0)
           << FormatName(src) << " to " << FormatName(dst) << " row " << y;
   }
+}
+
+// A caller's rounding mode reaches every kernel alike and comes back.
+TEST(Convert, RoundingModesGiveTheSameBytesInEveryVariant) {
+  constexpr int kWidth = 259;
+  std::vector<float> light(4 * kWidth);
+  testing::Random random(5);
+  for (float& v : light) v = random.Unit();
+  const KernelVariant most = ActiveKernelVariant();
+  for (const uint32_t mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
+    const auto run = [&](KernelVariant variant) {
+      std::vector<uint8_t> codes(4 * kWidth);
+      LimitKernelVariant(variant);
+      const uint32_t saved = _mm_getcsr();
+      _mm_setcsr((saved & ~0x6000u) | mode);
+      VX_Convert(light.data(), 0, F::BGRA_4444_32f_Linear, codes.data(), 0, F::BGRA_4444_8u, kWidth, 1, 2);
+      EXPECT_EQ(_mm_getcsr() & 0x6000u, mode);
+      _mm_setcsr(saved);
+      return codes;
+    };
+    const auto plain = run(KernelVariant::Plain);
+    EXPECT_EQ(plain, run(most)) << "mode " << mode;
+  }
+  LimitKernelVariant(most);
 }
 
 // Chains run in blocks, in whole rows or fused into one kernel: always the bytes of their steps one after the other.
