@@ -154,8 +154,8 @@ VX_API VX_Result VX_ClipBufferToRect(void* base, int32_t rowBytes, VX_PixelForma
  * picture row, so pictures keep their orientation. Source and destination must not overlap.
  *
  * A 4:2:0 picture is one block laid out as VX_GetPlanarBuffers says, its row bytes argument is not used. renderQuality
- * above 1 interpolates chroma where 4:2:2 in 32f or 4:2:0 becomes 4:4:4:4. The sign and payload of a NaN that arithmetic
- * produces are unspecified.
+ * above 1 interpolates chroma where 4:2:2 in 32f or 4:2:0 becomes 4:4:4:4. The sign and payload of a NaN that
+ * arithmetic produces are unspecified.
  *
  * 0 done, and for height < 1; -3 a special source without a decoder; -4 a special destination inside a chain; -13 a
  * special source that cannot be decoded to exactly width x height; -16 out of memory; -999 no chain of at most eight

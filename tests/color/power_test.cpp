@@ -23,7 +23,7 @@ const std::vector<float> kExponents = {2.4f,      1.0f / 2.4f,  2.6f,      1.0f 
                                        78.84375f, 0.012683313f, 6.277395f, 0.2f,        1.0f / 6.0f,
                                        2.2f,      1.0f / 2.2f,  0.5f,      1.0f,        0x1p-10f,
                                        4.0f,      0.98f,        0.9801f,   4.0001f,     0.000976562f,
-                                       80.0f,     80.5f,       1000.0f,   1e-20f,      1e-42f,
+                                       80.0f,     80.5f,        1000.0f,   1e-20f,      1e-42f,
                                        1e8f,      -0.41666f,    -2.4f};
 
 std::vector<float> Grid(uint32_t firstBits, uint32_t lastBits, uint32_t step) {
