@@ -126,17 +126,27 @@ class Conversion {
     return wanted == kNoEnd ? 0 : wanted;
   }
 
-  // Reads up to one frame per thread, converts them side by side and writes them in order. Threads beyond the frames
-  // work on bands of rows.
-  int RunBatch() {
-    const int threads = mCommand.run.ThreadCount();
-    const int64_t left = mRange.last == kNoEnd ? threads : mRange.last - mRange.first + 1 - mDone;
+  int64_t FramesLeft() const { return mRange.last == kNoEnd ? kNoEnd : mRange.last - mRange.first + 1 - mDone; }
+
+  // One frame per thread, but no more than about a gigabyte of them.
+  std::vector<Job> ReadBatch(int threads) {
+    constexpr int64_t kBytes = int64_t{1} << 30, kBytesPerPixel = 3 * 16;
     std::vector<Job> jobs;
-    while (static_cast<int64_t>(jobs.size()) < std::min<int64_t>(threads, left)) {
+    int64_t wanted = std::min<int64_t>(threads, FramesLeft());
+    while (static_cast<int64_t>(jobs.size()) < wanted) {
       Job job{mSource->Next(), {}, {}, {}, {}};
       if (!job.source) break;
+      const int64_t fitting = kBytes / (kBytesPerPixel * job.source.Width() * job.source.Height());
+      wanted = std::min(wanted, std::max<int64_t>(fitting, 1));
       jobs.push_back(std::move(job));
     }
+    return jobs;
+  }
+
+  // Converts a batch of frames side by side and writes them in order. Threads beyond the frames work on bands of rows.
+  int RunBatch() {
+    const int threads = mCommand.run.ThreadCount();
+    std::vector<Job> jobs = ReadBatch(threads);
     const int count = static_cast<int>(jobs.size());
     if (count == 0) return 0;
     if (mDone == 0) Explain(jobs[0].source);
@@ -174,6 +184,8 @@ class Conversion {
                   static_cast<double>(mPixels) / std::max(mSeconds, 1e-9) * 1e-6);
     std::cerr << (mCommand.out == "-" ? "standard output" : mCommand.out) << ": " << mDone
               << (mDone == 1 ? " frame, " : " frames, ") << FormatName(mFormat) << ", converted in " << speed << '\n';
+    if (mRange.last != kNoEnd && mRange.first + mDone <= mRange.last)
+      std::cerr << "vexel: note: \"" << mCommand.in << "\" ends with frame " << mRange.first + mDone - 1 << '\n';
   }
 
   const ConvertCommand& mCommand;
@@ -194,7 +206,9 @@ void AddConvertCommand(CLI::App& app) {
   const auto options = std::make_shared<ConvertCommand>();
   command->add_option("in", options->in, "Picture, video, sequence (in_%04d.png) or raw frames; - is standard input")
       ->required();
-  command->add_option("out", options->out, "Picture, sequence (out_%04d.png), .y4m or .raw; - is standard output (raw)")
+  command
+      ->add_option("out", options->out,
+                   "Picture, sequence (out_%04d.png, numbered by frame), .y4m or .raw; - is standard output (raw)")
       ->required();
   command->add_option("--format", options->format, "Pixel format to convert to (see \"vexel formats\")")->required();
   command->add_option("--quality", options->quality, "Render quality; above 1 interpolates chroma (default 3)");

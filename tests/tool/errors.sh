@@ -48,6 +48,10 @@ refuses 1 'cannot convert BGRA_4444_8u to YUV_420_MPEG4_FRAME at 64x48: VX_ErrFo
 refuses 1 'unknown matrix "907"' convert "$clip420" x.png "${to_bgra[@]}" --matrix 907
 refuses 1 'no library format holds yuv422p10le frames coded with the BT.2020 matrix' convert "$clip422" x.png "${to_bgra[@]}" --matrix 2020
 
+# Fewer frames than asked for are written, and said to be.
+convert "$clip420" short.raw --format BGRA_4444_8u --frames 22-30
+grep -q 'note: .* ends with frame 23' log || fail "a short file goes unnoticed: $(cat log)"
+
 # A write error that only shows when the data leaves the buffers.
 if [ -e /dev/full ]; then
   "$vexel" convert picture.png - "${to_bgra[@]}" >/dev/full 2>err

@@ -1,0 +1,143 @@
+// Eight threads use the library for the first time at once, in a process of its own: every table and cache that is made
+// on first use is made under contention. Run under ThreadSanitizer, which sees the races; without it, the results of
+// all threads must still agree.
+//   vexel_first_use plans | conversions | planar | colour
+#include <barrier>
+#include <bit>
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "vexel/color_space.h"
+#include "vexel/vexel.h"
+
+namespace {
+
+constexpr int kThreads = 8, kWidth = 14, kHeight = 6;
+
+// Results in any order: each thread starts elsewhere.
+class Digest {
+ public:
+  void Add(size_t item, const void* bytes, size_t count) {
+    uint64_t hash = 0xcbf29ce484222325u ^ item;
+    for (size_t i = 0; i < count; ++i) hash = (hash ^ static_cast<const uint8_t*>(bytes)[i]) * 0x100000001b3u;
+    mSum += hash;
+  }
+  uint64_t Sum() const { return mSum; }
+
+ private:
+  uint64_t mSum = 0;
+};
+
+std::vector<VX_PixelFormat> Formats(bool planar) {
+  std::vector<VX_PixelFormat> formats;
+#define VX_COLLECT(name, value, hostName, mapping) \
+  if ((value) != 0 && (planar ? ((value) >> 24) >= 9 : ((value) >> 24) == 0)) formats.push_back(VX_PixelFormat::name);
+  VX_PIXEL_FORMATS(VX_COLLECT)
+#undef VX_COLLECT
+  return formats;
+}
+
+// Plain code points everywhere: bytes below 0x3f are small floats too.
+std::vector<uint8_t> Content(VX_PixelFormat format) {
+  std::vector<uint8_t> bytes(static_cast<size_t>(VX_PixelFormatSize(format, kWidth, kHeight)));
+  for (size_t i = 0; i < bytes.size(); ++i) bytes[i] = static_cast<uint8_t>(i * 7 % 61);
+  return bytes;
+}
+
+void Convert(VX_PixelFormat from, VX_PixelFormat to, size_t item, Digest& digest) {
+  const std::vector<uint8_t> source = Content(from);
+  std::vector<uint8_t> destination(static_cast<size_t>(VX_PixelFormatSize(to, kWidth, kHeight)));
+  const auto rowBytes = [](VX_PixelFormat f) { return static_cast<int32_t>(VX_PixelFormatSize(f, kWidth, 1)); };
+  const VX_Result result =
+      VX_Convert(source.data(), rowBytes(from), from, destination.data(), rowBytes(to), to, kWidth, kHeight, 3);
+  digest.Add(item, &result, sizeof result);
+  digest.Add(item, destination.data(), destination.size());
+}
+
+void UsePlans(size_t start, Digest& digest) {
+  static const std::vector<VX_PixelFormat> formats = Formats(false);
+  const size_t count = formats.size() * formats.size();
+  for (size_t i = 0; i < count; ++i) {
+    const size_t item = (i + start * count / kThreads) % count;
+    VX_PixelFormat chain[9] = {};
+    int32_t length = 0;
+    VX_ExplainConversion(formats[item / formats.size()], formats[item % formats.size()], 3, chain, &length);
+    digest.Add(item, chain, sizeof chain);
+  }
+}
+
+void UseConversions(size_t start, Digest& digest) {
+  static const std::vector<VX_PixelFormat> formats = Formats(false);
+  const size_t count = formats.size() * formats.size() / 5;  // every fifth pair meets all formats
+  for (size_t i = 0; i < count; ++i) {
+    const size_t item = (i + start * count / kThreads) % count * 5;
+    Convert(formats[item / formats.size()], formats[item % formats.size()], item, digest);
+  }
+}
+
+void UsePlanar(size_t start, Digest& digest) {
+  static const std::vector<VX_PixelFormat> formats = Formats(true);
+  for (size_t i = 0; i < formats.size(); ++i) {
+    const size_t item = (i + start * 2) % formats.size();
+    Convert(formats[item], VX_PixelFormat::BGRA_4444_8u, item, digest);
+    Convert(VX_PixelFormat::VUYA_4444_32f_709, formats[item], item, digest);
+  }
+}
+
+void UseColour(size_t start, Digest& digest) {
+  std::vector<float> pixels(4 * 33), converted(pixels.size());
+  for (size_t i = 0; i < pixels.size(); ++i) pixels[i] = static_cast<float>(i % 37) / 29.0f;
+  const int count = static_cast<int>(pixels.size() / 4);
+  const auto add = [&](size_t item) { digest.Add(item, converted.data(), converted.size() * sizeof(float)); };
+  for (size_t i = 0; i < 6; ++i) {
+    const size_t item = (i + start) % 6;
+    const VX::ColorSpace& space = VX::ColorSpace::WorkingSpace(static_cast<VX_WorkingSpace>(item));
+    space.ConvertPixelsFromRec709(pixels.data(), converted.data(), count, true);
+    add(item);
+    space.ConvertPixelsToRec709(pixels.data(), converted.data(), count, false);
+    add(item + 10);
+    space.CompressPixelsToSDR(pixels.data(), converted.data(), count, 1.0f, 0.5f, 0.5f);
+    add(item + 20);
+    digest.Add(item + 30, &space.RGBtoXYZ()[0][0], 9 * sizeof(float));
+    digest.Add(item + 40, &space.XYZtoRGB()[0][0], 9 * sizeof(float));
+    if (const float* luma = space.LuminanceCoeffs()) digest.Add(item + 50, luma, 3 * sizeof(float));
+  }
+}
+
+using Use = void (*)(size_t start, Digest& digest);
+struct Scenario {
+  const char* name;
+  Use use;
+};
+constexpr Scenario kScenarios[] = {
+    {"plans", UsePlans}, {"conversions", UseConversions}, {"planar", UsePlanar}, {"colour", UseColour}};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  Use use = nullptr;
+  for (const Scenario& scenario : kScenarios)
+    if (argc == 2 && std::strcmp(argv[1], scenario.name) == 0) use = scenario.use;
+  if (!use) return std::fprintf(stderr, "usage: vexel_first_use plans|conversions|planar|colour\n"), 2;
+
+  VX_Initialize();
+  Digest digests[kThreads];
+  {
+    std::barrier start(kThreads);
+    std::vector<std::jthread> threads;
+    for (size_t i = 0; i < kThreads; ++i)
+      threads.emplace_back([&, i] {
+        start.arrive_and_wait();
+        use(i, digests[i]);
+      });
+  }
+  VX_Terminate();
+  for (const Digest& digest : digests)
+    if (digest.Sum() != digests[0].Sum()) return std::puts("the threads disagree"), 1;
+  return 0;
+}
