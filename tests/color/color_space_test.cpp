@@ -1,0 +1,543 @@
+// The conversions of the colour spaces against double precision, and their kernels against each other.
+#include <cmath>
+#include <cstring>
+#include <functional>
+#include <limits>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "color/color_reference.h"
+#include "frame/KernelVariant.h"
+#include "support/Random.h"
+#include "support/Ulp.h"
+#include "vexel/color_space.h"
+
+namespace vexel::testing {
+namespace {
+
+using VX::ColorSpace;
+using VX::CSMatrix;
+
+constexpr float kInfinity = std::numeric_limits<float>::infinity();
+constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
+
+// ---- All conversions, each with its reference ----
+
+struct Operation {
+  std::string name;
+  std::function<void(const float*, float*, int)> run;
+  std::function<Rgb(Rgb, Noise&)> reference;
+  float least = -0.4f, most = 1.6f;  // of test values
+  int tableSize = 0;                 // values stand in the middle between two entries
+};
+
+const Matrix kTo2020{0.627402, 0.329292, 0.043306, 0.069095, 0.919544, 0.011360, 0.016394, 0.088028, 0.895578};
+const Matrix kFrom2020{1.6605, -0.587657, -0.07284, -0.124547, 1.1329, -0.008348, -0.018154, -0.100597, 1.11875};
+const Matrix kUnity{1, 0, 0, 0, 1, 0, 0, 0, 1};
+const Rgb kLuma709{0.2126, 0.7152, 0.0722}, kLuma2020{0.2627, 0.6780, 0.0593};
+
+// The library's own matrices, which are single precision; color_matrix_test.cpp holds them against double precision.
+Matrix Elements(const CSMatrix& m) {
+  Matrix out;
+  std::copy(m[0], m[0] + 9, out.begin());
+  return out;
+}
+Matrix Conversion(const ColorSpace& from, const ColorSpace& to) {
+  return Elements(ColorSpace::CalculateConversionMatrix(from, to));
+}
+Rgb LumaOf(const ColorSpace& space) {
+  const float* coeffs = space.LuminanceCoeffs();
+  return {coeffs[0], coeffs[1], coeffs[2]};
+}
+
+std::function<Rgb(Rgb, Noise&)> Powers(double decode, double encode, Matrix m, bool compress = false, Rgb luma = {}) {
+  return [=](Rgb c, Noise& noise) {
+    c = Each(c, noise, [=](double v) { return SignedPow(v, decode); });
+    if (m != kUnity) c = Times(m, c, noise);
+    if (m != kUnity && compress) c = CompressGamut(c, luma, noise);
+    return Each(c, noise, [=](double v) { return SignedPow(v, encode); });
+  };
+}
+
+std::vector<Operation> TransferOperations() {
+  static const VX::SRGBColorSpace srgb;
+  static const VX::Rec2020ColorSpace rec2020;
+  static const VX::DCIP3ColorSpace p3d60(VX_IlluminantD60), p3d65(VX_IlluminantD65);
+  const ColorSpace& rec709 = ColorSpace::WorkingSpace(VX_WorkingSpaceRec709);
+  std::vector<Operation> list;
+  const auto both = [&](const std::string& name, const ColorSpace& space, const auto& from, const auto& to) {
+    for (const bool compress : {false, true}) {
+      const std::string suffix = compress ? " compressed" : "";
+      list.push_back(
+          {"from Rec.709 to " + name + suffix,
+           [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsFromRec709(s, d, n, compress); },
+           from(compress)});
+      list.push_back(
+          {"to Rec.709 from " + name + suffix,
+           [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsToRec709(s, d, n, compress); },
+           to(compress)});
+    }
+  };
+  both(
+      "Rec.2020", rec2020, [&](bool c) { return Powers(2.4f, 1 / 2.4f, kTo2020, c, kLuma2020); },
+      [&](bool c) { return Powers(2.4f, 1 / 2.4f, kFrom2020, c, kLuma709); });
+  for (const auto* space : {&p3d60, &p3d65})
+    both(
+        space == &p3d60 ? "P3 D60" : "P3 D65", *space,
+        [&](bool c) { return Powers(2.4f, 1 / 2.6f, Conversion(rec709, *space), c, LumaOf(*space)); },
+        [&](bool c) { return Powers(2.6f, 1 / 2.4f, Conversion(*space, rec709), c, kLuma709); });
+  static const VX::GammaColorSpace gammas[] = {VX::GammaColorSpace(0.5f),  VX::GammaColorSpace(1 / 2.2f),
+                                               VX::GammaColorSpace(1),     VX::GammaColorSpace(0.1f),
+                                               VX::GammaColorSpace(0.01f), VX::GammaColorSpace(100)};
+  const float exponents[] = {0.5f, 1 / 2.2f, 1, 0.1f, 0.01f, 100};
+  for (size_t i = 0; i < std::size(gammas); ++i)
+    both(
+        "gamma " + std::to_string(exponents[i]), gammas[i], [&](bool) { return Powers(2.4f, exponents[i], kUnity); },
+        [&](bool) { return Powers(1 / exponents[i], 1 / 2.4f, kUnity); });
+  both(
+      "sRGB", srgb,
+      [](bool) {
+        return [](Rgb c, Noise& noise) {
+          c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
+          return Each(c, noise, [](double v) {
+            const double m = std::abs(v);
+            return std::copysign(m > 0.0031308 ? 1.055 * std::pow(m, 1 / 2.4) - 0.055 : 12.92 * m, v);
+          });
+        };
+      },
+      [](bool) {
+        return [](Rgb c, Noise& noise) {
+          c = Each(c, noise, [](double v) {
+            const double m = std::abs(v);
+            return std::copysign(m > 0.04045 ? std::pow((m + 0.055) / 1.055, 2.4) : m / 12.92, v);
+          });
+          return Each(c, noise, [](double v) { return SignedPow(v, 1 / 2.4f); });
+        };
+      });
+  return list;
+}
+
+std::vector<Operation> HdrOperations() {
+  static const VX::PQColorSpace pq(false, false), pqWhite(false, true), pqP3(true, false);
+  static const VX::HLGColorSpace hlg;
+  constexpr double kWhite = 0.50807786f;
+  const ColorSpace& rec709 = ColorSpace::WorkingSpace(VX_WorkingSpaceRec709);
+  const auto encode = [](double v) { return SignedPow(v, 1 / 2.4f); };
+  std::vector<Operation> list;
+  for (const auto* space : {&pq, &pqWhite, &pqP3}) {
+    const double white = space == &pqWhite ? kWhite : 1;
+    const std::string name = space == &pqP3 ? "PQ P3" : space == &pqWhite ? "PQ with white" : "PQ";
+    list.push_back({"from Rec.709 to " + name,
+                    [space](const float* s, float* d, int n) { space->ConvertPixelsFromRec709(s, d, n, true); },
+                    [m = Conversion(rec709, *space), white](Rgb c, Noise& noise) {
+                      c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
+                      c = Times(m, c, noise);
+                      return Each(c, noise,
+                                  [&](double v) { return std::copysign(PqCurve::Encode(v, noise) / white, v); });
+                    },
+                    -0.4f, 3.0f});
+    for (const bool compress : {false, true}) {
+      const bool table = white == 1 && !compress;
+      list.push_back(
+          {"to Rec.709 from " + name + (compress ? " compressed" : ""),
+           [space, compress](const float* s, float* d, int n) { space->ConvertPixelsToRec709(s, d, n, compress); },
+           [=, m = Conversion(*space, rec709)](Rgb c, Noise& noise) {
+             c = Each(c, noise, [&](double v) {
+               if (table) v = std::floor(std::clamp(v, 0.0, 1.0) * 4095) / 4095;
+               return std::copysign(PqCurve::Decode(v * white, noise), v);
+             });
+             c = Each(Times(m, c, noise), noise, encode);
+             return compress ? CompressGamut(c, kLuma709, noise) : c;
+           },
+           -0.4f, 1.2f, table ? 4096 : 0});
+    }
+  }
+  list.push_back(
+      {"from Rec.709 to HLG", [](const float* s, float* d, int n) { hlg.ConvertPixelsFromRec709(s, d, n, true); },
+       [](Rgb c, Noise& noise) {
+         c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
+         c = Times(kTo2020, c, noise);
+         const double luma = noise(HlgCurve::Luma(Each(c, noise, [](double v) { return std::abs(v) * 0.1; })));
+         const double gain = noise(1 / std::max(0.0001, std::pow(luma, 1.0f / 6)));
+         return Each(c, noise, [&](double v) {
+           return std::copysign(HlgCurve::Encode(noise(std::abs(v) * 0.1 * gain), noise), v);
+         });
+       },
+       -0.4f, 2.5f});
+  list.push_back(
+      {"to Rec.709 from HLG", [](const float* s, float* d, int n) { hlg.ConvertPixelsToRec709(s, d, n, true); },
+       [=](Rgb c, Noise& noise) {
+         c = Each(c, noise,
+                  [](double v) { return HlgCurve::Decode(std::floor(std::clamp(v, 0.0, 1.0) * 2047) / 2047); });
+         const double gain = noise(10 * std::pow(noise(HlgCurve::Luma(c)), 0.2f));
+         c = Each(c, noise, [=](double v) { return v * gain; });
+         return Each(Times(kFrom2020, c, noise), noise, encode);
+       },
+       -0.4f, 1.2f, 2048});
+  return list;
+}
+
+std::vector<Operation> LinearOperations() {
+  static const VX::SRGBColorSpace srgb;
+  static const VX::Rec709ColorSpace rec709;
+  static const VX::Rec2020ColorSpace rec2020;
+  static const VX::DCIP3ColorSpace p3(VX_IlluminantDCI);
+  std::vector<Operation> list;
+  struct Tone {
+    const char* name;
+    const ColorSpace* space;
+    double threshold, scale, offset, exponent, slope, encodeThreshold, encodeScale, encodeSlope;
+  };
+  for (const Tone& tone :
+       {Tone{"sRGB", &srgb, 0.04045, 1 / 1.055, 0.055, 2.4, 1 / 12.92, 0.0031308, 1.055, 12.92},
+        Tone{"Rec.709", &rec709, 0, 1, 0, 2.4f, 1, 0, 1, 1}, Tone{"Rec.2020", &rec2020, 0, 1, 0, 2.4f, 1, 0, 1, 1},
+        Tone{"P3", &p3, 0, 1, 0, 2.6f, 1, 0, 1, 1}})
+    for (const auto& [a, b, c] : {std::array{1.0f, 1.2f, 0.6f}, {4.0f, 1.05f, 0.9f}, {0.3f, 2.0f, 0.25f}}) {
+      const ToneReference reference{tone.threshold,
+                                    tone.scale,
+                                    tone.offset,
+                                    tone.exponent,
+                                    tone.slope,
+                                    tone.encodeThreshold,
+                                    tone.encodeScale,
+                                    -tone.offset,
+                                    1 / tone.exponent,
+                                    tone.encodeSlope,
+                                    Elements(tone.space->RGBtoXYZ()),
+                                    Elements(tone.space->XYZtoRGB()),
+                                    tone.space->WhitePoint()[0],
+                                    tone.space->WhitePoint()[1]};
+      list.push_back({std::string("tones of ") + tone.name,
+                      [space = tone.space, a = a, b = b, c = c](const float* s, float* d, int n) {
+                        space->CompressPixelsToSDR(s, d, n, a, b, c);
+                      },
+                      [reference, a = a, b = b, c = c](Rgb v, Noise& noise) { return reference(v, a, b, c, noise); }, 0,
+                      2.5f});
+    }
+  list.push_back({"Y'CbCr to RGB", [](const float* s, float* d, int n) { rec2020.ConvertPixelsFromYUVtoRGB(s, d, n); },
+                  [](Rgb c, Noise& noise) {  // Y', Cb, Cr where R, G, B stands
+                    return Times({1, 0, 1.4746, 1, -0.1645, -0.5713, 1, 1.8814, 0}, c, noise);
+                  }});
+  list.push_back({"RGB to Y'CbCr", [](const float* s, float* d, int n) { rec2020.ConvertPixelsFromRGBtoYUV(s, d, n); },
+                  [](Rgb c, Noise& noise) {
+                    return Times({0.2627, 0.6780, 0.0593, -0.1396, -0.3604, 0.5, 0.5, -0.4598, -0.0402}, c, noise);
+                  }});
+  return list;
+}
+
+std::vector<Operation> AllOperations() {
+  std::vector<Operation> all = TransferOperations();
+  for (const auto& list : {HdrOperations(), LinearOperations()}) all.insert(all.end(), list.begin(), list.end());
+  return all;
+}
+
+float Draw(const Operation& operation, Random& random) {
+  if (operation.tableSize)
+    return (static_cast<float>(random.Int(-40, operation.tableSize + 40)) + 0.5f) /
+           static_cast<float>(operation.tableSize - 1);
+  return random.OneIn(8) ? 0 : random.Float(operation.least, operation.most);
+}
+
+TEST(ColorConversions, MatchDoublePrecision) {
+  Random random(3);
+  constexpr int kCount = 1501;
+  for (const Operation& operation : AllOperations()) {
+    std::vector<float> in(4 * kCount), out(4 * kCount, 9.0f);
+    for (float& v : in) v = Draw(operation, random);
+    operation.run(in.data(), out.data(), kCount);
+    int failures = 0;
+    for (size_t i = 0; i < kCount && failures < 2; ++i) {
+      const Rgb pixel{in[4 * i + 2], in[4 * i + 1], in[4 * i]};
+      Noise exact(0, 0), noise(i + 1, 0x1p-22);
+      const Rgb expected = operation.reference(pixel, exact);
+      Rgb spread{};
+      for (int run = 0; run < 8; ++run) {
+        const Rgb noisy = operation.reference(pixel, noise);
+        for (size_t k = 0; k < 3; ++k) spread[k] = std::max(spread[k], std::abs(noisy[k] - expected[k]));
+      }
+      for (size_t k = 0; k < 3; ++k) {
+        const double got = out[4 * i + 2 - k];
+        if (std::abs(got - expected[k]) <= 3 * spread[k] + 1e-12) continue;
+        if (got == static_cast<float>(expected[k])) continue;  // Beyond the range of float.
+        ++failures;
+        ADD_FAILURE() << operation.name << ", channel " << k << " of (" << pixel[0] << ", " << pixel[1] << ", "
+                      << pixel[2] << "): " << got << " instead of " << expected[k] << " +- " << 3 * spread[k];
+      }
+      EXPECT_TRUE(SameBits(out[4 * i + 3], in[4 * i + 3])) << operation.name;
+    }
+  }
+}
+
+// NaNs as such, everything else in all bits.
+bool SamePixels(const float* a, const float* b, size_t floats) {
+  for (size_t i = 0; i < floats; ++i)
+    if (!SameBits(a[i], b[i]) && !(std::isnan(a[i]) && std::isnan(b[i]))) return false;
+  return true;
+}
+
+class VariantScope {
+ public:
+  ~VariantScope() { LimitKernelVariant(mSaved); }
+
+ private:
+  KernelVariant mSaved = ActiveKernelVariant();
+};
+
+TEST(ColorConversions, GiveTheSameBitsInEveryVariantAtEveryCountAndAlignment) {
+  constexpr size_t kCount = 67, kFloats = 4 * kCount;
+  const float special[] = {0.0f, -0.0f,     1.0f,       -1.0f, kInfinity, -kInfinity,
+                           kNaN, 0x1p-140f, -0x1p-140f, 3e38f, 1e-20f,    70.0f};
+  Random random(11);
+  const VariantScope scope;
+  for (const Operation& operation : AllOperations()) {
+    SCOPED_TRACE(operation.name);
+    std::vector<float> in(kFloats), expected(kFloats), memory(kFloats + 32);
+    for (float& v : in) v = random.OneIn(12) ? special[random.Next() % std::size(special)] : Draw(operation, random);
+    LimitKernelVariant(KernelVariant::Plain);
+    operation.run(in.data(), expected.data(), kCount);
+    for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v) {
+      LimitKernelVariant(static_cast<KernelVariant>(v));
+      for (size_t count = 0; count <= kCount; ++count) {
+        const size_t offset = random.Next() % 16, from = random.Next() % (kCount - count + 1), floats = 4 * count;
+        std::vector<float> source(memory.size());
+        std::copy_n(in.begin() + static_cast<ptrdiff_t>(4 * from), floats, source.begin() + 3);
+        for (const bool inPlace : {false, true}) {
+          std::fill(memory.begin(), memory.end(), 123.0f);
+          float* dst = memory.data() + offset;
+          if (inPlace) std::copy_n(source.begin() + 3, floats, dst);
+          operation.run(inPlace ? dst : source.data() + 3, dst, static_cast<int>(count));
+          ASSERT_TRUE(SamePixels(dst, expected.data() + 4 * from, floats))
+              << "variant " << v << ", " << count << " pixels";
+          std::fill_n(dst, floats, 123.0f);
+          ASSERT_THAT(memory, ::testing::Each(123.0f)) << "variant " << v << ", " << count << " pixels";
+        }
+      }
+    }
+    operation.run(nullptr, nullptr, 0);
+    operation.run(nullptr, nullptr, -5);
+    operation.run(nullptr, nullptr, std::numeric_limits<int>::min());
+  }
+}
+
+// ---- Numbers of the standards and the edges ----
+
+TEST(ColorCurves, ScalarFunctionsFollowTheStandards) {
+  const VX::PQColorSpace pq(false, false), pqWhite(false, true);
+  const struct {
+    float light, signal;  // SMPTE ST 2084, light in units of 100 cd/m2
+  } kPq[] = {{0.001f, 0.0623369f}, {0.01f, 0.1499457f}, {1, 0.5080784f},
+             {2.03f, 0.5806888f},  {10, 0.7518271f},    {100, 1}};
+  for (const auto& [light, signal] : kPq) {
+    // The curve's exponent magnifies a rounding of its argument almost eightyfold.
+    EXPECT_NEAR(pq.LinearToEOTF(light), signal, signal * 80 * 0x1p-23) << light;
+    EXPECT_NEAR(pq.EOTFToLinear(signal), light, light * 2e-4) << light;
+  }
+  EXPECT_NEAR(pqWhite.LinearToEOTF(1), 1, 1e-5);
+  EXPECT_NEAR(pqWhite.EOTFToLinear(1), 1, 2e-4);
+  EXPECT_TRUE(std::isnan(pq.LinearToEOTF(-1)));  // No clamping.
+  EXPECT_TRUE(std::isnan(pq.EOTFToLinear(1e-6f)) || pq.EOTFToLinear(1e-6f) >= 0);
+  EXPECT_TRUE(std::isnan(pq.EOTFToLinear(0)));
+
+  const VX::SRGBColorSpace srgb;
+  EXPECT_FLOAT_EQ(srgb.LinearToEOTF(-0.5f), -6.46f);  // Negative values stay on the linear segment.
+  EXPECT_FLOAT_EQ(srgb.EOTFToLinear(-0.5f), -0.5f / 12.92f);
+  EXPECT_NEAR(srgb.LinearToEOTF(0.5f), 0.735357, 1e-6);
+  EXPECT_NEAR(srgb.EOTFToLinear(0.735357f), 0.5, 1e-6);
+  EXPECT_FLOAT_EQ(srgb.LinearToEOTF(0.0031308f), 12.92f * 0.0031308f);
+  EXPECT_FLOAT_EQ(srgb.EOTFToLinear(0.04045f), 0.04045f / 12.92f);
+
+  const VX::Rec709ColorSpace rec709;
+  const VX::DCIP3ColorSpace p3(VX_IlluminantDCI);
+  for (const float v : {0.0f, 0.02f, 0.5f, 1.0f, 4.0f}) {
+    for (const float sign : {1.0f, -1.0f}) {
+      EXPECT_LE(UlpError(rec709.LinearToEOTF(sign * v), SignedPow(sign * v, 1 / 2.4f)), 1.5);
+      EXPECT_LE(UlpError(p3.LinearToEOTF(sign * v), SignedPow(sign * v, 1 / 2.6f)), 1.5);
+    }
+    EXPECT_NEAR(rec709.EOTFToLinear(rec709.LinearToEOTF(v)), v, v * 1e-6);
+  }
+  const VX::HLGColorSpace hlg;
+  EXPECT_EQ(hlg.LinearToEOTF(-2), -2);
+  EXPECT_EQ(hlg.EOTFToLinear(3), 3);
+  for (const float gamma : {0.0f, kInfinity, kNaN, -1.0f}) {
+    const VX::GammaColorSpace odd(gamma);
+    for (const float v : {0.0f, 0.5f, 1.0f, -2.0f}) (void)odd.LinearToEOTF(v), (void)odd.EOTFToLinear(v);
+  }
+}
+
+TEST(ColorCurves, PixelsFollowTheStandards) {
+  const auto grey = [](const ColorSpace& space, bool from, float value) {
+    float pixel[4] = {value, value, value, 1};
+    from ? space.ConvertPixelsFromRec709(pixel, pixel, 1, false) : space.ConvertPixelsToRec709(pixel, pixel, 1, false);
+    EXPECT_NEAR(pixel[0], pixel[1], 2e-5 * std::abs(pixel[1]));
+    EXPECT_NEAR(pixel[2], pixel[1], 2e-5 * std::abs(pixel[1]));
+    return pixel[1];
+  };
+  const VX::PQColorSpace pq(false, false);
+  const VX::HLGColorSpace hlg;
+  EXPECT_NEAR(grey(pq, true, 1), 0.5080784, 2e-6);
+  EXPECT_NEAR(grey(pq, false, 0.5080784f), 1, 2e-3);              // One of 4,096 steps of the curve.
+  EXPECT_NEAR(grey(pq, false, 1), std::pow(100, 1 / 2.4), 1e-4);  // 10,000 cd/m2
+  EXPECT_EQ(grey(pq, false, 7), grey(pq, false, 1));
+  EXPECT_NEAR(grey(hlg, true, 1), 0.6297, 1e-4);  // 0.1 of peak, inverse system gamma 1.2
+  // BT.2100: 75 % is 203 cd/m2, the peak 1,000 cd/m2.
+  EXPECT_NEAR(std::pow(grey(hlg, false, 0.75f), 2.4), 2.03, 0.01);
+  EXPECT_NEAR(std::pow(grey(hlg, false, 1), 2.4), 10, 1e-3);
+  // Tables have no steps in between, and hold their ends.
+  EXPECT_EQ(grey(pq, false, (1000 + 0.01f) / 4095), grey(pq, false, (1000 + 0.99f) / 4095));
+  EXPECT_EQ(grey(hlg, false, kNaN), grey(hlg, false, 0));
+}
+
+TEST(ColorGamut, CompressionEndsInsideAndKeepsGreys) {
+  const VX::Rec2020ColorSpace rec2020;
+  Random random(23);
+  std::vector<float> pixels = {0, 0, 1, 1, 0, 1, 0, 1, 1, 0, 0, 1, 1, 1, 0, 1, 5, 5, 5, 1};
+  for (int i = 0; i < 4000; ++i) pixels.push_back(random.Float(0, 1.5f));
+  std::vector<float> out(pixels.size());
+  const int count = static_cast<int>(pixels.size() / 4);
+  rec2020.ConvertPixelsToRec709(pixels.data(), out.data(), count, true);
+  for (size_t i = 0; i < out.size(); ++i)
+    if (i % 4 != 3) {
+      ASSERT_GE(out[i], 0) << i / 4;
+      ASSERT_LE(out[i], 1) << i / 4;
+    }
+  EXPECT_EQ(out[2], 1);  // The largest channel of a saturated red.
+  EXPECT_THAT(std::vector<float>(out.begin() + 16, out.begin() + 20),
+              ::testing::Each(::testing::FloatNear(1, 1e-5f)));  // A grey above 1.
+
+  // With the identity nothing is compressed, nor without luma to move toward.
+  float pixel[4] = {-0.5f, 3, 0.5f, 1};
+  VX::PureGammaToPureGamma(pixel, pixel, 1, 1, 1, CSMatrix(), true, nullptr);
+  EXPECT_THAT(pixel, ::testing::ElementsAre(-0.5f, 3, 0.5f, 1));
+  CSMatrix nearly;
+  nearly[0][0] = std::nextafter(1.0f, 2.0f);
+  float stuck[4] = {-1, -1, -1, 1};
+  const float third[3] = {0.25f, 0.5f, 0.25f};
+  VX::PureGammaToPureGamma(stuck, stuck, 1, 1, 1, CSMatrix(1, 0, 0, 0, 1, 0, 0, 1, 0), true, third);
+  EXPECT_THAT(stuck, ::testing::ElementsAre(-1, -1, -1, 1));
+  float toBlack[4] = {-1, -2, 0.5f, 1};
+  VX::PureGammaToPureGamma(toBlack, toBlack, 1, 1, 1, nearly, true, nullptr);
+  EXPECT_THAT(toBlack, ::testing::ElementsAre(0, 0, 0, 1));
+}
+
+TEST(ColorSpaces, WithoutAToneCurveLeaveTheDestination) {
+  const VX::GammaColorSpace gamma(0.5f);
+  const VX::PQColorSpace pq(true, true);
+  const VX::HLGColorSpace hlg;
+  const float in[4] = {1, 2, 3, 4};
+  float out[4] = {9, 9, 9, 9};
+  for (const ColorSpace* space : {static_cast<const ColorSpace*>(&gamma), static_cast<const ColorSpace*>(&pq),
+                                  static_cast<const ColorSpace*>(&hlg)})
+    space->CompressPixelsToSDR(in, out, 1, 1, 1.2f, 0.6f);
+  EXPECT_THAT(out, ::testing::Each(9));
+  const VX::Rec709ColorSpace rec709;
+  rec709.ConvertPixelsFromRec709(in, out, 1, true);
+  EXPECT_THAT(out, ::testing::ElementsAre(1, 2, 3, 4));
+  rec709.ConvertPixelsToRec709(out, out, 1, true);
+  EXPECT_THAT(out, ::testing::ElementsAre(1, 2, 3, 4));
+  const float* luma = pq.LuminanceCoeffs();
+  const Matrix xyz = RgbToXyz(pq.Primaries(), pq.WhitePoint());
+  for (size_t i = 0; i < 3; ++i) EXPECT_NEAR(luma[i], xyz[3 + i], 1e-6);
+}
+
+// ---- P010 and clamping ----
+
+TEST(ColorP010, DecodesAllWidthsAndCodes) {
+  const VX::Rec2020ColorSpace rec2020;
+  Random random(7);
+  const VariantScope scope;
+  const uint16_t edges[] = {0, 4095, 4096, 4097, 32768, 60160, 60161, 61440, 65472, 65535};
+  for (int width = 0; width <= 67; ++width) {
+    const size_t w = static_cast<size_t>(width);
+    std::vector<uint16_t> codes(3 * w + 1);
+    for (uint16_t& code : codes)
+      code = random.OneIn(3) ? edges[random.Next() % std::size(edges)] : static_cast<uint16_t>(random.Bits32());
+    const uint16_t *luma[2] = {codes.data(), codes.data() + w}, *chroma = codes.data() + 2 * w;
+    std::vector<float> plain;
+    for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v) {
+      LimitKernelVariant(static_cast<KernelVariant>(v));
+      std::vector<float> out(8 * w + 8, 77.0f);
+      rec2020.Convert2RowsFromP010toRGB(luma[0], luma[1], chroma, out.data(), out.data() + 4 * w + 4, width);
+      if (v == 0) plain = out;
+      ASSERT_EQ(std::memcmp(out.data(), plain.data(), out.size() * sizeof(float)), 0)
+          << "variant " << v << " width " << width;
+    }
+    for (size_t row = 0; row < 2; ++row) {
+      const float* out = plain.data() + row * (4 * w + 4);
+      EXPECT_EQ(out[4 * w], 77);
+      for (size_t x = 0; x < w; ++x) {
+        const bool last = width % 2 && x + 1 == w;  // full range, not clamped
+        const double code = luma[row][x], u = chroma[x & ~size_t{1}], v = chroma[(x & ~size_t{1}) + 1];
+        const double y = last ? code / 65472 : std::clamp((code - 4096) / 56065, 0.0, 1.0);
+        const double cb = last ? u / 65472 - 0.5 : std::clamp((u - 32768) / 57345, -0.5, 0.5);
+        const double cr = last ? v / 65472 - 0.5 : std::clamp((v - 32768) / 57345, -0.5, 0.5);
+        ASSERT_NEAR(out[4 * x], y + 1.8814 * cb, 5e-7) << x << " of " << width;
+        ASSERT_NEAR(out[4 * x + 1], y - 0.1645 * cb - 0.5713 * cr, 5e-7) << x << " of " << width;
+        ASSERT_NEAR(out[4 * x + 2], y + 1.4746 * cr, 5e-7) << x << " of " << width;
+        ASSERT_EQ(out[4 * x + 3], 1);
+      }
+    }
+  }
+  rec2020.Convert2RowsFromP010toRGB(nullptr, nullptr, nullptr, nullptr, nullptr, -1);
+}
+
+TEST(ColorClamp, StaysOneRowBehind) {
+  Random random(9);
+  const VariantScope scope;
+  for (const int rowBytes : {-8, 0, 3, 4, 30, 100, 128, 132, 260})
+    for (int rows = -1; rows <= 5; ++rows)
+      for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v)
+        for (const auto& [lo, hi] : {std::pair{0.0f, 1.0f}, {0.6f, 0.2f}, {-kInfinity, 0.5f}}) {
+          LimitKernelVariant(static_cast<KernelVariant>(v));
+          std::vector<uint8_t> in(2048), out(2048, 0x55);
+          for (size_t i = 0; i + 4 <= in.size(); i += 4) {
+            const float value = random.OneIn(6) ? (random.OneIn(2) ? kNaN : -0.0f) : random.Float(-1, 2);
+            std::memcpy(in.data() + i, &value, 4);
+          }
+          std::vector<uint8_t> expected = out;
+          for (int pass = 0; pass < rows; ++pass)
+            for (int i = 0; i + 4 <= rowBytes; i += 4) {
+              const int at = std::max(pass - 1, 0) * rowBytes + i;
+              float value;
+              std::memcpy(&value, in.data() + at, 4);
+              value = value > lo ? std::min(value, hi) : lo;
+              std::memcpy(expected.data() + at, &value, 4);
+            }
+          VX::ClampFloatPixels(reinterpret_cast<const float*>(in.data()), reinterpret_cast<float*>(out.data()), rows,
+                               rowBytes, lo, hi);
+          ASSERT_EQ(out, expected) << "variant " << v << ", " << rows << " rows of " << rowBytes << " bytes";
+        }
+}
+
+// ---- Threads ----
+
+TEST(ColorSpaces, CachesMayBeFilledByManyThreads) {
+  for (int round = 0; round < 50; ++round) {
+    const VX::DCIP3ColorSpace p3(VX_IlluminantD60);
+    const VX::PQColorSpace pq(true, round % 2 != 0);
+    std::array<std::array<float, 40>, 8> results;
+    std::vector<std::thread> threads;
+    for (auto& result : results)
+      threads.emplace_back([&] {
+        float* out = result.data();
+        const float in[8] = {0.1f, 0.5f, 0.9f, 1, 0.8f, 0.2f, 0.3f, 0};
+        p3.ConvertPixelsFromRec709(in, out, 2, true);
+        pq.ConvertPixelsToRec709(in, out + 8, 2, false);
+        pq.ConvertPixelsFromRec709(in, out + 16, 2, false);
+        const VX::DCIP3ColorSpace copy(p3);
+        copy.ConvertPixelsToRec709(in, out + 24, 2, false);
+        std::memcpy(out + 32, p3.LuminanceCoeffs(), 12);
+        std::memcpy(out + 35, pq.LuminanceCoeffs(), 12);
+        out[38] = pq.RGBtoXYZ()[1][1];
+        out[39] = p3.XYZtoRGB()[2][0];
+      });
+    for (std::thread& thread : threads) thread.join();
+    for (const auto& result : results) ASSERT_EQ(std::memcmp(result.data(), results[0].data(), sizeof result), 0);
+  }
+}
+
+}  // namespace
+}  // namespace vexel::testing
