@@ -30,27 +30,28 @@ VX_API zovmediatypes::color::ColorSpace VX_PixelFormatToColorSpace(VX_PixelForma
 
 namespace VX {
 
-// Decodes a 4:2:0 picture from its planes (luma, then U and V, or one interleaved chroma plane and no third entry) into a
-// raster. Always writes the top picture line first, at `dst`, whatever the format's origin: for a bottom-left format pass
-// the last row and negated row bytes. All 8-bit formats of four channels are written opaque.
+// Decodes a 4:2:0 picture from its planes (luma, then U and V, or one interleaved chroma plane and no third entry) into
+// a raster. Always writes the top picture line first, at `dst`, whatever the format's origin: for a bottom-left format
+// pass the last row and negated row bytes. All 8-bit formats of four channels are written opaque.
 //
-// Sizes: the source's own; half its height at the same width; half of both; with quality below 3 also a width divided by
-// 1, 2, 4 or 8 and a height divided by an even integer; and, where the has-SSE2 switch is on, 4/3 (widths in multiples of
-// 96) or 3/2 (multiples of 16) of the width at full or half height, resampled bicubically. Reduced pixels are means of
-// all pixels that they cover; field pictures are reduced from their upper field. At half height of full or greater width
-// `field` picks the lines: Upper, Lower, or Whole, which is the mean of both lines of a frame picture and the upper field
-// of a field picture. Elsewhere `field` is not used.
+// Sizes: the source's own; half its height at the same width; half of both; with quality below 3 also a width divided
+// by 1, 2, 4 or 8 and a height divided by an even integer; and, where the has-SSE2 switch is on, 4/3 (widths in
+// multiples of 96) or 3/2 (multiples of 16) of the width at full or half height, resampled bicubically. Reduced pixels
+// are means of all pixels that they cover; field pictures are reduced from their upper field. At half height of full or
+// greater width `field` picks the lines: Upper, Lower, or Whole, which is the mean of both lines of a frame picture and
+// the upper field of a field picture. Elsewhere `field` is not used.
 //
-// Chroma: quality 2 and above interpolates linearly, below 2 every pixel takes the sample that covers it. Frame pictures
-// are progressive, field pictures hold two interleaved fields with chroma of their own (ISO/IEC 13818-2, 6.1.1.8). Both
-// families have chroma co-sited with even columns and between the lines. Rows hold (width + 1) / 2 samples of chroma, or
-// as many as their row bytes have room for; the last one is then repeated, and a plane without any counts as neutral.
-// 10-bit samples are the upper bits of 16-bit words; the lower six should be 0. BT.2020 (non-constant luminance) becomes
-// BT.709 Y'CbCr by way of R'G'B', primaries and transfer function staying what they are.
+// Chroma: quality 2 and above interpolates linearly, below 2 every pixel takes the sample that covers it. Frame
+// pictures are progressive, field pictures hold two interleaved fields with chroma of their own (ISO/IEC
+// 13818-2, 6.1.1.8). Both families have chroma co-sited with even columns and between the lines. Rows hold (width + 1)
+// / 2 samples of chroma, or as many as their row bytes have room for; the last one is then repeated, and a plane
+// without any counts as neutral. 10-bit samples are the upper bits of 16-bit words; the lower six should be 0. BT.2020
+// (non-constant luminance) becomes BT.709 Y'CbCr by way of R'G'B', primaries and transfer function staying what they
+// are.
 //
-// 0, also for an empty picture; -3 the source is not 4:2:0 with 8 or 10 bits; -4 the destination is no raster; -13 a size
-// that the decoder does not reach; -11, -12 a missing plane or destination; -16 out of memory; -999 no conversion into
-// the destination format. Nothing is written on failure. Runs on the calling thread; safe from any.
+// 0, also for an empty picture; -3 the source is not 4:2:0 with 8 or 10 bits; -4 the destination is no raster; -13 a
+// size that the decoder does not reach; -11, -12 a missing plane or destination; -16 out of memory; -999 no conversion
+// into the destination format. Nothing is written on failure. Runs on the calling thread; safe from any.
 VX_API VX_Result DecompressYUV_420_8u(const void* const* srcPlanes, const int32_t* srcRowBytes, int32_t srcWidth,
                                       int32_t srcHeight, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
                                       int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat,
