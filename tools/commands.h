@@ -11,5 +11,6 @@ void AddConvertCommand(CLI::App& app);
 void AddDemoCommand(CLI::App& app);
 void AddTransposeCommand(CLI::App& app);
 void AddRotateCommand(CLI::App& app);
+void AddColorCommand(CLI::App& app);
 
 }  // namespace tool

@@ -22,6 +22,7 @@ void AddCommands(CLI::App& app) {
   tool::AddDemoCommand(app);
   tool::AddTransposeCommand(app);
   tool::AddRotateCommand(app);
+  tool::AddColorCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".

@@ -94,9 +94,14 @@ void UseColour(size_t start, Digest& digest) {
   for (size_t i = 0; i < pixels.size(); ++i) pixels[i] = static_cast<float>(i % 37) / 29.0f;
   const int count = static_cast<int>(pixels.size() / 4);
   const auto add = [&](size_t item) { digest.Add(item, converted.data(), converted.size() * sizeof(float)); };
-  for (size_t i = 0; i < 6; ++i) {
-    const size_t item = (i + start) % 6;
-    const VX::ColorSpace& space = VX::ColorSpace::WorkingSpace(static_cast<VX_WorkingSpace>(item));
+  // The last two look their signals up in tables.
+  static const VX::PQColorSpace pq(true, false);
+  static const VX::HLGColorSpace hlg;
+  for (size_t i = 0; i < 8; ++i) {
+    const size_t item = (i + start) % 8;
+    const VX::ColorSpace& space = item == 6   ? static_cast<const VX::ColorSpace&>(pq)
+                                  : item == 7 ? static_cast<const VX::ColorSpace&>(hlg)
+                                              : VX::ColorSpace::WorkingSpace(static_cast<VX_WorkingSpace>(item));
     space.ConvertPixelsFromRec709(pixels.data(), converted.data(), count, true);
     add(item);
     space.ConvertPixelsToRec709(pixels.data(), converted.data(), count, false);

@@ -1,0 +1,11 @@
+// Plots of the colour spaces for the documentation, computed by the library itself.
+#pragma once
+
+#include <string>
+
+namespace tool {
+
+// Writes transfer.svg, primaries.svg and tone.svg into `directory`. Throws ToolError when they cannot be written.
+void PlotColorSpaces(const std::string& directory);
+
+}  // namespace tool
