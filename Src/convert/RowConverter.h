@@ -34,8 +34,16 @@ class RowConverter {
 
   bool IsCopy() const noexcept { return mIsCopy; }
 
+  // Whether every pixel stands for itself, so that ConvertBlock may be used.
+  bool IsPointWise() const noexcept { return !mWholeRow; }
+
   // Converts one row. Source and destination must not overlap.
   void Convert(const void* srcRow, void* dstRow) const noexcept;
+
+  // Converts `count` <= kChainBlock pixels that begin at src. Only for point-wise chains without StreamOutput.
+  void ConvertBlock(const void* src, void* dst, size_t count) const noexcept {
+    RunSteps(static_cast<const uint8_t*>(src), static_cast<uint8_t*>(dst), count);
+  }
 
  private:
   // Runs the chain on `count` pixels; the last step writes to dst.

@@ -3,7 +3,7 @@
 # others as C++17 and C++20. Every one has a guard: it is included twice.
 set -euo pipefail
 include=$1 cc=$2 cxx=$3
-flat='^vexel/(vexel|pixel_formats|version)\.h$'
+flat='^vexel/(vexel|compositing|pixel_formats|version)\.h$'
 failed=0 count=0
 compile() {  # COMPILER LANGUAGE STANDARD HEADER
   printf '#include <%s>\n#include <%s>\nextern int unit;\n' "$4" "$4" |

@@ -1,0 +1,122 @@
+#include "composite/RowJob.h"
+
+#include <algorithm>
+
+#include "formats/FormatBits.h"
+#include "frame/StreamCopy.h"
+
+namespace vexel {
+namespace {
+
+constexpr size_t Rounded(size_t bytes) { return (bytes + 63) & ~size_t{63}; }
+
+}  // namespace
+
+VX_Result RowJob::Prepare(Side& side, const void* base, int32_t rowBytes, VX_PixelFormat format, VX_PixelFormat from,
+                          VX_PixelFormat to) noexcept {
+  side.base = static_cast<uint8_t*>(const_cast<void*>(base));  // sources are only read
+  side.rowBytes = rowBytes;
+  side.format = format;
+  side.working = format == from ? to : from;
+  side.bytesPerSixPixels = static_cast<uint32_t>(UnpaddedRowBytes(format, kBlockMultiple));
+  side.converts = from != to;
+  return side.converts ? side.converter.Prepare(from, to, mRenderQuality, mWidth, mVariant) : VX_Success;
+}
+
+VX_Result RowJob::AddSource(const SourceImage& image, VX_PixelFormat working) noexcept {
+  return Prepare(mSources[mSourceCount++], image.base, image.rowBytes, image.format, image.format, working);
+}
+
+VX_Result RowJob::SetTarget(const TargetImage& image, VX_PixelFormat working) noexcept {
+  return Prepare(mTarget, image.base, image.rowBytes, image.format, working, image.format);
+}
+
+VX_Result RowJob::CheckBuffers(bool* done) noexcept {
+  *done = false;
+  if (mWidth < 0 || mHeight < 0) return VX_ErrArgumentOutOfRange;
+  *done = mWidth == 0 || mHeight == 0;
+  if (*done) return VX_Success;
+  const auto fits = [this](const Side& side) { return UnpaddedRowBytes(side.format, mWidth) <= INT32_MAX; };
+  if (!fits(mTarget) || !std::all_of(mSources, mSources + mSourceCount, fits)) return VX_ErrArgumentOutOfRange;
+  for (int i = 0; i < mSourceCount; ++i)
+    if (!mSources[i].base) return VX_ErrNullSource;
+  return mTarget.base ? VX_Success : VX_ErrNullDestination;
+}
+
+bool RowJob::TargetIsASource() const noexcept {
+  return std::any_of(mSources, mSources + mSourceCount, [this](const Side& side) { return side.base == mTarget.base; });
+}
+
+void RowJob::Layout() noexcept {
+  int64_t bytes = UnpaddedRowBytes(mTarget.format, mWidth);
+  bool whole = mTarget.converts && !mTarget.converter.IsPointWise();
+  for (int i = 0; i < mSourceCount; ++i) {
+    Side& side = mSources[i];
+    side.upsideDown = VX_IsOriginTopLeft(side.format) != VX_IsOriginTopLeft(mTarget.format);
+    bytes += UnpaddedRowBytes(side.format, mWidth);
+    whole |= side.converts && !side.converter.IsPointWise();
+  }
+  mBlock = whole ? mWidth : std::min<int32_t>(mWidth, kChainBlock);
+  // A destination that is also read is in the cache already, and gains nothing from going past it.
+  const uint32_t cache = VX_GetCacheSize();
+  mStream = cache != 0 && bytes * mHeight >= static_cast<int64_t>(cache / 2) && !TargetIsASource();
+  if (mStream && mTarget.converts && whole) mTarget.converter.StreamOutput();
+
+  // The converters' own rows come first and are shared: conversions run one after the other.
+  size_t own = mTarget.converts ? mTarget.converter.ScratchBytes() : 0;
+  for (int i = 0; i < mSourceCount; ++i)
+    if (mSources[i].converts) own = std::max(own, mSources[i].converter.ScratchBytes());
+  const size_t row = Rounded(static_cast<size_t>(mBlock) * 16);
+  size_t end = Rounded(own);
+  for (int i = 0; i < mSourceCount; ++i)
+    if (mSources[i].converts) mSources[i].scratchOffset = end, end += row;
+  mTarget.scratchOffset = end;
+  if (mTarget.converts || mStream) end += row;
+  if (mTarget.converts && mStream) end += row;  // converted, on its way out
+  mScratchBytes = end;
+}
+
+const uint8_t* RowJob::Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column,
+                             size_t count) const noexcept {
+  const ptrdiff_t stored = side.upsideDown ? mHeight - 1 - row : row;
+  const uint8_t* from =
+      side.base + stored * side.rowBytes + static_cast<size_t>(column) / kBlockMultiple * side.bytesPerSixPixels;
+  if (!side.converts) return from;
+  uint8_t* const to = scratch + side.scratchOffset;
+  if (side.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock))
+    side.converter.ConvertBlock(from, to, count);
+  else
+    side.converter.Convert(from, to);
+  return to;
+}
+
+uint8_t* RowJob::Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept {
+  if (mTarget.converts || mStream) return scratch + mTarget.scratchOffset;
+  return mTarget.base + row * mTarget.rowBytes +
+         static_cast<size_t>(column) / kBlockMultiple * mTarget.bytesPerSixPixels;
+}
+
+void RowJob::Deliver(const RowSpan& span) const noexcept {
+  if (!mTarget.converts && !mStream) return;
+  uint8_t* const to = mTarget.base + span.row * mTarget.rowBytes +
+                      static_cast<size_t>(span.column) / kBlockMultiple * mTarget.bytesPerSixPixels;
+  const size_t bytes = static_cast<size_t>(UnpaddedRowBytes(mTarget.format, static_cast<int64_t>(span.count)));
+  const bool block = mTarget.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock);
+  if (!mTarget.converts) {
+    StreamCopy(to, span.dst, bytes, mVariant);
+  } else if (!block) {
+    mTarget.converter.Convert(span.dst, to);
+  } else if (!mStream) {
+    mTarget.converter.ConvertBlock(span.dst, to, span.count);
+  } else {
+    uint8_t* const staging = span.dst + Rounded(static_cast<size_t>(mBlock) * 16);
+    mTarget.converter.ConvertBlock(span.dst, staging, span.count);
+    StreamCopy(to, staging, bytes, mVariant);
+  }
+}
+
+void RowJob::Finish() const noexcept {
+  if (mStream) StreamFence();
+}
+
+}  // namespace vexel

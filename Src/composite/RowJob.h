@@ -1,0 +1,126 @@
+// Rows of up to three images brought into working formats, given to a row kernel, and its result brought into the
+// format of the destination; in bands. Everything that mixes images runs through it.
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+
+#include "convert/RowConverter.h"
+#include "frame/Bands.h"
+#include "frame/Scratch.h"
+
+namespace vexel {
+
+struct SourceImage {
+  const void* base;
+  int32_t rowBytes;
+  VX_PixelFormat format;
+};
+struct TargetImage {
+  void* base;
+  int32_t rowBytes;
+  VX_PixelFormat format;
+};
+
+// What a row kernel gets: `count` pixels of every image in its working format. `row` counts from the destination's
+// first stored row, `column` from its first pixel. The destination may be one of the sources.
+struct RowSpan {
+  const uint8_t* src[3];
+  uint8_t* dst;
+  size_t count;
+  int32_t row, column;
+};
+
+// Use: AddSource for each source, SetTarget, CheckBuffers, Run.
+//
+// Pictures meet upright: a source whose origin differs from the destination's is walked from its last row. The
+// destination may be exactly one of the sources (base, row bytes and format); any other overlap is undefined.
+class RowJob {
+ public:
+  // Heights up to this run on the calling thread.
+  static constexpr int32_t kInlineRows = 64;
+
+  RowJob(int32_t width, int32_t height, int32_t renderQuality, KernelVariant variant = ActiveKernelVariant()) noexcept
+      : mWidth(width), mHeight(height), mRenderQuality(renderQuality), mVariant(variant) {}
+
+  // Codes as MakePlan.
+  VX_Result AddSource(const SourceImage& image, VX_PixelFormat working) noexcept;
+  VX_Result SetTarget(const TargetImage& image, VX_PixelFormat working) noexcept;
+
+  // Whether sizes and pointers can be worked with: -17 for a negative size or a row beyond 2^31 - 1 bytes, -11 and -12
+  // for null buffers. Success with *done set means that there is nothing to do.
+  VX_Result CheckBuffers(bool* done) noexcept;
+
+  // Calls kernel(const RowSpan&) for the whole picture: whole rows in order of the band, and within a row blocks from
+  // left to right. -16 when there is no memory for the rows between, -999 when the host's fan-out failed; the
+  // destination may then be partly written.
+  template <class Kernel>
+  VX_Result Run(const Kernel& kernel) noexcept {
+    Layout();
+    std::atomic<int32_t> result{VX_Success};
+    const auto rows = [&](int first, int end) {
+      if (const VX_Result band = RunBand(first, end, kernel)) result.store(band, std::memory_order_relaxed);
+    };
+    if (mHeight <= kInlineRows)
+      rows(0, mHeight);
+    else if (!ForEachBand(mHeight, rows))
+      return VX_ErrFailed;
+    return static_cast<VX_Result>(result.load(std::memory_order_relaxed));
+  }
+
+  KernelVariant Variant() const noexcept { return mVariant; }
+
+ private:
+  struct Side {
+    uint8_t* base = nullptr;
+    ptrdiff_t rowBytes = 0;
+    VX_PixelFormat format{}, working{};
+    RowConverter converter;
+    size_t scratchOffset = 0;  // of its working pixels
+    uint32_t bytesPerSixPixels = 0;
+    bool converts = false, upsideDown = false;
+  };
+
+  VX_Result Prepare(Side& side, const void* base, int32_t rowBytes, VX_PixelFormat format, VX_PixelFormat from,
+                    VX_PixelFormat to) noexcept;
+  // Decides between blocks and whole rows, and where in the scratch memory everything lies.
+  void Layout() noexcept;
+  bool TargetIsASource() const noexcept;
+  const uint8_t* Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column, size_t count) const noexcept;
+  uint8_t* Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept;
+  void Deliver(const RowSpan& span) const noexcept;
+  void Finish() const noexcept;
+
+  template <class Kernel>
+  VX_Result RunBand(int32_t first, int32_t end, const Kernel& kernel) noexcept {
+    VX_SCRATCH(scratch, mScratchBytes);
+    if (!scratch && mScratchBytes != 0) return VX_ErrOutOfMemory;
+    RowJob band(*this);
+    for (int i = 0; i < mSourceCount; ++i) band.mSources[i].converter.UseScratch(scratch.get());
+    band.mTarget.converter.UseScratch(scratch.get());
+    RowSpan span;
+    for (span.row = first; span.row < end; ++span.row)
+      for (int32_t column = 0; column < mWidth; column += mBlock) {
+        span.column = column;
+        span.count = static_cast<size_t>(mWidth - column < mBlock ? mWidth - column : mBlock);
+        for (int i = 0; i < mSourceCount; ++i)
+          span.src[i] = band.Fetch(band.mSources[i], scratch.get(), span.row, column, span.count);
+        span.dst = band.Place(scratch.get(), span.row, column);
+        kernel(static_cast<const RowSpan&>(span));
+        band.Deliver(span);
+      }
+    band.Finish();
+    return VX_Success;
+  }
+
+  int32_t mWidth, mHeight, mRenderQuality;
+  KernelVariant mVariant;
+  Side mSources[3], mTarget;
+  int mSourceCount = 0;
+  int32_t mBlock = 0;
+  size_t mScratchBytes = 0;
+  bool mStream = false;
+};
+
+}  // namespace vexel
