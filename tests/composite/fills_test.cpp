@@ -1,0 +1,250 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "formats/FormatBits.h"
+#include "support/Arena.h"
+#include "support/Formats.h"
+#include "vexel/compositing.h"
+
+namespace vexel::testing {
+namespace {
+
+using F = VX_PixelFormat;
+using Fill = VX_Result (*)(void*, int32_t, int32_t, int32_t, F);
+using Bytes = std::vector<uint8_t>;
+
+const struct {
+  Fill fill;
+  const char* name;
+  bool white, opaque;
+} kFills[] = {{VX_FillWithOpaqueBlack, "opaque black", false, true},
+              {VX_FillWithTransparentBlack, "transparent black", false, false},
+              {VX_FillWithOpaqueWhite, "opaque white", true, true},
+              {VX_FillWithTransparentWhite, "transparent white", true, false}};
+
+std::vector<F> Formats420() {
+  std::vector<F> formats;
+  const auto add = [&](F format) {
+    if (Is420(format)) formats.push_back(format);
+  };
+#define ADD_NAMED(name, value, hostName, mapping) add(F::name);
+#define ADD_UNNAMED(value, hostName, mapping) add(FromBits(value));
+  VX_PIXEL_FORMATS(ADD_NAMED)
+  VX_UNNAMED_PIXEL_FORMATS(ADD_UNNAMED)
+#undef ADD_NAMED
+#undef ADD_UNNAMED
+  return formats;
+}
+
+template <class T>
+void Append(Bytes& bytes, double value) {
+  const T sample = static_cast<T>(value);
+  bytes.insert(bytes.end(), reinterpret_cast<const uint8_t*>(&sample), reinterpret_cast<const uint8_t*>(&sample + 1));
+}
+
+// The repeating bytes of a constant row, read off the format's name: "PRGB_4444_15u" is an alpha and three colours of
+// 15 bits.
+Bytes UnitByName(const std::string& name, bool white, bool opaque) {
+  Bytes unit;
+  if (name.find("V210") == 0) {
+    const uint32_t c = 512, y = white ? 940 : 64;
+    for (const uint32_t word :
+         {c | y << 10 | c << 20, y | c << 10 | y << 20, c | y << 10 | c << 20, y | c << 10 | y << 20})
+      for (int i = 0; i < 4; ++i) unit.push_back(static_cast<uint8_t>(word >> 8 * i));
+    return unit;
+  }
+  if (name == "RGB_444_10u") return white ? Bytes{0xFC, 0xFF, 0xFF, 0xFF} : Bytes(4, 0);
+  const bool wide = name.find("32f") != std::string::npos, words = name.find("15u") != std::string::npos;
+  const double full = wide ? 1 : words ? 32768 : 255;
+  for (const char channel : name.substr(0, 4)) {
+    double value = white ? full : 0;
+    if (std::strchr("APX", channel)) value = opaque ? full : 0;
+    if (channel == 'Y') value = wide ? white : white ? 235 : 16;
+    if (channel == 'U' || channel == 'V') value = wide ? 0 : 128;
+    wide ? Append<float>(unit, value) : words ? Append<uint16_t>(unit, value) : Append<uint8_t>(unit, value);
+  }
+  return unit;
+}
+
+bool HasAlpha(const std::string& name) { return name.substr(0, 4).find_first_of("AP") != std::string::npos; }
+
+TEST(Fills, EveryRasterByItsName) {
+  for (const F format : RasterFormats())
+    for (const auto& f : kFills) {
+      const std::string name = FormatName(format);
+      SCOPED_TRACE(name + " " + f.name);
+      if (!f.opaque && !HasAlpha(name)) {
+        ExpectRefusal(name, VX_ErrUnsupportedDestinationFormat,
+                      [&](void* memory) { return f.fill(memory, 64, 4, 4, format); });
+        continue;
+      }
+      const Bytes unit = UnitByName(name, f.white, f.opaque);
+      const size_t rowBytes = static_cast<size_t>(UnpaddedRowBytes(format, 41)), pitch = rowBytes + 9;
+      Bytes picture(3 * pitch, 0x77), expected = picture;
+      for (size_t row = 0; row < 3; ++row)
+        for (size_t i = 0; i < rowBytes; ++i) expected[row * pitch + i] = unit[i % unit.size()];
+      ASSERT_EQ(f.fill(picture.data() + 2 * pitch, -static_cast<int32_t>(pitch), 41, 3, format), VX_Success);
+      ASSERT_EQ(picture, expected);
+    }
+}
+
+TEST(Fills, V210IsTheConvertedPixel) {
+  for (const F format : {F::V210_422_10u, F::V210_422_10u_709})
+    for (const auto& f : {kFills[0], kFills[2]}) {
+      const F pixels = format == F::V210_422_10u ? F::VUYP_4444_8u : F::VUYP_4444_8u_709;
+      Bytes row(48), group(16), filled(16);
+      ASSERT_EQ(f.fill(row.data(), 24, 6, 1, pixels), VX_Success);
+      ASSERT_EQ(VX_Convert(row.data(), 24, pixels, group.data(), 16, format, 6, 1, 3), VX_Success);
+      ASSERT_EQ(f.fill(filled.data(), 16, 1, 1, format), VX_Success);
+      EXPECT_EQ(filled, group);
+    }
+}
+
+// Planar chroma is half the size, rounded down; interleaved chroma is filled whole.
+TEST(Fills, PlanesOf420) {
+  for (const F format : Formats420())
+    for (const auto& [width, height] : {std::pair{64, 34}, {131, 33}, {1, 1}, {700, 701}})
+      for (const auto& f : {kFills[0], kFills[2]}) {
+        SCOPED_TRACE(::testing::Message() << std::hex << Bits(format) << std::dec << " " << width << "x" << height);
+        const size_t size = static_cast<size_t>(VX_PixelFormatSize(format, width, height));
+        Bytes block(size + 256, 0x77), expected = block;
+        void* planes[3];
+        int32_t pitch[3];
+        VX_GetPlanarBuffers(nullptr, format, width, height, planes, pitch);
+        const bool deep = Depth(format) == kDepth10u, biplanar = planes[2] == nullptr;
+        for (int plane = 0; plane < (biplanar ? 2 : 3); ++plane) {
+          const int round = biplanar ? 1 : 0;
+          const int rows = plane == 0 ? height : (height + round) / 2;
+          const int samples = plane == 0 ? width : (width + round) / 2 * (biplanar ? 2 : 1);
+          const uint8_t code = plane != 0 ? 128 : f.white ? 235 : 16;
+          for (int row = 0; row < rows; ++row)
+            for (int i = 0; i < samples; ++i) {
+              const size_t at = reinterpret_cast<size_t>(planes[plane]) + static_cast<size_t>(row * pitch[plane]);
+              if (!deep) expected[at + static_cast<size_t>(i)] = code;
+              if (deep)
+                expected[at + static_cast<size_t>(2 * i)] = 0, expected[at + static_cast<size_t>(2 * i + 1)] = code;
+            }
+        }
+        ASSERT_EQ(f.fill(block.data(), 0, width, height, format), VX_Success);
+        ASSERT_EQ(block, expected);
+      }
+}
+
+TEST(Fills, ColorIsConvertedOnceForEveryPair) {
+  const uint8_t bytes[16] = {0x80, 0x40, 0xC0, 0x3E, 0x11, 0x22, 0x33, 0x3F, 0x10, 0xA0, 0xB0, 0x3D, 0x77, 0, 0, 0x3F};
+  for (const F color : RasterFormats())
+    for (const F format : RasterFormats()) {
+      SCOPED_TRACE(std::string(FormatName(color)) + " in " + FormatName(format));
+      const std::string name = FormatName(format);
+      if (!HasAlpha(name) && name.substr(0, 4).find('X') == std::string::npos) {
+        ExpectRefusal(name, VX_ErrUnsupportedFormat,
+                      [&](void* memory) { return VX_FillWithColor(memory, 64, 4, 4, format, memory, color); });
+        continue;
+      }
+      Bytes pixel(static_cast<size_t>(UnpaddedRowBytes(format, 1))), picture(pixel.size() * 21), expected;
+      ASSERT_EQ(VX_Convert(bytes, 16, color, pixel.data(), 16, format, 1, 1, 3), VX_Success);
+      for (int i = 0; i < 21; ++i) expected.insert(expected.end(), pixel.begin(), pixel.end());
+      const auto rowBytes = static_cast<int32_t>(7 * pixel.size());
+      ASSERT_EQ(VX_FillWithColor(picture.data(), rowBytes, 7, 3, format, bytes, color), VX_Success);
+      ASSERT_EQ(picture, expected);
+    }
+}
+
+TEST(Fills, Arena) {
+  std::vector<F> formats = RasterFormats(), pictures = Formats420();
+  formats.insert(formats.end(), pictures.begin(), pictures.end());
+  for (const F format : formats)
+    for (const auto& f : kFills) {
+      ArenaCase arenaCase;
+      arenaCase.name = std::string("fill with ") + f.name;
+      arenaCase.destination = format;
+      if (!f.opaque && (Is420(format) || !HasAlpha(FormatName(format))))
+        arenaCase.expected = VX_ErrUnsupportedDestinationFormat;
+      if (Is420(format)) arenaCase.widths = {2, 4, 62, 64, 66, 130}, arenaCase.heights = {2, 4, 34};
+      arenaCase.run = [&f](const ArenaFrame*, const ArenaFrame& to) {
+        return f.fill(to.base, to.rowBytes, to.width, to.height, to.format);
+      };
+      EXPECT_TRUE(RunArena(arenaCase));
+    }
+}
+
+TEST(Fills, Refusals) {
+  constexpr F kOpaqueFrame = FromBits(0x7F000004), kPlanar10 = FromBits(0x0C000A71);
+  const struct {
+    F format;
+    VX_Result opaqueBlack, opaqueWhite, transparent, color;
+  } formats[] = {
+      {F::NTSCDV50, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
+       VX_ErrUnsupportedFormat},
+      {F::PAL_DV100_1080i, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
+       VX_ErrUnsupportedFormat},
+      {F::Invalid, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
+       VX_ErrUnsupportedFormat},
+      {kOpaqueFrame, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
+       VX_ErrUnsupportedFormat},
+      {kPlanar10, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
+       VX_ErrUnsupportedFormat},
+  };
+  for (const auto& c : formats) {
+    const std::string name = VX_PixelFormatName(c.format);
+    for (const int32_t size : {4, 0, -1}) {
+      ExpectRefusal(name, c.opaqueBlack, [&](void* p) { return VX_FillWithOpaqueBlack(p, 64, size, 4, c.format); });
+      ExpectRefusal(name, c.opaqueWhite, [&](void* p) { return VX_FillWithOpaqueWhite(p, 64, size, 4, c.format); });
+      ExpectRefusal(name, c.transparent,
+                    [&](void* p) { return VX_FillWithTransparentBlack(p, 64, size, 4, c.format); });
+      ExpectRefusal(name, c.transparent,
+                    [&](void* p) { return VX_FillWithTransparentWhite(p, 64, size, 4, c.format); });
+      ExpectRefusal(name, c.color,
+                    [&](void* p) { return VX_FillWithColor(p, 64, size, 4, c.format, p, F::BGRA_4444_8u); });
+    }
+  }
+  for (const F color : {F::NTSCDV25, F::YUV_420_MPEG2_FRAME, kOpaqueFrame})
+    ExpectRefusal("colour", VX_ErrUnsupportedFormat,
+                  [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_8u, p, color); });
+  ExpectRefusal("no chain", VX_ErrFailed,
+                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_32f, p, F::Invalid); });
+  ExpectRefusal("null colour", VX_ErrNullSource,
+                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_8u, nullptr, F::BGRA_4444_8u); });
+
+  const struct {
+    int32_t width, height, rowBytes;
+    bool null;
+    VX_Result expected;
+  } sizes[] = {{0, 4, 64, true, VX_Success},
+               {4, 0, 64, true, VX_Success},
+               {-1, 4, 64, false, VX_ErrArgumentOutOfRange},
+               {4, INT32_MIN, 64, false, VX_ErrArgumentOutOfRange},
+               {INT32_MAX, 4, 64, false, VX_ErrArgumentOutOfRange},
+               {4, 4, 15, false, VX_ErrArgumentOutOfRange},
+               {4, 4, -15, false, VX_ErrArgumentOutOfRange},
+               {4, 4, 64, true, VX_ErrNullDestination}};
+  const uint32_t pixel = 0;
+  for (const auto& s : sizes)
+    for (const F format : {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, FromBits(0x0E000A71)}) {
+      if (Is420(format) && s.rowBytes != 64) continue;
+      const std::string what = std::to_string(s.width) + "x" + std::to_string(s.height);
+      for (const auto& f : kFills)
+        if (f.opaque || !Is420(format))
+          ExpectRefusal(what, s.expected,
+                        [&](void* p) { return f.fill(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format); });
+      if (!Is420(format))
+        ExpectRefusal(what, s.expected, [&](void* p) {
+          return VX_FillWithColor(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format, &pixel, format);
+        });
+    }
+}
+
+TEST(Fills, GiantStrides) {
+  for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
+    const ArenaFrame giant = GiantStrideFrame(F::ARGB_4444_8u, 37, 7, rowBytes);
+    ASSERT_EQ(VX_FillWithOpaqueBlack(giant.base, rowBytes, 37, 7, giant.format), VX_Success);
+    for (int row = 0; row < 7; ++row)
+      for (int i = 0; i < 37 * 4; ++i) ASSERT_EQ(giant.Row(row)[i], i % 4 == 0 ? 255 : 0);
+  }
+}
+
+}  // namespace
+}  // namespace vexel::testing
