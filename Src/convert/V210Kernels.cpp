@@ -562,8 +562,8 @@ void V210ToVuyx8(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 
 void V210_709ToVuyx8_601(const uint8_t* src, uint8_t* dst, size_t count) {
-  constexpr RecodingFixed r = kRecodingFixed709To601;
-  UpsampleRow(src, dst, count, [r](int luma, int u, int v, uint8_t* out) {
+  static constexpr RecodingFixed r = kRecodingFixed709To601;
+  UpsampleRow(src, dst, count, [](int luma, int u, int v, uint8_t* out) {
     u -= 512 * 64, v -= 512 * 64;
     out[0] = RoundCode(Times(u, r.vU) + Times(v, r.vV) + 128 * 64, 6);
     out[1] = RoundCode(Times(u, r.uU) + Times(v, r.uV) + 128 * 64, 6);

@@ -2,10 +2,12 @@
 
 #include <climits>
 #include <cstring>
+#include <string>
 #include <vector>
 
 #include "formats/FormatBits.h"
 #include "geometry/Transpose.h"
+#include "support/Arena.h"
 #include "support/Random.h"
 
 namespace vexel {
@@ -88,6 +90,46 @@ TEST(Transpose, PastTheCacheNothingChanges) {
     }
 }
 
+// Memory beyond the rows, on either side, at any alignment and stride.
+TEST(Transpose, TouchesNothingButTheElements) {
+  for (size_t size = 1; size <= 16; ++size) {
+    testing::ArenaCase arenaCase;
+    arenaCase.name = "VX_Transpose of " + std::to_string(size) + "-byte elements";
+    arenaCase.sources = {F::UYVY_422_8u};
+    arenaCase.destination = F::UYVY_422_8u;
+    arenaCase.elementBytes = size;
+    arenaCase.heights = testing::Range(1, 79);
+    arenaCase.widths = testing::Range(1, 79);
+    arenaCase.sourceSize = [](int, testing::ArenaSize size) { return testing::ArenaSize{size.height, size.width}; };
+    arenaCase.run = [size](const testing::ArenaFrame* sources, const testing::ArenaFrame& to) {
+      return VX_Transpose(sources[0].base, sources[0].rowBytes, to.base, to.rowBytes, to.height, to.width,
+                          static_cast<uint8_t>(size));
+    };
+    EXPECT_TRUE(RunArena(arenaCase));
+  }
+}
+
+TEST(Rotate, TouchesNothingButThePixels) {
+  for (const F format : {F::BGRA_4444_8u, F::ARGB_4444_15u, F::VUYP_4444_32f})
+    for (const int angle : {0, 90, -90, 180})
+      for (const bool flip : {false, true}) {
+        testing::ArenaCase arenaCase;
+        arenaCase.name = "VX_RotateImageAndFlip by " + std::to_string(angle) + (flip ? ", flipped" : "");
+        arenaCase.sources = {format};
+        arenaCase.destination = format;
+        arenaCase.heights = testing::Range(1, 79);
+        arenaCase.widths = testing::Range(1, 79);
+        arenaCase.sourceSize = [angle](int, testing::ArenaSize size) {
+          return angle % 180 == 0 ? size : testing::ArenaSize{size.height, size.width};
+        };
+        arenaCase.run = [angle, flip](const testing::ArenaFrame* sources, const testing::ArenaFrame& to) {
+          return VX_RotateImageAndFlip(sources[0].base, sources[0].rowBytes, to.base, to.rowBytes, sources[0].width,
+                                       sources[0].height, to.format, angle, flip);
+        };
+        EXPECT_TRUE(RunArena(arenaCase));
+      }
+}
+
 TEST(Rotate, EveryAngleFlipAndDepth) {
   for (const F format : {F::BGRA_4444_8u, F::PRGB_4444_15u, F::VUYX_4444_32f_709})
     for (const auto& [w, h] : {std::pair{3, 2}, {1, 1}, {37, 66}, {130, 17}})
@@ -102,8 +144,8 @@ TEST(Rotate, EveryAngleFlipAndDepth) {
           ASSERT_EQ(
               VX_RotateImageAndFlip(src.base, src.rowBytes, result.base, result.rowBytes, w, h, format, angle, flip),
               VX_Success);
-          const auto at = [&](int r, int c) { return src.At(flip ? h - 1 - r : r, c); };
-          ExpectMoved(dst, result, rows, columns, [&](int i, int j) {
+          const auto at = [&, h = h](int r, int c) { return src.At(flip ? h - 1 - r : r, c); };
+          ExpectMoved(dst, result, rows, columns, [&, w = w, h = h](int i, int j) {
             switch (angle) {
               case 0:
                 return at(i, j);

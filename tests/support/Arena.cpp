@@ -91,7 +91,7 @@ void ReportFault(int, siginfo_t* info, void* context) {
       (gCallName ? *gCallName + ": touched an unreadable buffer" : Arena::Instance().DescribeFault(address, write)) +
       "\n";
   if (::write(STDERR_FILENO, text.data(), text.size()) < 0) _exit(2);
-  _exit(1);
+  abort();  // what fuzzers and debuggers look for
 }
 
 class FaultReporter {
@@ -145,10 +145,10 @@ void Arena::Place(ArenaSize size, Guard guard, Random& random) {
   };
   for (size_t i = 0; i < mCase->sources.size(); ++i) {
     const ArenaSize sourceSize = mCase->sourceSize ? mCase->sourceSize(static_cast<int>(i), size) : size;
-    mSources[i]->Place(mCase->sources[i], sourceSize, draw());
+    mSources[i]->Place(mCase->sources[i], sourceSize, draw(), mCase->elementBytes);
     mFrames[i] = mSources[i]->Frame();
   }
-  mDestination.Place(mCase->destination, size, draw());
+  mDestination.Place(mCase->destination, size, draw(), mCase->elementBytes);
 }
 
 std::string Arena::RunOnce(KernelVariant variant, Contents contents, uint64_t seed, uint8_t padding) {

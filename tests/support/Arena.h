@@ -61,6 +61,7 @@ struct ArenaCase {
   std::string name;
   std::vector<VX_PixelFormat> sources;
   VX_PixelFormat destination{};
+  size_t elementBytes = 0;  // if not 0: rows of elements of this size instead of the formats' pixels, at any address
   // sources points to as many frames as there are source formats. May be called any number of times.
   std::function<VX_Result(const ArenaFrame* sources, const ArenaFrame& destination)> run;
 

@@ -68,17 +68,21 @@ ArmedBuffer::ArmedBuffer(Access access) {
 
 uint8_t* ArmedBuffer::SlotBegin(int slot) const { return mArmed + kPage + static_cast<size_t>(slot) * kSlotPitch; }
 
-void ArmedBuffer::Place(VX_PixelFormat format, ArenaSize size, const Placement& placement) {
+void ArmedBuffer::Place(VX_PixelFormat format, ArenaSize size, const Placement& placement, size_t elementBytes) {
   mFrame = {nullptr, 0, format, size.width, size.height};
   mZones.clear();
   mSpans.clear();
   if (IsSpecial(format)) return PlaceSpecial(placement);
-  const size_t unit = SampleBytes(format);
-  const auto extent = static_cast<size_t>(UnpaddedRowBytes(format, size.width));
+  const size_t unit = elementBytes != 0 ? 1 : SampleBytes(format);
+  const auto width = static_cast<size_t>(std::max(size.width, 0));
+  const size_t extent =
+      elementBytes != 0 ? width * elementBytes : static_cast<size_t>(UnpaddedRowBytes(format, size.width));
   if (size.width < 1 || size.height < 1 || size.height > kSlots || extent + 64 * unit > kSlotPages * kPage)
     throw std::length_error("a picture larger than the arena");
-  if (placement.guard == Guard::Packed) {
-    PlaceInBlock(extent, placement, unit);
+  // Operations on elements see row bytes as whole elements.
+  const bool slotsFit = elementBytes == 0 || kSlotPitch % elementBytes == 0;
+  if (placement.guard == Guard::Packed || !slotsFit) {
+    PlaceInBlock(extent, placement, std::max(unit, elementBytes));
   } else {
     PlaceInSlots(extent, placement, unit);
   }

@@ -23,8 +23,8 @@ class ArmedBuffer {
   ArmedBuffer(const ArmedBuffer&) = delete;
   ArmedBuffer& operator=(const ArmedBuffer&) = delete;
 
-  // Lays a picture out. Throws std::length_error if it is too large.
-  void Place(VX_PixelFormat format, ArenaSize size, const Placement& placement);
+  // Lays a picture out. Throws std::length_error if it is too large. elementBytes as in ArenaCase.
+  void Place(VX_PixelFormat format, ArenaSize size, const Placement& placement, size_t elementBytes = 0);
   const ArenaFrame& Frame() const { return mFrame; }
 
   void FillPadding(uint8_t byte);

@@ -49,7 +49,7 @@ TEST(Arena, PassesWhatIsRight) {
 }
 
 TEST(ArenaDeathTest, NamesIllegalAccesses) {
-  const auto exit = ::testing::ExitedWithCode(1);
+  const auto exit = ::testing::KilledBySignal(SIGABRT);
   const auto dies = [&](const ArenaCase& arenaCase, const char* text) { EXPECT_EXIT(RunArena(arenaCase), exit, text); };
   dies(CopyAnd([](uint8_t* src, uint8_t*, size_t bytes) { gByte = src[bytes]; }),
        "copy: BGRA_4444_8u .* illegal read of source 0, row ., 0 bytes past its end");
