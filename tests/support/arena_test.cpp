@@ -5,6 +5,7 @@
 #include <xmmintrin.h>
 
 #include <cmath>
+#include <csignal>
 #include <cstring>
 #include <memory>
 
