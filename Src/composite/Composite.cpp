@@ -1,0 +1,73 @@
+// VX_Composite: the choice of a kernel and its working formats, and the short cuts through plain conversion.
+#include "composite/NormalKernels.h"
+#include "composite/Opacity.h"
+#include "composite/RowJob.h"
+#include "formats/FormatBits.h"
+#include "frame/FpModeGuard.h"
+#include "vexel/compositing.h"
+
+namespace vexel {
+namespace {
+
+using F = VX_PixelFormat;
+
+constexpr bool HasUsableAlpha(F format) {
+  return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied;
+}
+constexpr F WithAlphaKind(F format, uint32_t kind) { return FromBits((Bits(format) & ~kAlphaMask) | kind); }
+
+// The 4:4:4:4 format, alpha last, in which a result for `destination` is computed.
+constexpr F ResultFormat(F destination) {
+  const bool narrow = Depth(destination) == kDepth8u;
+  if (Layout(destination) == kLayout422) return narrow ? F::VUYP_4444_8u : F::VUYP_4444_32f;
+  uint32_t bits = Bits(destination) & ~(kReversedBit | kLayoutMask);
+  if (!narrow) bits = (bits & ~kDepthMask) | kDepth32f;
+  return HasUsableAlpha(destination) ? FromBits(bits) : WithAlphaKind(FromBits(bits), kAlphaPremultiplied);
+}
+
+// A picture given back as it is: nothing to do where it stands in the destination already.
+template <class Image>
+VX_Result CopyPicture(const Image& image, const TargetImage& dst, int32_t width, int32_t height,
+                      int32_t renderQuality) noexcept {
+  if (image.base == dst.base && image.rowBytes == dst.rowBytes && image.format == dst.format) return VX_Success;
+  return VX_Convert(image.base, image.rowBytes, image.format, dst.base, dst.rowBytes, dst.format, width, height,
+                    renderQuality);
+}
+
+VX_Result Composite(const SourceImage& src, const SourceImage& background, const TargetImage& dst, int32_t width,
+                    int32_t height, float opacity, int32_t renderQuality) noexcept {
+  if (IsSpecial(src.format) || IsSpecial(background.format)) return VX_ErrUnsupportedFormat;
+  if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
+  F result = ResultFormat(dst.format);
+  const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, HasUsableAlpha(src.format),
+                          HasUsableAlpha(background.format)};
+  const auto input = [&](bool alpha) { return WithAlphaKind(result, alpha ? kAlphaStraight : kAlphaIgnored); };
+  const F srcFormat = input(choice.sourceAlpha), backgroundFormat = input(choice.backgroundAlpha);
+  // An opaque result is the same in every alpha kind.
+  if (!choice.backgroundAlpha && AlphaKind(dst.format) == kAlphaIgnored) result = WithAlphaKind(result, kAlphaIgnored);
+
+  RowJob job(width, height, renderQuality);
+  if (job.AddSource(src, srcFormat) || job.AddSource(background, backgroundFormat) || job.SetTarget(dst, result))
+    return VX_ErrFormatNotHandled;
+  bool done;
+  const VX_Result check = job.CheckBuffers(&done);
+  if (check != VX_Success || done) return check;
+
+  opacity = UsableOpacity(opacity);
+  if (opacity == 0.0f) return CopyPicture(background, dst, width, height, renderQuality);
+  if (opacity == 1.0f && !choice.sourceAlpha) return CopyPicture(src, dst, width, height, renderQuality);
+  const OverKernel over = (Depth(result) == kDepth8u ? Over8u(choice) : Over32f(choice))[job.Variant()];
+  return job.Run([=](const RowSpan& span) { over(span.src[0], span.src[1], span.dst, span.count, opacity); });
+}
+
+}  // namespace
+}  // namespace vexel
+
+VX_Result VX_Composite(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, const void* background,
+                       int32_t backgroundRowBytes, VX_PixelFormat backgroundFormat, void* dst, int32_t dstRowBytes,
+                       VX_PixelFormat dstFormat, int32_t width, int32_t height, float opacity, int32_t conversionOption,
+                       bool) noexcept {
+  const vexel::FpModeGuard fpMode;
+  return vexel::Composite({src, srcRowBytes, srcFormat}, {background, backgroundRowBytes, backgroundFormat},
+                          {dst, dstRowBytes, dstFormat}, width, height, opacity, conversionOption);
+}

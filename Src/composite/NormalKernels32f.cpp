@@ -1,0 +1,122 @@
+// Normal compositing in floats, nothing clamped: the colours of the two parts weighted with t = as / ao. Black is 0 in
+// every channel, for Y'CbCr too.
+#include <cmath>
+#include <cstddef>
+#include <cstdint>
+
+#include "composite/NormalKernels.h"
+#include "convert/PlainPixels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "composite/NormalKernels32f.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "composite/TwoRows-inl.h"
+#include "convert/FloatPixels-inl.h"
+#include "frame/KernelTable.h"
+
+#ifndef VEXEL_COMPOSITE_NORMALKERNELS32F_SHARED
+#define VEXEL_COMPOSITE_NORMALKERNELS32F_SHARED
+namespace vexel {
+namespace {
+
+// A straight result with less alpha than this has no colour.
+constexpr float kLeastAlpha = 8e-6f;
+
+}  // namespace
+}  // namespace vexel
+#endif
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace {
+
+template <OverChoice kChoice>
+HWY_INLINE F32 Over(F32 s, F32 d, F32 opacity) {
+  const FloatTag df;
+  const auto one = hn::Set(df, 1.0f);
+  auto as = opacity;
+  if constexpr (kChoice.sourceAlpha) as = hn::Mul(hn::Broadcast<3>(s), opacity);
+  const auto mix = [&](F32 t) HWY_ATTR { return hn::Add(hn::Mul(hn::Sub(one, t), d), hn::Mul(t, s)); };
+  if constexpr (!kChoice.backgroundAlpha) return TakeChannels<8>(mix(as), one);
+  const auto ab = hn::Broadcast<3>(d);
+  const auto both = hn::Mul(as, ab);
+  const auto ao = hn::Sub(hn::Add(ab, as), both);
+  if constexpr (!kChoice.straight) return TakeChannels<8>(hn::Add(hn::Mul(s, as), hn::Mul(d, hn::Sub(ab, both))), ao);
+  const auto clear = hn::Lt(hn::Abs(ao), hn::Set(df, kLeastAlpha));
+  const auto t = hn::Mul(as, hn::Div(one, hn::IfThenElse(clear, one, ao)));
+  return TakeChannels<8>(hn::IfThenZeroElse(clear, mix(t)), ao);
+}
+
+template <OverChoice kChoice>
+HWY_ATTR void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+  const auto part = hn::Set(FloatTag(), opacity);
+  TwoRowLoop<4 * kVectorPixels, 16>(
+      source, background, dst, count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+        const auto r0 = Over<kChoice>(LoadVector<float>(from, 0), LoadVector<float>(onto, 0), part);
+        const auto r1 = Over<kChoice>(LoadVector<float>(from, 1), LoadVector<float>(onto, 1), part);
+        const auto r2 = Over<kChoice>(LoadVector<float>(from, 2), LoadVector<float>(onto, 2), part);
+        const auto r3 = Over<kChoice>(LoadVector<float>(from, 3), LoadVector<float>(onto, 3), part);
+        StoreVector(r0, out, 0);
+        StoreVector(r1, out, 1);
+        StoreVector(r2, out, 2);
+        StoreVector(r3, out, 3);
+      });
+}
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#if HWY_ONCE
+namespace vexel {
+namespace plain {
+namespace {
+
+template <OverChoice kChoice>
+void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+  for (size_t i = 0; i < count; ++i) {
+    float s[4], d[4];
+    std::memcpy(s, source + 16 * i, sizeof s);
+    std::memcpy(d, background + 16 * i, sizeof d);
+    const float as = kChoice.sourceAlpha ? s[3] * opacity : opacity;
+    const float ab = kChoice.backgroundAlpha ? d[3] : 1.0f;
+    const float ao = kChoice.backgroundAlpha ? ab + as - as * ab : 1.0f;
+    const bool clear = kChoice.straight && std::fabs(ao) < kLeastAlpha;
+    const float t = kChoice.backgroundAlpha && !clear ? as * (1 / ao) : as;
+    float out[4];
+    ForChannels<3>([&](size_t k) {
+      if (clear)
+        out[k] = 0;
+      else if (kChoice.straight)
+        out[k] = (1 - t) * d[k] + t * s[k];
+      else
+        out[k] = s[k] * as + d[k] * (ab - as * ab);
+    });
+    out[3] = ao;
+    std::memcpy(dst + 16 * i, out, sizeof out);
+  }
+}
+
+}  // namespace
+}  // namespace plain
+
+namespace {
+
+template <OverChoice kChoice>
+const OverKernelSet kOver32 = VX_KERNEL_VARIANTS(Over32<kChoice>);
+
+}  // namespace
+
+const OverKernelSet& Over32f(OverChoice choice) noexcept {
+  choice.yuv = false;
+  return PickOver(choice, []<OverChoice kChoice>() -> const OverKernelSet& { return kOver32<kChoice>; });
+}
+
+}  // namespace vexel
+#endif  // HWY_ONCE

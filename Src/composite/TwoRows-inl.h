@@ -1,0 +1,45 @@
+// The loop of kernels that lay one row over another: full blocks in place, the rest through the same body on padded
+// copies (as frame/RowLoop-inl.h). The destination may be one of the rows.
+#if defined(VEXEL_COMPOSITE_TWOROWS_INL_H_) == defined(HWY_TARGET_TOGGLE)
+#ifdef VEXEL_COMPOSITE_TWOROWS_INL_H_
+#undef VEXEL_COMPOSITE_TWOROWS_INL_H_
+#else
+#define VEXEL_COMPOSITE_TWOROWS_INL_H_
+#endif
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+
+#include <hwy/highway.h>
+
+#include "convert/PixelVectors-inl.h"
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+
+// Calls body(source, background, dst) for each block of kBlock pixels of kBytes bytes. The padding of the tail is zero;
+// what is computed there is thrown away.
+template <size_t kBlock, size_t kBytes, class Body>
+HWY_INLINE void TwoRowLoop(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count,
+                           const Body& body) {
+  size_t i = 0;
+  for (; i + kBlock <= count; i += kBlock) body(source + i * kBytes, background + i * kBytes, dst + i * kBytes);
+  if (const size_t rest = count - i) {
+    alignas(64) uint8_t in[2][kBlock * kBytes] = {};
+    alignas(64) uint8_t out[kBlock * kBytes];
+    std::memcpy(in[0], source + i * kBytes, rest * kBytes);
+    std::memcpy(in[1], background + i * kBytes, rest * kBytes);
+    body(in[0], in[1], out);
+    std::memcpy(dst + i * kBytes, out, rest * kBytes);
+  }
+}
+
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#endif

@@ -1,0 +1,359 @@
+// VX_Composite against the formula in double precision and against its own rules.
+#include <gtest/gtest.h>
+#include <vexel_host/host.h>
+#include <xmmintrin.h>
+
+#include <cmath>
+#include <cstring>
+#include <limits>
+#include <string>
+#include <vector>
+
+#include "formats/FormatBits.h"
+#include "support/Arena.h"
+#include "support/FailingAllocations.h"
+#include "support/Formats.h"
+#include "support/Random.h"
+#include "vexel/compositing.h"
+
+namespace vexel::testing {
+namespace {
+
+using F = VX_PixelFormat;
+
+struct Image {
+  Image(F f, int w, int h, Contents contents = Contents::Random, uint64_t seed = 1)
+      : format(f), width(w), height(h), rowBytes(static_cast<int32_t>(UnpaddedRowBytes(f, w))) {
+    bytes.resize(static_cast<size_t>(rowBytes) * static_cast<size_t>(h));
+    Random random(seed);
+    for (int row = 0; row < h; ++row) FillSamples(Row(row), static_cast<size_t>(rowBytes), f, contents, random);
+  }
+  uint8_t* Row(int row) { return bytes.data() + ptrdiff_t{row} * rowBytes; }
+  template <class T>
+  T* As() {
+    return reinterpret_cast<T*>(bytes.data());
+  }
+  F format;
+  int width, height;
+  int32_t rowBytes;
+  std::vector<uint8_t> bytes;
+};
+
+VX_Result Composite(Image& s, Image& d, Image& out, float opacity, int32_t quality = 3) {
+  return VX_Composite(s.bytes.data(), s.rowBytes, s.format, d.bytes.data(), d.rowBytes, d.format, out.bytes.data(),
+                      out.rowBytes, out.format, out.width, out.height, opacity, quality, false);
+}
+
+VX_Result Convert(Image& from, Image& to, int32_t quality = 3) {
+  return VX_Convert(from.bytes.data(), from.rowBytes, from.format, to.bytes.data(), to.rowBytes, to.format, to.width,
+                    to.height, quality);
+}
+
+// One channel of source-over by the definition; codes and alphas in 0..1.
+struct Exact {
+  Exact(double sourceAlpha, double backgroundAlpha) : as(sourceAlpha), ab(backgroundAlpha), ao(as + ab * (1 - as)) {}
+  double Colour(double s, double d, double black, bool straight) const {
+    const double premultiplied = (s - black) * as + (d - black) * ab * (1 - as);
+    if (!straight) return black + premultiplied;
+    return ao > 7.6293945e-6 ? black + premultiplied / ao : black;
+  }
+  double as, ab, ao;
+};
+
+bool Carries(F format) { return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied; }
+
+// All alphas over all alphas, with a few thousand pairs of colours among them.
+void ExpectNearExact8(F src, F background, F dst, float opacity) {
+  SCOPED_TRACE(std::string(VX_PixelFormatName(src)) + " over " + VX_PixelFormatName(background) + " in " +
+               VX_PixelFormatName(dst) + " at " + std::to_string(opacity));
+  Image s(src, 256, 256), d(background, 256, 256, Contents::Extremes, 2), out(dst, 256, 256);
+  for (int i = 0; i < 256 * 256; ++i) s.bytes[4 * i + 3] = static_cast<uint8_t>(i), d.bytes[4 * i + 3] = i >> 8;
+  ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
+  const bool straight = AlphaKind(dst) == kAlphaStraight;
+  double worst = 0;
+  for (int i = 0; i < 256 * 256; ++i) {
+    const uint8_t *sp = &s.bytes[4 * i], *dp = &d.bytes[4 * i], *op = &out.bytes[4 * i];
+    const double opaque = opacity >= 0.999992f ? 1 : double{opacity};
+    const Exact exact(Carries(src) ? sp[3] / 255.0 * opaque : opaque, Carries(background) ? dp[3] / 255.0 : 1);
+    for (int k = 0; k < 3; ++k) {
+      const double black = !IsYuv(dst) ? 0 : k == 2 ? 16 : 128;
+      worst = std::max(worst, std::abs(op[k] - exact.Colour(sp[k], dp[k], black, straight)));
+    }
+    worst = std::max(worst, std::abs(op[3] - 255 * exact.ao));
+  }
+  EXPECT_LE(worst, opacity >= 1 ? 0.5001 : 0.52);
+}
+
+TEST(Composite, EveryEightBitKernelIsTheFormulaRounded) {
+  for (const float opacity : {1.0f, 0.6f, 0.5f, 0.999f, 0.01f, 1e-5f})
+    for (const bool yuv : {false, true})
+      for (const bool straight : {false, true})
+        for (const bool sourceAlpha : {false, true})
+          for (const bool backgroundAlpha : {false, true}) {
+            if (opacity == 1 && !sourceAlpha) continue;  // a conversion
+            const F with = yuv ? F::VUYA_4444_8u : F::BGRA_4444_8u, without = yuv ? F::VUYX_4444_8u : F::BGRX_4444_8u;
+            const F premultiplied = yuv ? F::VUYP_4444_8u : F::BGRP_4444_8u;
+            ExpectNearExact8(sourceAlpha ? with : without, backgroundAlpha ? with : without,
+                             straight ? with : premultiplied, opacity);
+          }
+}
+
+// Every alpha, source and background code over opaque pixels: rounded exactly at opacity 1. Pixels that are not opaque
+// beside them change nothing, at any opacity.
+TEST(Composite, OpaqueBackgroundsExactlyAndWhateverIsBesideThem) {
+  Image s(F::BGRA_4444_8u, 86, 256), d(F::BGRA_4444_8u, 86, 256), out(F::BGRA_4444_8u, 86, 256), mixed = out;
+  for (const float opacity : {1.0f, 0.6f})
+    for (int alpha = 0; alpha < 256; ++alpha) {
+      for (int row = 0; row < 256; ++row)
+        for (int i = 0; i < 86; ++i)
+          for (int k = 0; k < 4; ++k) {
+            s.Row(row)[4 * i + k] = static_cast<uint8_t>(k == 3 ? alpha : row);
+            d.Row(row)[4 * i + k] = static_cast<uint8_t>(k == 3 ? 255 : std::min(3 * i + k, 255));
+          }
+      ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
+      for (int row = 0; row < 256 && opacity == 1; ++row)
+        for (int i = 0; i < 86 * 4; ++i) {
+          const int code = i % 4 == 3 ? 255 : (2 * (row * alpha + d.Row(row)[i] * (255 - alpha)) + 255) / 510;
+          ASSERT_EQ(out.Row(row)[i], code) << "alpha " << alpha << " source " << row << " background " << i;
+        }
+      for (int row = 0; row < 256; ++row) d.Row(row)[4 * (row % 86) + 3] = 254;
+      ASSERT_EQ(Composite(s, d, mixed, opacity), VX_Success);
+      for (int row = 0; row < 256; ++row)
+        std::memcpy(mixed.Row(row) + 4 * (row % 86), out.Row(row) + 4 * (row % 86), 4);
+      ASSERT_EQ(mixed.bytes, out.bytes) << "alpha " << alpha;
+    }
+}
+
+TEST(Composite, EveryFloatKernelIsTheFormula) {
+  for (const float opacity : {1.0f, 0.6f, 1e-4f})
+    for (const F dst :
+         {F::BGRA_4444_32f, F::BGRP_4444_32f, F::VUYA_4444_32f_709, F::VUYP_4444_32f, F::BGRA_4444_32f_Linear})
+      for (const bool sourceAlpha : {false, true})
+        for (const bool backgroundAlpha : {false, true}) {
+          if (opacity == 1 && !sourceAlpha) continue;
+          const bool straight = AlphaKind(dst) == kAlphaStraight;
+          const auto input = [&](bool alpha) {
+            return FromBits((Bits(dst) & ~kAlphaMask) | (alpha ? kAlphaStraight : kAlphaIgnored));
+          };
+          Image s(input(sourceAlpha), 1000, 3), d(input(backgroundAlpha), 1000, 3, Contents::Random, 2),
+              out(dst, 1000, 3);
+          for (int i = 0; i < 50; ++i) d.As<float>()[4 * i + 3] = 0;  // and some with hardly a source either
+          for (int i = 0; i < 25; ++i) s.As<float>()[4 * i + 3] = i % 2 ? 0 : 4e-6f;
+          ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
+          for (int i = 0; i < 3000; ++i) {
+            const float *sp = s.As<float>() + 4 * i, *dp = d.As<float>() + 4 * i, *op = out.As<float>() + 4 * i;
+            const Exact exact(sourceAlpha ? double{sp[3]} * opacity : double{opacity}, backgroundAlpha ? dp[3] : 1.0);
+            ASSERT_NEAR(op[3], exact.ao, 1e-6);
+            for (int k = 0; k < 3; ++k) {
+              const double t = exact.as / exact.ao;
+              const double value = !straight                   ? exact.Colour(sp[k], dp[k], 0, false)
+                                   : std::abs(exact.ao) < 8e-6 ? 0
+                                                               : (1 - t) * dp[k] + t * sp[k];
+              // Where alphas cancel each other, the quotient carries the rounding of a small sum.
+              ASSERT_NEAR(op[k], value, 2e-6 * (straight ? 1 + 1 / std::abs(exact.ao) / std::abs(exact.ao) : 1))
+                  << VX_PixelFormatName(dst) << " at " << opacity << ", pixel " << i;
+            }
+          }
+        }
+}
+
+// The format in which a result is computed, by the destination's name.
+F WorkingByName(F dst) {
+  const std::string name = FormatName(dst);
+  if (name.find("422") != std::string::npos)
+    return name.find("422_8u") != std::string::npos ? F::VUYP_4444_8u : F::VUYP_4444_32f;
+  if (dst == kRgb10Format) return F::BGRP_4444_32f;
+  const bool yuv = name.substr(0, 3) == "VUY", narrow = name.find("8u") != std::string::npos;
+  const bool straight = name.substr(0, 4).find('A') != std::string::npos;
+  std::string working = std::string(yuv ? "VUY" : "BGR") + (straight ? "A" : "P") + "_4444_" + (narrow ? "8u" : "32f");
+  if (name.find("709") != std::string::npos) working += "_709";
+  if (name.find("Linear") != std::string::npos) working += "_Linear";
+#define VX_FIND(formatName, value, hostName, mapping) \
+  if (working == #formatName) return F::formatName;
+  VX_PIXEL_FORMATS(VX_FIND)
+#undef VX_FIND
+  ADD_FAILURE() << working;
+  return F::Invalid;
+}
+
+TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
+  constexpr int kWidth = 773, kHeight = 3;
+  const F inputs[] = {F::BGRA_4444_8u,  F::PRGB_4444_8u, F::UYVY_422_8u_709, F::V210_422_10u,  F::VUYP_4444_8u,
+                      F::ARGB_4444_15u, kRgb10Format,    F::XRGB_4444_32f,   F::VUYA_4444_32f, F::BGRP_4444_32f_Linear};
+  int pair = 0;
+  for (const F dst : RasterFormats())
+    for (int repeat = 0; repeat < 12; ++repeat, ++pair) {
+      const F src = inputs[pair % 10], background = inputs[(pair / 10 + 3 * repeat) % 10];
+      SCOPED_TRACE(std::string(FormatName(src)) + " over " + FormatName(background) + " in " + FormatName(dst));
+      const F working = WorkingByName(dst);
+      const auto input = [&](F format) {
+        return FromBits((Bits(working) & ~kAlphaMask) | (Carries(format) ? kAlphaStraight : kAlphaIgnored));
+      };
+      Image s(src, kWidth, kHeight), d(background, kWidth, kHeight, Contents::Random, 2), out(dst, kWidth, kHeight);
+      Image ws(input(src), kWidth, kHeight), wd(input(background), kWidth, kHeight), wout(working, kWidth, kHeight);
+      Image expected(dst, kWidth, kHeight);
+      ASSERT_EQ(Convert(s, ws), VX_Success);
+      ASSERT_EQ(Convert(d, wd), VX_Success);
+      ASSERT_EQ(Composite(ws, wd, wout, 0.6f), VX_Success);
+      ASSERT_EQ(Convert(wout, expected), VX_Success);
+      ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
+      ASSERT_EQ(out.bytes, expected.bytes);
+
+      Image plain(dst, kWidth, kHeight);
+      ASSERT_EQ(Convert(d, plain), VX_Success);
+      for (const float none : {0.0f, 7.9e-6f, -1.0f, std::numeric_limits<float>::quiet_NaN()}) {
+        ASSERT_EQ(Composite(s, d, out, none), VX_Success);
+        ASSERT_EQ(out.bytes, plain.bytes);
+      }
+      Image one = out;
+      ASSERT_EQ(Composite(s, d, one, 1.0f), VX_Success);
+      if (!Carries(src)) {
+        ASSERT_EQ(Convert(s, plain), VX_Success);
+        ASSERT_EQ(one.bytes, plain.bytes);
+      }
+      for (const float full : {0.999995f, 7.0f, std::numeric_limits<float>::infinity()}) {
+        ASSERT_EQ(Composite(s, d, out, full), VX_Success);
+        ASSERT_EQ(out.bytes, one.bytes);
+      }
+    }
+}
+
+ArenaCase OverCase(F src, F background, F dst, float opacity) {
+  ArenaCase arenaCase;
+  arenaCase.name = std::string("composite ") + FormatName(src) + " over " + FormatName(background) + " in " +
+                   FormatName(dst) + " at " + std::to_string(opacity);
+  arenaCase.sources = {src, background};
+  arenaCase.destination = dst;
+  arenaCase.run = [opacity](const ArenaFrame* from, const ArenaFrame& to) {
+    return VX_Composite(from[0].base, from[0].rowBytes, from[0].format, from[1].base, from[1].rowBytes, from[1].format,
+                        to.base, to.rowBytes, to.format, to.width, to.height, opacity, 3, false);
+  };
+  return arenaCase;
+}
+
+TEST(Composite, Arena) {
+  const std::vector<F> formats = RasterFormats();
+  size_t turn = 0;
+  for (const F dst : formats)
+    for (const float opacity : {1.0f, 0.6f, 0.0f}) {
+      const F src = formats[(turn * 7 + 3) % formats.size()], background = formats[turn * 5 % formats.size()];
+      ArenaCase arenaCase = OverCase(src, background, dst, opacity);
+      arenaCase.seed = ++turn;
+      EXPECT_TRUE(RunArena(arenaCase));
+    }
+  // The kernels without any conversion around them.
+  for (const F dst :
+       {F::BGRA_4444_8u, F::BGRP_4444_8u, F::VUYA_4444_8u, F::VUYP_4444_8u, F::BGRA_4444_32f, F::BGRP_4444_32f})
+    for (const bool sourceAlpha : {false, true})
+      for (const bool backgroundAlpha : {false, true})
+        for (const float opacity : {1.0f, 0.6f}) {
+          const auto input = [&](bool alpha) {
+            return FromBits((Bits(dst) & ~kAlphaMask) | (alpha ? kAlphaStraight : kAlphaIgnored));
+          };
+          ArenaCase arenaCase = OverCase(input(sourceAlpha), input(backgroundAlpha), dst, opacity);
+          arenaCase.everyContents = true;
+          EXPECT_TRUE(RunArena(arenaCase));
+        }
+}
+
+// The destination as either input: the bytes of a call with three buffers.
+TEST(Composite, InPlace) {
+  for (const F format : RasterFormats())
+    for (const float opacity : {0.0f, 0.6f, 1.0f})
+      for (const bool onSource : {false, true}) {
+        SCOPED_TRACE(std::string(FormatName(format)) + (onSource ? " on source" : " on background"));
+        Image s(format, 515, 70), d(format, 515, 70, Contents::Random, 2), out(format, 515, 70);
+        ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
+        Image& target = onSource ? s : d;
+        ASSERT_EQ(Composite(s, d, target, opacity), VX_Success);
+        ASSERT_EQ(target.bytes, out.bytes);
+      }
+}
+
+TEST(Composite, ThreadsAndStreamsChangeNothing) {
+  const struct {
+    F src, background, dst;
+    int width, height;
+  } cases[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u, F::BGRA_4444_8u, 301, 65},
+               {F::BGRA_4444_8u, F::UYVY_422_8u, F::V210_422_10u_709, 301, 200},
+               {F::BGRP_4444_32f, F::V210_422_10u, F::BGRX_4444_8u, 1920, 1080},
+               {F::BGRA_4444_8u, F::BGRX_4444_8u, F::BGRA_4444_8u, 1920, 1080}};
+  for (const auto& c : cases) {
+    Image s(c.src, c.width, c.height), d(c.background, c.width, c.height, Contents::Random, 2);
+    Image expected(c.dst, c.width, c.height), row(c.dst, c.width, 1);
+    for (int i = 0; i < c.height; ++i) {
+      const auto at = [&](Image& image) {
+        const bool same = VX_IsOriginTopLeft(image.format) == VX_IsOriginTopLeft(c.dst);
+        return image.Row(same ? i : c.height - 1 - i);
+      };
+      ASSERT_EQ(VX_Composite(at(s), s.rowBytes, s.format, at(d), d.rowBytes, d.format, row.bytes.data(), row.rowBytes,
+                             row.format, c.width, 1, 0.6f, 3, false),
+                VX_Success);
+      std::memcpy(expected.Row(i), row.bytes.data(), row.bytes.size());
+    }
+    for (const int limit : {1, 2, 3, 7, 16}) {
+      vexel_host::SetThreadLimit(limit);
+      Image out(c.dst, c.width, c.height);
+      ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
+      EXPECT_EQ(out.bytes, expected.bytes) << limit << " threads";
+    }
+    vexel_host::SetThreadLimit(0);
+  }
+}
+
+TEST(Composite, FailingAllocations) {
+  Image s(F::V210_422_10u, 20001, 2), d(F::BGRA_4444_15u, 20001, 2), out(F::UYVY_422_8u, 20001, 2);
+  EXPECT_GE(ExpectSurvivesFailingAllocations("wide rows", [&] { return Composite(s, d, out, 0.5f); }), 1);
+}
+
+TEST(Composite, ControlWordComesBack) {
+  const unsigned callers = _mm_getcsr();
+  Image s(F::BGRA_4444_32f, 65, 65), d(F::BGRA_4444_8u, 65, 65), x(F::BGRX_4444_8u, 65, 65),
+      out(F::BGRA_4444_8u, 65, 65);
+  for (const unsigned word : {0x1F80u, 0x7F95u, 0x3FBFu}) {
+    _mm_setcsr(word);
+    unsigned after[5];
+    Composite(s, d, out, 0.5f), after[0] = _mm_getcsr();
+    Composite(s, d, out, 0), after[1] = _mm_getcsr();
+    Composite(x, d, out, 1), after[2] = _mm_getcsr();
+    out.format = F::PALDV25, Composite(s, d, out, 0.5f), after[3] = _mm_getcsr();
+    out.format = FromBits(0xFFFF), Composite(s, d, out, 0.5f), after[4] = _mm_getcsr();
+    _mm_setcsr(callers);
+    out.format = F::BGRA_4444_8u;
+    for (const unsigned left : after) EXPECT_EQ(left, word);
+  }
+}
+
+TEST(Composite, RefusesAlikeAtEveryOpacity) {
+  constexpr F kSpecial = F::YUV_420_MPEG2_FRAME, kNone = FromBits(0xFFFF), kRaster = F::BGRA_4444_8u;
+  enum Null { kNothing, kSource, kBackground, kDestination };
+  const struct {
+    F src, background, dst;
+    int32_t width, height;
+    Null null;
+    VX_Result expected;
+  } cases[] = {{kSpecial, kRaster, kSpecial, -1, -1, kSource, VX_ErrUnsupportedFormat},
+               {kRaster, kSpecial, kSpecial, 4, 4, kNothing, VX_ErrUnsupportedFormat},
+               {kRaster, kNone, kSpecial, 4, 4, kNothing, VX_ErrUnsupportedDestinationFormat},
+               {kNone, kRaster, kRaster, -4, 4, kNothing, VX_ErrFormatNotHandled},
+               {kRaster, kNone, kRaster, 4, 4, kNothing, VX_ErrFormatNotHandled},
+               {kRaster, kRaster, kNone, 0, 0, kNothing, VX_ErrFormatNotHandled},
+               {kRaster, kRaster, F::V210_422_10u, -1, 4, kSource, VX_ErrArgumentOutOfRange},
+               {kRaster, kRaster, kRaster, 4, INT32_MIN, kNothing, VX_ErrArgumentOutOfRange},
+               {kRaster, kRaster, kRaster, INT32_MAX, 1, kNothing, VX_ErrArgumentOutOfRange},
+               {kRaster, kRaster, kRaster, 0, 4, kSource, VX_Success},
+               {kRaster, kRaster, kRaster, 4, 0, kDestination, VX_Success},
+               {kRaster, kRaster, kRaster, 4, 4, kSource, VX_ErrNullSource},
+               {F::BGRX_4444_8u, kRaster, kRaster, 4, 4, kBackground, VX_ErrNullSource},
+               {F::BGRX_4444_8u, kRaster, kRaster, 4, 4, kDestination, VX_ErrNullDestination}};
+  for (const auto& c : cases)
+    for (const float opacity : {0.0f, 0.5f, 1.0f})
+      ExpectRefusal("composite at " + std::to_string(opacity), c.expected, [&](void* memory) {
+        const auto at = [&](Null which) { return c.null == which ? nullptr : memory; };
+        return VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background, at(kDestination), 64, c.dst,
+                            c.width, c.height, opacity, 3, false);
+      });
+}
+
+}  // namespace
+}  // namespace vexel::testing
