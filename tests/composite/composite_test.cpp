@@ -9,11 +9,11 @@
 #include <string>
 #include <vector>
 
+#include "composite/composite_image.h"
 #include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
 #include "support/Formats.h"
-#include "support/Random.h"
 #include "vexel/compositing.h"
 
 namespace vexel::testing {
@@ -21,32 +21,9 @@ namespace {
 
 using F = VX_PixelFormat;
 
-struct Image {
-  Image(F f, int w, int h, Contents contents = Contents::Random, uint64_t seed = 1)
-      : format(f), width(w), height(h), rowBytes(static_cast<int32_t>(UnpaddedRowBytes(f, w))) {
-    bytes.resize(static_cast<size_t>(rowBytes) * static_cast<size_t>(h));
-    Random random(seed);
-    for (int row = 0; row < h; ++row) FillSamples(Row(row), static_cast<size_t>(rowBytes), f, contents, random);
-  }
-  uint8_t* Row(int row) { return bytes.data() + ptrdiff_t{row} * rowBytes; }
-  template <class T>
-  T* As() {
-    return reinterpret_cast<T*>(bytes.data());
-  }
-  F format;
-  int width, height;
-  int32_t rowBytes;
-  std::vector<uint8_t> bytes;
-};
-
 VX_Result Composite(Image& s, Image& d, Image& out, float opacity, int32_t quality = 3) {
   return VX_Composite(s.bytes.data(), s.rowBytes, s.format, d.bytes.data(), d.rowBytes, d.format, out.bytes.data(),
                       out.rowBytes, out.format, out.width, out.height, opacity, quality, false);
-}
-
-VX_Result Convert(Image& from, Image& to, int32_t quality = 3) {
-  return VX_Convert(from.bytes.data(), from.rowBytes, from.format, to.bytes.data(), to.rowBytes, to.format, to.width,
-                    to.height, quality);
 }
 
 // One channel of source-over by the definition; codes and alphas in 0..1.
@@ -60,8 +37,6 @@ struct Exact {
   double as, ab, ao;
 };
 
-bool Carries(F format) { return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied; }
-
 // All alphas over all alphas, with a few thousand pairs of colours among them.
 void ExpectNearExact8(F src, F background, F dst, float opacity) {
   SCOPED_TRACE(std::string(VX_PixelFormatName(src)) + " over " + VX_PixelFormatName(background) + " in " +
@@ -74,7 +49,8 @@ void ExpectNearExact8(F src, F background, F dst, float opacity) {
   for (int i = 0; i < 256 * 256; ++i) {
     const uint8_t *sp = &s.bytes[4 * i], *dp = &d.bytes[4 * i], *op = &out.bytes[4 * i];
     const double opaque = opacity >= 0.999992f ? 1 : double{opacity};
-    const Exact exact(Carries(src) ? sp[3] / 255.0 * opaque : opaque, Carries(background) ? dp[3] / 255.0 : 1);
+    const Exact exact(CarriesAlpha(src) ? sp[3] / 255.0 * opaque : opaque,
+                      CarriesAlpha(background) ? dp[3] / 255.0 : 1);
     for (int k = 0; k < 3; ++k) {
       const double black = !IsYuv(dst) ? 0 : k == 2 ? 16 : 128;
       worst = std::max(worst, std::abs(op[k] - exact.Colour(sp[k], dp[k], black, straight)));
@@ -168,12 +144,7 @@ F WorkingByName(F dst) {
   std::string working = std::string(yuv ? "VUY" : "BGR") + (straight ? "A" : "P") + "_4444_" + (narrow ? "8u" : "32f");
   if (name.find("709") != std::string::npos) working += "_709";
   if (name.find("Linear") != std::string::npos) working += "_Linear";
-#define VX_FIND(formatName, value, hostName, mapping) \
-  if (working == #formatName) return F::formatName;
-  VX_PIXEL_FORMATS(VX_FIND)
-#undef VX_FIND
-  ADD_FAILURE() << working;
-  return F::Invalid;
+  return FormatByName(working);
 }
 
 TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
@@ -187,7 +158,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
       SCOPED_TRACE(std::string(FormatName(src)) + " over " + FormatName(background) + " in " + FormatName(dst));
       const F working = WorkingByName(dst);
       const auto input = [&](F format) {
-        return FromBits((Bits(working) & ~kAlphaMask) | (Carries(format) ? kAlphaStraight : kAlphaIgnored));
+        return FromBits((Bits(working) & ~kAlphaMask) | (CarriesAlpha(format) ? kAlphaStraight : kAlphaIgnored));
       };
       Image s(src, kWidth, kHeight), d(background, kWidth, kHeight, Contents::Random, 2), out(dst, kWidth, kHeight);
       Image ws(input(src), kWidth, kHeight), wd(input(background), kWidth, kHeight), wout(working, kWidth, kHeight);
@@ -207,7 +178,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
       }
       Image one = out;
       ASSERT_EQ(Composite(s, d, one, 1.0f), VX_Success);
-      if (!Carries(src)) {
+      if (!CarriesAlpha(src)) {
         ASSERT_EQ(Convert(s, plain), VX_Success);
         ASSERT_EQ(one.bytes, plain.bytes);
       }
@@ -282,14 +253,10 @@ TEST(Composite, ThreadsAndStreamsChangeNothing) {
     Image s(c.src, c.width, c.height), d(c.background, c.width, c.height, Contents::Random, 2);
     Image expected(c.dst, c.width, c.height), row(c.dst, c.width, 1);
     for (int i = 0; i < c.height; ++i) {
-      const auto at = [&](Image& image) {
-        const bool same = VX_IsOriginTopLeft(image.format) == VX_IsOriginTopLeft(c.dst);
-        return image.Row(same ? i : c.height - 1 - i);
-      };
-      ASSERT_EQ(VX_Composite(at(s), s.rowBytes, s.format, at(d), d.rowBytes, d.format, row.bytes.data(), row.rowBytes,
-                             row.format, c.width, 1, 0.6f, 3, false),
+      ASSERT_EQ(VX_Composite(s.UprightRow(i), s.rowBytes, s.format, d.UprightRow(i), d.rowBytes, d.format,
+                             row.bytes.data(), row.rowBytes, row.format, c.width, 1, 0.6f, 3, false),
                 VX_Success);
-      std::memcpy(expected.Row(i), row.bytes.data(), row.bytes.size());
+      std::memcpy(expected.UprightRow(i), row.bytes.data(), row.bytes.size());
     }
     for (const int limit : {1, 2, 3, 7, 16}) {
       vexel_host::SetThreadLimit(limit);
