@@ -3,15 +3,10 @@
 namespace vexel {
 namespace {
 
-thread_local uint32_t tState = 1;
+thread_local RandomSequence tSequence(1);
 
 }  // namespace
 
-void SeedRuntimeRandom(uint32_t seed) noexcept { tState = seed; }
-
-int RuntimeRandom() noexcept {
-  tState = tState * 214013u + 2531011u;
-  return static_cast<int>(tState >> 16 & 0x7FFF);
-}
+RandomSequence& RuntimeRandomSequence() noexcept { return tSequence; }
 
 }  // namespace vexel

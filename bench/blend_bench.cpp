@@ -1,0 +1,131 @@
+// Blend modes beside pixman's operators: 8-bit pictures and float pictures, source and background with alpha.
+// pixman's alpha is premultiplied; it computes the blending operators in floats whatever the pictures hold.
+#include <memory>
+#include <string>
+
+#include "frame/KernelVariant.h"
+#include "support/Bench.h"
+#include "vexel/compositing.h"
+#include "vexel_host/host.h"
+
+#ifdef VEXEL_PEER_PIXMAN
+#include <pixman.h>
+#endif
+
+namespace {
+
+using vexel::bench::BenchCase;
+using vexel::bench::Memory;
+using F = VX_PixelFormat;
+using M = VX_BlendMode;
+
+struct Mode {
+  M mode;
+  const char* name;
+  int pixmanOperator;  // -1 where it has none
+};
+
+#ifdef VEXEL_PEER_PIXMAN
+#define VX_BENCH_MODE(mode, peer) \
+  { M::mode, #mode, PIXMAN_OP_##peer }
+#else
+#define VX_BENCH_MODE(mode, peer) \
+  { M::mode, #mode, -1 }
+#endif
+constexpr Mode kModes[] = {
+    VX_BENCH_MODE(Multiply, MULTIPLY),    VX_BENCH_MODE(Screen, SCREEN),
+    VX_BENCH_MODE(Overlay, OVERLAY),      VX_BENCH_MODE(SoftLight, SOFT_LIGHT),
+    VX_BENCH_MODE(HardLight, HARD_LIGHT), VX_BENCH_MODE(ColorDodge, COLOR_DODGE),
+    VX_BENCH_MODE(ColorBurn, COLOR_BURN), VX_BENCH_MODE(Difference, DIFFERENCE),
+    VX_BENCH_MODE(Exclusion, EXCLUSION),  VX_BENCH_MODE(Darken, DARKEN),
+    VX_BENCH_MODE(Hue, HSL_HUE),          VX_BENCH_MODE(Saturation, HSL_SATURATION),
+    VX_BENCH_MODE(Color, HSL_COLOR),      VX_BENCH_MODE(Luminosity, HSL_LUMINOSITY),
+    {M::VividLight, "VividLight", -1},    {M::DarkerColor, "DarkerColor", -1},
+    {M::Dissolve, "Dissolve", -1},
+};
+#undef VX_BENCH_MODE
+
+struct Size {
+  const char* name;
+  int width, height;
+};
+
+struct Pictures {
+  Pictures(Size size, int pixelBytes)
+      : width(size.width),
+        height(size.height),
+        rowBytes(size.width * pixelBytes),
+        src(Bytes()),
+        background(Bytes()),
+        dst(Bytes()) {
+    for (Memory* memory : {&src, &background}) {
+      const uint64_t seed = memory == &src ? 1 : 2;
+      pixelBytes == 4 ? memory->FillBytes(seed) : memory->FillFloats(seed);
+    }
+  }
+  size_t Bytes() const { return static_cast<size_t>(rowBytes) * static_cast<size_t>(height); }
+  size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
+
+  int width, height, rowBytes;
+  Memory src, background, dst;
+};
+
+void Blend(Pictures& p, M mode, F format) {
+  VX_CompositeWithBlendMode(p.src.data(), p.rowBytes, format, p.background.data(), p.rowBytes, format, p.dst.data(),
+                            p.rowBytes, format, p.width, p.height, 1.0f, static_cast<int32_t>(mode), 3, false);
+}
+
+#ifdef VEXEL_PEER_PIXMAN
+// pixman composes in place; the picture it works on need not be the background of every call anew.
+void AddPixman(BenchCase& report, const std::shared_ptr<Pictures>& p, const Mode& mode, pixman_format_code_t format) {
+  if (mode.pixmanOperator < 0) return;
+  const auto image = [&](Memory& memory) {
+    return std::shared_ptr<pixman_image_t>(
+        pixman_image_create_bits(format, p->width, p->height, reinterpret_cast<uint32_t*>(memory.data()), p->rowBytes),
+        pixman_image_unref);
+  };
+  const auto src = image(p->src), dst = image(p->background);
+  report.Add("pixman", [=] {
+    pixman_image_composite32(static_cast<pixman_op_t>(mode.pixmanOperator), src.get(), nullptr, dst.get(), 0, 0, 0, 0,
+                             0, 0, p->width, p->height);
+  });
+}
+#endif
+
+void ModeCase(const Mode& mode, Size size, F format) {
+  const bool inBytes = format == F::BGRA_4444_8u;
+  auto p = std::make_shared<Pictures>(size, inBytes ? 4 : 16);
+  BenchCase report(std::string(mode.name) + (inBytes ? " 8u " : " 32f ") + size.name, p->Pixels());
+  report.Add("vexel", [=] {
+    vexel_host::SetThreadLimit(1);
+    Blend(*p, mode.mode, format);
+    vexel_host::SetThreadLimit(0);
+  });
+  report.AddFloor(2 * p->Bytes(), p->Bytes());
+#ifdef VEXEL_PEER_PIXMAN
+  AddPixman(report, p, mode, inBytes ? PIXMAN_a8r8g8b8 : PIXMAN_rgba_float);
+#endif
+}
+
+void TwoThreadsCase(const Mode& mode, Size size, F format) {
+  auto p = std::make_shared<Pictures>(size, format == F::BGRA_4444_8u ? 4 : 16);
+  BenchCase report(std::string(mode.name) + (format == F::BGRA_4444_8u ? " 8u " : " 32f ") + size.name + ", threads",
+                   p->Pixels());
+  for (const int threads : {1, 2})
+    report.Add(threads == 1 ? "vexel" : "two threads", [=] {
+      vexel_host::SetThreadLimit(threads);
+      Blend(*p, mode.mode, format);
+      vexel_host::SetThreadLimit(0);
+    });
+}
+
+}  // namespace
+
+void RegisterBenchmarks() {
+  constexpr Size kHd{"1080p", 1920, 1080}, kUhd{"2160p", 3840, 2160};
+  for (const F format : {F::BGRA_4444_8u, F::BGRA_4444_32f}) {
+    for (const Mode& mode : kModes) ModeCase(mode, kHd, format);
+    for (const Mode& mode : {kModes[0], kModes[3], kModes[10]}) ModeCase(mode, kUhd, format);
+    for (const Mode& mode : {kModes[0], kModes[10]}) TwoThreadsCase(mode, kUhd, format);
+  }
+}
