@@ -1,0 +1,67 @@
+// Scaling alpha, and whether an opacity does anything.
+#include <algorithm>
+#include <cmath>
+
+#include "composite/AlphaUtilityKernels.h"
+#include "composite/RowJob.h"
+#include "formats/FormatBits.h"
+#include "frame/FpModeGuard.h"
+#include "vexel/compositing.h"
+
+namespace vexel {
+namespace {
+
+constexpr float kNothing = 8e-6f;   // opacities and gains below it are 0, ones as close to 1 are 1
+constexpr float kMostGain8u = 255;  // greater ones give the same codes
+
+// The kernel that works in a format itself; null if there is none.
+const GainKernels* KernelFor(VX_PixelFormat format) noexcept {
+  const uint32_t depth = Depth(format), alpha = AlphaKind(format);
+  if (Layout(format) != kLayout4444 || (depth != kDepth8u && depth != kDepth32f)) return nullptr;
+  const bool is8u = depth == kDepth8u;
+  if (alpha == kAlphaStraight) {
+    if (IsReversed(format)) return is8u ? &kGainAlphaFirst8u : &kGainAlphaFirst32f;
+    return is8u ? &kGainAlphaLast8u : &kGainAlphaLast32f;
+  }
+  if (alpha != kAlphaPremultiplied) return nullptr;
+  return !is8u ? &kGainPixel32f : IsYuv(format) ? &kGainVuyp8 : &kGainPixel8u;
+}
+
+VX_PixelFormat WorkingFormat(VX_PixelFormat dst, int32_t precisionHint) noexcept {
+  using F = VX_PixelFormat;
+  if (KernelFor(dst)) return dst;
+  if (IsYuv(dst)) return precisionHint > 2 ? F::VUYP_4444_32f : F::VUYP_4444_8u;
+  return Depth(dst) == kDepth32f ? F::BGRA_4444_32f : F::BGRA_4444_8u;
+}
+
+}  // namespace
+}  // namespace vexel
+
+using namespace vexel;
+
+bool VX_IsOpacityNOP(int32_t blendMode, float opacity) noexcept {
+  const FpModeGuard fpMode;
+  const auto mode = static_cast<VX_BlendMode>(blendMode);
+  return (mode == VX_BlendMode::Dissolve || mode == VX_BlendMode::Normal) && std::fabs(opacity - 1) < kNothing;
+}
+
+VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
+                       VX_PixelFormat dstFormat, int32_t width, int32_t height, float gain,
+                       int32_t precisionHint) noexcept {
+  const FpModeGuard fpMode;
+  if (IsSpecial(srcFormat)) return VX_ErrUnsupportedFormat;
+  if (IsSpecial(dstFormat)) return VX_ErrUnsupportedDestinationFormat;
+  if (!(gain >= kNothing)) return VX_FillWithTransparentBlack(dst, dstRowBytes, width, height, dstFormat);
+
+  const VX_PixelFormat working = WorkingFormat(dstFormat, precisionHint);
+  RowJob job(width, height, precisionHint);
+  if (const VX_Result result = job.AddSource({src, srcRowBytes, srcFormat}, working)) return result;
+  if (const VX_Result result = job.SetTarget({dst, dstRowBytes, dstFormat}, working)) return result;
+  bool done;
+  const VX_Result check = job.CheckBuffers(&done);
+  if (check != VX_Success || done) return check;
+
+  const GainKernel scale = (*KernelFor(working))[job.Variant()];
+  const float factor = Depth(working) == kDepth8u ? std::min(gain, kMostGain8u) : gain;
+  return job.Run([=](const RowSpan& span) { scale(span.src[0], span.dst, span.count, factor); });
+}

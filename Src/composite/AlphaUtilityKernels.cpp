@@ -1,0 +1,353 @@
+#include "composite/AlphaUtilityKernels.h"
+
+#include <algorithm>
+#include <cstring>
+
+#include "convert/PlainPixels.h"
+
+#undef HWY_TARGET_INCLUDE
+#define HWY_TARGET_INCLUDE "composite/AlphaUtilityKernels.cpp"
+#include <hwy/foreach_target.h>
+#include <hwy/highway.h>
+
+#include "convert/PixelVectors-inl.h"
+#include "frame/KernelTable.h"
+
+#ifndef VEXEL_COMPOSITE_ALPHAUTILITYKERNELS_LAYOUTS
+#define VEXEL_COMPOSITE_ALPHAUTILITYKERNELS_LAYOUTS
+namespace vexel {
+namespace {
+
+template <class T, size_t kIndex>
+struct Channels {
+  using Type = T;
+  static constexpr size_t kAlpha = kIndex;
+};
+using Last8u = Channels<uint8_t, 3>;
+using First8u = Channels<uint8_t, 0>;
+using Last15u = Channels<uint16_t, 3>;
+using First15u = Channels<uint16_t, 0>;
+using Last32f = Channels<float, 3>;
+using First32f = Channels<float, 0>;
+
+// The codes of black, about which 8u pixels are scaled.
+struct Rgb8 {
+  static constexpr int kBlack[4] = {0, 0, 0, 0};
+};
+struct Vuy8 {
+  static constexpr int kBlack[4] = {128, 128, 16, 0};
+};
+
+constexpr size_t kMaskPixels = 32;
+
+}  // namespace
+}  // namespace vexel
+#endif
+
+#if HWY_TARGET != HWY_BASELINE_SCALAR
+HWY_BEFORE_NAMESPACE();
+namespace vexel {
+namespace HWY_NAMESPACE {
+namespace {
+
+// As RowLoop, for two sources of which each may be the destination. Calls body(a, b, dst, index) for each block.
+template <size_t kBlock, class Body>
+HWY_INLINE void MergeLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
+  size_t i = 0;
+  for (; i + kBlock <= bytes; i += kBlock) body(a + i, b + i, dst + i, i / kBlock);
+  if (const size_t rest = bytes - i) {
+    alignas(64) uint8_t blockA[kBlock] = {}, blockB[kBlock] = {}, out[kBlock];
+    std::memcpy(blockA, a + i, rest);
+    std::memcpy(blockB, b + i, rest);
+    body(blockA, blockB, out, i / kBlock);
+    std::memcpy(dst + i, out, rest);
+  }
+}
+
+// Maps vectors of lane type T by op(a, b).
+template <class T, class Op>
+HWY_INLINE void MergeRow(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Op& op) {
+  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t) HWY_ATTR {
+    const auto r0 = op(LoadVector<T>(inA, 0), LoadVector<T>(inB, 0));
+    const auto r1 = op(LoadVector<T>(inA, 1), LoadVector<T>(inB, 1));
+    const auto r2 = op(LoadVector<T>(inA, 2), LoadVector<T>(inB, 2));
+    const auto r3 = op(LoadVector<T>(inA, 3), LoadVector<T>(inB, 3));
+    StoreVector(r0, out, 0);
+    StoreVector(r1, out, 1);
+    StoreVector(r2, out, 2);
+    StoreVector(r3, out, 3);
+  };
+  MergeLoop<4 * HWY_MAX_BYTES>(a, b, dst, bytes, body);
+}
+
+template <class T, class Op>
+HWY_INLINE void MapBytes(const uint8_t* src, uint8_t* dst, size_t bytes, const Op& op) {
+  MergeRow<T>(src, src, dst, bytes, [&](Full<T> v, Full<T>) HWY_ATTR { return op(v); });
+}
+
+template <class L>
+constexpr size_t kPixelBytes = 4 * sizeof(typename L::Type);
+
+template <class L>
+HWY_INLINE Full<typename L::Type> WithAlphaOf(Full<typename L::Type> alpha, Full<typename L::Type> colors) {
+  return hn::IfVecThenElse(ChannelMask<L::kAlpha, typename L::Type>(), alpha, colors);
+}
+
+template <class T>
+HWY_INLINE Full<T> LoadPattern(const PixelPattern& pattern) {
+  return hn::BitCast(hn::ScalableTag<T>(), hn::LoadDup128(hn::ScalableTag<uint8_t>(), pattern.bytes));
+}
+
+// ---- Gain ----
+
+// Byte kByte of each pixel scaled about black, at its place.
+template <size_t kByte, class Black>
+HWY_INLINE U32 ScaledByte(U32 pixels, F32 gain) {
+  constexpr int kBlack = Black::kBlack[kByte];
+  const hn::ScalableTag<float> df;
+  const hn::ScalableTag<int32_t> di;
+  const hn::ScalableTag<uint32_t> du;
+  const auto code =
+      kByte == 3 ? hn::ShiftRight<24>(pixels) : hn::And(hn::ShiftRight<8 * kByte>(pixels), hn::Set(du, 255));
+  auto c = hn::ConvertTo(df, hn::BitCast(di, code));
+  if constexpr (kBlack != 0) c = hn::Sub(c, hn::Set(df, kBlack));
+  auto scaled = hn::Min(hn::Mul(c, gain), hn::Set(df, 255 - kBlack));
+  if constexpr (kBlack != 0) scaled = hn::Max(scaled, hn::Set(df, -kBlack));
+  auto result = ConvertNearest(scaled);
+  if constexpr (kBlack != 0) result = hn::Add(result, hn::Set(di, kBlack));
+  return hn::ShiftLeft<8 * kByte>(hn::BitCast(du, result));
+}
+
+template <class L>
+void GainAlpha8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
+  MapBytes<uint32_t>(src, dst, count * 4, [&](U32 v) HWY_ATTR {
+    const auto alpha = hn::Set(hn::ScalableTag<uint32_t>(), uint32_t{255} << (8 * L::kAlpha));
+    return hn::Or(hn::AndNot(alpha, v), ScaledByte<L::kAlpha, Rgb8>(v, factor));
+  });
+}
+
+template <class Black>
+void GainAll8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
+  MapBytes<uint32_t>(src, dst, count * 4, [&](U32 v) HWY_ATTR {
+    return hn::Or(hn::Or(ScaledByte<0, Black>(v, factor), ScaledByte<1, Black>(v, factor)),
+                  hn::Or(ScaledByte<2, Black>(v, factor), ScaledByte<3, Black>(v, factor)));
+  });
+}
+
+template <class L>
+void GainAlpha32f(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
+  MapBytes<float>(src, dst, count * 16, [&](F32 v) HWY_ATTR { return WithAlphaOf<L>(hn::Mul(v, factor), v); });
+}
+
+void GainAll32f(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
+  MapBytes<float>(src, dst, count * 16, [&](F32 v) HWY_ATTR { return hn::Mul(v, factor); });
+}
+
+// ---- Setting and inverting ----
+
+template <class T>
+HWY_INLINE Full<T> Inverse(Full<T> v) {
+  const hn::ScalableTag<T> d;
+  if constexpr (sizeof(T) == 1) return hn::Not(v);
+  return hn::Sub(hn::Set(d, kFullScale<T>), v);
+}
+
+template <class L>
+void InvertAlpha(const uint8_t* src, const uint8_t* colors, uint8_t* dst, size_t count) {
+  using T = typename L::Type;
+  MergeRow<T>(src, colors, dst, count * kPixelBytes<L>,
+              [](Full<T> v, Full<T> color) HWY_ATTR { return WithAlphaOf<L>(Inverse<T>(v), color); });
+}
+
+void ReplaceBits(const uint8_t* src, uint8_t* dst, size_t bytes, const PixelPattern& value, const PixelPattern& mask) {
+  const auto keep = hn::Not(LoadPattern<uint8_t>(mask));
+  const auto bits = hn::AndNot(keep, LoadPattern<uint8_t>(value));
+  MapBytes<uint8_t>(src, dst, bytes, [&](U8 v) HWY_ATTR { return hn::Or(hn::And(v, keep), bits); });
+}
+
+// ---- Matte ----
+
+template <class L>
+void MatteUnderInverse(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
+  using T = typename L::Type;
+  const auto color = LoadPattern<T>(matte);
+  MapBytes<T>(src, dst, count * kPixelBytes<L>, [&](Full<T> v) HWY_ATTR {
+    if constexpr (sizeof(T) == 2) v = hn::Min(v, hn::Set(hn::ScalableTag<T>(), kFullScale<T>));
+    return WithAlphaOf<L>(Inverse<T>(v), color);
+  });
+}
+
+template <class L>
+void SubtractMatte(const uint8_t* src, const uint8_t* matte, uint8_t* dst, size_t count) {
+  using T = typename L::Type;
+  MergeRow<T>(src, matte, dst, count * kPixelBytes<L>, [](Full<T> v, Full<T> m) HWY_ATTR {
+    if constexpr (sizeof(T) == 4)
+      return WithAlphaOf<L>(v, hn::IfThenZeroElse(hn::Gt(m, v), hn::Sub(v, m)));
+    else
+      return WithAlphaOf<L>(v, hn::SaturatedSub(v, m));
+  });
+}
+
+// ---- Mask ----
+
+// In every 32-bit lane of a vector the bit of its pixel, the first pixel's uppermost.
+template <size_t kBytes>
+struct LaneBits {
+  constexpr LaneBits() {
+    for (size_t i = 0; i < kLanes<uint32_t>; ++i) lanes[i] = 0x80000000u >> (i * 4 / kBytes);
+  }
+  alignas(64) uint32_t lanes[kLanes<uint32_t>];
+};
+
+template <size_t kBytes>
+void SelectPixels(const uint8_t* a, const uint8_t* b, const uint32_t* mask, uint8_t* dst, size_t count) {
+  static constexpr LaneBits<kBytes> kLaneBits;
+  constexpr size_t kBlock = kMaskPixels * kBytes, kVectorPixels = HWY_MAX_BYTES / kBytes;
+  const hn::ScalableTag<uint32_t> d;
+  const auto laneBits = hn::Load(d, kLaneBits.lanes);
+  MergeLoop<kBlock>(
+      a, b, dst, count * kBytes, [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t index) HWY_ATTR {
+        uint32_t bits = mask[index];
+        for (size_t i = 0; i < kBlock / HWY_MAX_BYTES; ++i, bits <<= kVectorPixels) {
+          const auto takeA = hn::TestBit(hn::Set(d, bits), laneBits);
+          StoreVector(hn::IfThenElse(takeA, LoadVector<uint32_t>(inA, i), LoadVector<uint32_t>(inB, i)), out, i);
+        }
+      });
+}
+
+}  // namespace
+}  // namespace HWY_NAMESPACE
+}  // namespace vexel
+HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
+
+#if HWY_ONCE
+namespace vexel {
+namespace plain {
+namespace {
+
+// Calls pixel(a, b, out) for each pixel of two rows.
+template <class T, class Pixel>
+void MergePixels(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t count, const Pixel& pixel) {
+  for (size_t i = 0; i < count; ++i) {
+    T inA[4], inB[4], out[4];
+    std::memcpy(inA, a + i * sizeof inA, sizeof inA);
+    std::memcpy(inB, b + i * sizeof inB, sizeof inB);
+    pixel(inA, inB, out);
+    std::memcpy(dst + i * sizeof out, out, sizeof out);
+  }
+}
+
+template <class Black>
+uint8_t Scaled(uint8_t c, size_t channel, float gain) {
+  const int black = Black::kBlack[channel];
+  const float scaled = static_cast<float>(c - black) * gain;
+  const auto least = static_cast<float>(-black), most = static_cast<float>(255 - black);
+  return static_cast<uint8_t>(ConvertNearest(std::min(std::max(scaled, least), most)) + black);
+}
+
+template <class L>
+void GainAlpha8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  MapPixels<uint8_t, uint8_t>(src, dst, count, [&](const uint8_t* in, uint8_t* out) {
+    ForChannels([&](size_t k) { out[k] = k == L::kAlpha ? Scaled<Rgb8>(in[k], k, gain) : in[k]; });
+  });
+}
+
+template <class Black>
+void GainAll8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  MapPixels<uint8_t, uint8_t>(src, dst, count, [&](const uint8_t* in, uint8_t* out) {
+    ForChannels([&](size_t k) { out[k] = Scaled<Black>(in[k], k, gain); });
+  });
+}
+
+template <class L>
+void GainAlpha32f(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  MapPixels<float, float>(src, dst, count, [&](const float* in, float* out) {
+    ForChannels([&](size_t k) { out[k] = k == L::kAlpha ? in[k] * gain : in[k]; });
+  });
+}
+
+void GainAll32f(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
+  MapPixels<float, float>(src, dst, count,
+                          [&](const float* in, float* out) { ForChannels([&](size_t k) { out[k] = in[k] * gain; }); });
+}
+
+template <class L>
+void InvertAlpha(const uint8_t* src, const uint8_t* colors, uint8_t* dst, size_t count) {
+  using T = typename L::Type;
+  MergePixels<T>(src, colors, dst, count, [](const T* in, const T* color, T* out) {
+    ForChannels([&](size_t k) { out[k] = color[k]; });
+    out[L::kAlpha] = static_cast<T>(kFullScale<T> - in[L::kAlpha]);
+  });
+}
+
+void ReplaceBits(const uint8_t* src, uint8_t* dst, size_t bytes, const PixelPattern& value, const PixelPattern& mask) {
+  for (size_t i = 0; i < bytes; ++i) {
+    const uint8_t m = mask.bytes[i % 16];
+    dst[i] = static_cast<uint8_t>((src[i] & ~m) | (value.bytes[i % 16] & m));
+  }
+}
+
+template <class L>
+void MatteUnderInverse(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
+  using T = typename L::Type;
+  T color[4];
+  std::memcpy(color, matte.bytes, sizeof color);
+  MapPixels<T, T>(src, dst, count, [&](const T* in, T* out) {
+    ForChannels([&](size_t k) { out[k] = color[k]; });
+    const T alpha = in[L::kAlpha];
+    out[L::kAlpha] = sizeof(T) == 2 && alpha > kFullScale<T> ? T{0} : static_cast<T>(kFullScale<T> - alpha);
+  });
+}
+
+template <class L>
+void SubtractMatte(const uint8_t* src, const uint8_t* matte, uint8_t* dst, size_t count) {
+  using T = typename L::Type;
+  MergePixels<T>(src, matte, dst, count, [](const T* in, const T* m, T* out) {
+    ForChannels([&](size_t k) {
+      out[k] = k == L::kAlpha ? in[k] : m[k] > in[k] ? T{0} : static_cast<T>(in[k] - m[k]);
+    });
+  });
+}
+
+template <size_t kBytes>
+void SelectPixels(const uint8_t* a, const uint8_t* b, const uint32_t* mask, uint8_t* dst, size_t count) {
+  for (size_t i = 0; i < count; ++i) {
+    const bool takeA = (mask[i / kMaskPixels] >> (kMaskPixels - 1 - i % kMaskPixels) & 1) != 0;
+    std::memmove(dst + i * kBytes, (takeA ? a : b) + i * kBytes, kBytes);
+  }
+}
+
+}  // namespace
+}  // namespace plain
+
+const GainKernels kGainAlphaLast8u = VX_KERNEL_VARIANTS(GainAlpha8u<Last8u>);
+const GainKernels kGainAlphaFirst8u = VX_KERNEL_VARIANTS(GainAlpha8u<First8u>);
+const GainKernels kGainPixel8u = VX_KERNEL_VARIANTS(GainAll8u<Rgb8>);
+const GainKernels kGainVuyp8 = VX_KERNEL_VARIANTS(GainAll8u<Vuy8>);
+const GainKernels kGainAlphaLast32f = VX_KERNEL_VARIANTS(GainAlpha32f<Last32f>);
+const GainKernels kGainAlphaFirst32f = VX_KERNEL_VARIANTS(GainAlpha32f<First32f>);
+const GainKernels kGainPixel32f = VX_KERNEL_VARIANTS(GainAll32f);
+
+// clang-format off
+#define VX_BY_LAYOUT(name)                                                     \
+  {{VX_KERNEL_VARIANTS(name<Last8u>), VX_KERNEL_VARIANTS(name<First8u>)},      \
+   {VX_KERNEL_VARIANTS(name<Last15u>), VX_KERNEL_VARIANTS(name<First15u>)},    \
+   {VX_KERNEL_VARIANTS(name<Last32f>), VX_KERNEL_VARIANTS(name<First32f>)}}
+// clang-format on
+
+const MergeKernels kInvertAlpha[kDepthClasses][2] = VX_BY_LAYOUT(InvertAlpha);
+const MatteKernels kMatteUnderInverse[kDepthClasses][2] = VX_BY_LAYOUT(MatteUnderInverse);
+const MergeKernels kSubtractMatte[kDepthClasses][2] = VX_BY_LAYOUT(SubtractMatte);
+const KernelVariants<ReplaceKernel> kReplaceBits = VX_KERNEL_VARIANTS(ReplaceBits);
+
+const SelectKernels kSelectPixels4 = VX_KERNEL_VARIANTS(SelectPixels<4>);
+const SelectKernels kSelectPixels8 = VX_KERNEL_VARIANTS(SelectPixels<8>);
+const SelectKernels kSelectPixels16 = VX_KERNEL_VARIANTS(SelectPixels<16>);
+
+}  // namespace vexel
+#endif  // HWY_ONCE

@@ -1,0 +1,526 @@
+// The alpha utilities against formulas of their own, in the armed arena and refused.
+#include "vexel/compositing.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <climits>
+#include <cmath>
+#include <cstring>
+#include <functional>
+#include <iterator>
+#include <limits>
+#include <vector>
+
+#include "support/Arena.h"
+#include "support/FailingAllocations.h"
+#include "support/Formats.h"
+
+namespace vexel::testing {
+namespace {
+
+using F = VX_PixelFormat;
+
+bool IsPixels(F f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
+// The formats that gains work in: those with an alpha that counts, in 8u and 32f.
+bool HasGainKernel(F f) { return IsPixels(f) && AlphaKind(f) != kAlphaIgnored && Depth(f) != kDepth15u; }
+bool IsMatted(F f) { return IsPixels(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
+size_t AlphaAt(F f) { return IsReversed(f) ? 0 : 3; }
+double FullScale(F f) { return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth15u ? 32768 : 1; }
+
+double Get(const uint8_t* samples, size_t i, F f) {
+  if (Depth(f) == kDepth8u) return samples[i];
+  uint16_t word;
+  float real;
+  std::memcpy(&word, samples + 2 * i, 2);
+  if (Depth(f) == kDepth15u) return word;
+  std::memcpy(&real, samples + 4 * i, 4);
+  return double{real};
+}
+void Put(uint8_t* samples, size_t i, F f, double value) {
+  const auto word = static_cast<uint16_t>(static_cast<int>(value));
+  const auto real = static_cast<float>(value);
+  if (Depth(f) == kDepth8u)
+    samples[i] = static_cast<uint8_t>(value);
+  else if (Depth(f) == kDepth15u)
+    std::memcpy(samples + 2 * i, &word, 2);
+  else
+    std::memcpy(samples + 4 * i, &real, 4);
+}
+
+std::vector<F> FormatsThat(bool (*fit)(F)) {
+  std::vector<F> formats;
+  for (const F f : RasterFormats())
+    if (fit(f)) formats.push_back(f);
+  return formats;
+}
+
+// What an operation makes of one pixel, in double precision; `out` holds what the destination held before.
+using Formula = std::function<void(F format, const double* in, double* out)>;
+struct Operation {
+  const char* name;
+  bool (*takes)(F);
+  bool readsDestination;
+  std::function<VX_Result(const ArenaFrame& src, const ArenaFrame& dst)> run;
+  Formula formula;
+};
+
+double Rounded(double value) { return double{static_cast<float>(value)}; }
+
+Operation GainOperation(float gain) {
+  return {"VX_AlphaGain", HasGainKernel, false,
+          [=](const ArenaFrame& s, const ArenaFrame& d) {
+            return VX_AlphaGain(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, gain, 0);
+          },
+          [=](F f, const double* in, double* out) {
+            const bool isFloat = Depth(f) == kDepth32f, all = AlphaKind(f) == kAlphaPremultiplied;
+            const double vuyBlack[] = {128, 128, 16, 0};
+            for (size_t k = 0; k < 4; ++k) {
+              const double black = IsYuv(f) && all && !isFloat ? vuyBlack[k] : 0;
+              const double scaled = Rounded((in[k] - black) * double{gain});
+              const double code = std::clamp(std::nearbyint(scaled) + black, 0.0, 255.0);
+              out[k] = !all && k != AlphaAt(f) ? in[k] : isFloat ? scaled : code;
+            }
+          }};
+}
+
+Operation SetOperation(float alpha, double code8, double code15) {
+  return {"VX_CopyAndSetAlpha", IsPixels, false,
+          [=](const ArenaFrame& s, const ArenaFrame& d) {
+            // Row bytes that are no whole words say something else; see below.
+            const int together = s.rowBytes % 4 == 0 && d.rowBytes % 4 == 0 ? d.height : 1;
+            VX_Result result = VX_Success;
+            for (int row = 0; row < d.height; row += together)
+              result = std::min(result, VX_CopyAndSetAlpha(s.Row(row), s.rowBytes, d.Row(row), d.rowBytes, d.format,
+                                                           d.width, together, alpha));
+            return result;
+          },
+          [=](F f, const double* in, double* out) {
+            std::copy_n(in, 4, out);
+            out[AlphaAt(f)] = Depth(f) == kDepth8u ? code8 : Depth(f) == kDepth15u ? code15 : double{alpha};
+          }};
+}
+
+// The matte is a pixel of the buffer's own format.
+Operation MatteOperation(double m0, double m1, double m2, double m3) {
+  const std::vector<double> matte = {m0, m1, m2, m3};
+  const auto of = [](F f, double m) { return Depth(f) == kDepth32f ? Rounded(m) : std::floor(m * FullScale(f)); };
+  return {"VX_UnPremultiplyAgainstMatteColor", IsMatted, false,
+          [=](const ArenaFrame& s, const ArenaFrame& d) {
+            uint8_t pixel[16];
+            for (size_t k = 0; k < 4; ++k) Put(pixel, k, d.format, of(d.format, matte[k]));
+            return VX_UnPremultiplyAgainstMatteColor(s.base, s.rowBytes, d.base, d.rowBytes, d.format, d.width,
+                                                     d.height, pixel, d.format, 0);
+          },
+          [=](F f, const double* in, double* out) {
+            const bool isFloat = Depth(f) == kDepth32f;
+            const double most = FullScale(f), a = in[AlphaAt(f)],
+                         rest = isFloat ? Rounded(1 - a) : most - std::min(a, most);
+            for (size_t k = 0; k < 4; ++k) {
+              const double product = of(f, matte[k]) * rest;
+              const double m = isFloat ? Rounded(product) : std::floor((2 * product + most) / (2 * most));
+              out[k] = k == AlphaAt(f) ? in[k] : m > in[k] ? 0 : isFloat ? Rounded(in[k] - m) : in[k] - m;
+            }
+          }};
+}
+
+std::vector<Operation> Operations() {
+  std::vector<Operation> operations = {
+      {"VX_InvertAlpha", IsPixels, true,
+       [](const ArenaFrame& s, const ArenaFrame& d) {
+         return VX_InvertAlpha(s.base, s.rowBytes, d.base, d.rowBytes, d.format, d.width, d.height);
+       },
+       [](F f, const double* in, double* out) {
+         const double inverse = FullScale(f) - in[AlphaAt(f)];
+         out[AlphaAt(f)] = Depth(f) == kDepth32f ? Rounded(inverse) : inverse < 0 ? inverse + 65536 : inverse;
+       }},
+  };
+  for (const float gain : {0.25f, 0.5f, 1.0f / 3, 1.0f, 1.7f, 1e30f}) operations.push_back(GainOperation(gain));
+  operations.push_back(SetOperation(0.3f, 77, 9830));  // 76.5000003 and 9830.4
+  operations.push_back(SetOperation(0.5f, 128, 16384));
+  operations.push_back(MatteOperation(0.16, 0.5, 1, 0.7));
+  operations.push_back(MatteOperation(0, 0.999, 0.3, 0.01));
+  return operations;
+}
+
+struct Picture {
+  Picture(F f, int w, int h)
+      : rowBytes(static_cast<int>(UnpaddedRowBytes(f, w))), bytes(static_cast<size_t>(rowBytes) * h) {
+    frame = {bytes.data(), rowBytes, f, w, h};
+  }
+  Picture(const Picture&) = delete;
+  int rowBytes;
+  std::vector<uint8_t> bytes;
+  ArenaFrame frame;
+};
+
+// Every 8u channel under every alpha; every 16-bit alpha; floats around 0..1.
+double DomainSample(F f, size_t pixel, size_t channel) {
+  const bool isAlpha = channel == AlphaAt(f);
+  if (Depth(f) == kDepth8u) return static_cast<double>((isAlpha ? pixel >> 8 : pixel + 85 * channel) & 255);
+  if (Depth(f) == kDepth15u) return static_cast<double>(isAlpha ? pixel : (pixel * 40503 >> channel) & 65535);
+  return Rounded((static_cast<double>((pixel * 40503 >> channel) & 65535) - 16384) / 32767);
+}
+
+TEST(AlphaUtilities, WholeDomains) {
+  for (const Operation& operation : Operations())
+    for (const F f : FormatsThat(operation.takes)) {
+      Picture src(f, 256, 256), dst(f, 256, 256);
+      for (size_t i = 0; i < 65536; ++i)
+        for (size_t k = 0; k < 4; ++k) {
+          Put(src.bytes.data(), 4 * i + k, f, DomainSample(f, i, k));
+          Put(dst.bytes.data(), 4 * i + k, f, DomainSample(f, i + 7, k));
+        }
+      const std::vector<uint8_t> before = dst.bytes;
+      ASSERT_EQ(operation.run(src.frame, dst.frame), VX_Success) << operation.name;
+      for (size_t i = 0; i < 65536; ++i) {
+        double in[4], out[4];
+        for (size_t k = 0; k < 4; ++k) {
+          in[k] = Get(src.bytes.data(), 4 * i + k, f);
+          out[k] = Get(before.data(), 4 * i + k, f);
+        }
+        operation.formula(f, in, out);
+        for (size_t k = 0; k < 4; ++k)
+          ASSERT_EQ(Get(dst.bytes.data(), 4 * i + k, f), out[k])
+              << operation.name << " of " << FormatName(f) << ", channel " << k << " of " << in[0] << " " << in[1]
+              << " " << in[2] << " " << in[3];
+      }
+      ASSERT_EQ(operation.run(src.frame, src.frame), VX_Success);
+      if (operation.readsDestination) continue;
+      ASSERT_EQ(src.bytes, dst.bytes) << operation.name << " in place";
+    }
+}
+
+// ---- Arena ----
+
+void ExpectArena(ArenaCase arenaCase, bool longRows = true) {
+  if (longRows) arenaCase.widths.insert(arenaCase.widths.end(), {383, 384, 385, 773});
+  EXPECT_TRUE(RunArena(arenaCase));
+  arenaCase.widths = {1, 5, 33};
+  arenaCase.heights = {65, 80};
+  EXPECT_TRUE(RunArena(arenaCase)) << "in bands";
+}
+
+TEST(AlphaUtilities, Arena) {
+  for (const Operation& operation : Operations())
+    for (const F f : FormatsThat(operation.takes)) {
+      ArenaCase arenaCase;
+      arenaCase.name = operation.name;
+      arenaCase.destination = f;
+      arenaCase.destinationIsInput = true;
+      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) { return operation.run(d, d); };
+      ExpectArena(arenaCase);
+      arenaCase.sources = {f};
+      arenaCase.destinationIsInput = operation.readsDestination;
+      arenaCase.run = [&](const ArenaFrame* s, const ArenaFrame& d) { return operation.run(s[0], d); };
+      ExpectArena(arenaCase);
+    }
+}
+
+TEST(AlphaUtilities, SetAlphaChannel) {
+  for (const F f : RasterFormats())
+    for (const bool opaque : {false, true}) {
+      const bool named = f == F::BGRA_4444_8u || f == F::VUYA_4444_8u || f == F::BGRA_4444_15u ||
+                         f == F::BGRA_4444_32f || f == F::BGRA_4444_32f_Linear || f == F::VUYA_4444_32f ||
+                         f == F::ARGB_4444_32f || f == F::ARGB_4444_32f_Linear;
+      ArenaCase arenaCase;
+      arenaCase.name = "VX_SetAlphaChannel";
+      arenaCase.destination = f;
+      arenaCase.destinationIsInput = true;
+      arenaCase.expected = named ? VX_Success : VX_ErrFormatNotHandled;
+      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) {
+        const VX_Result result = VX_SetAlphaChannel(static_cast<uint32_t>(d.width), static_cast<uint32_t>(d.height),
+                                                    d.base, d.rowBytes, d.format, opaque);
+        for (int row = 0; named && row < d.height; ++row)
+          for (int x = 0; x < d.width; ++x)
+            EXPECT_EQ(Get(d.Row(row), static_cast<size_t>(4 * x) + AlphaAt(f), f), opaque ? FullScale(f) : 0);
+        return result;
+      };
+      EXPECT_TRUE(RunArena(arenaCase));
+    }
+}
+
+// ---- Gain through working formats ----
+
+F ExpectedWorking(F dst, int hint) {
+  if (HasGainKernel(dst)) return dst;
+  if (IsYuv(dst)) return hint > 2 ? F::VUYP_4444_32f : F::VUYP_4444_8u;
+  return Depth(dst) == kDepth32f ? F::BGRA_4444_32f : F::BGRA_4444_8u;
+}
+
+TEST(AlphaUtilities, GainConvertsInAndOut) {
+  for (const F from : RasterFormats())
+    for (const F to : RasterFormats())
+      for (const int hint : {2, 3}) {
+        const F working = ExpectedWorking(to, hint);
+        Picture src(from, 390, 3), between(working, 390, 3), want(to, 390, 3), got(to, 390, 3);
+        Random random(Bits(from) * 31 + Bits(to));
+        for (int row = 0; row < 3; ++row)
+          FillSamples(src.frame.Row(row), static_cast<size_t>(src.rowBytes), from, Contents::Random, random);
+        const auto convert = [&](const ArenaFrame& s, const ArenaFrame& d) {
+          return VX_Convert(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, hint);
+        };
+        ASSERT_EQ(convert(src.frame, between.frame), VX_Success);
+        ASSERT_EQ(GainOperation(0.4f).run(between.frame, between.frame), VX_Success);
+        ASSERT_EQ(convert(between.frame, want.frame), VX_Success);
+        ASSERT_EQ(
+            VX_AlphaGain(src.frame.base, src.rowBytes, from, got.frame.base, got.rowBytes, to, 390, 3, 0.4f, hint),
+            VX_Success);
+        ASSERT_EQ(got.bytes, want.bytes) << FormatName(from) << " to " << FormatName(to) << ", hint " << hint;
+      }
+}
+
+TEST(AlphaUtilities, GainArena) {
+  constexpr float kGains[] = {0.25f, 0.999f, 1.0f, 3.5f, std::numeric_limits<float>::infinity()};
+  uint64_t count = 0;
+  for (const F from : RasterFormats())
+    for (const F to : RasterFormats()) {
+      ArenaCase arenaCase;
+      const float gain = kGains[++count % std::size(kGains)];
+      const int hint = static_cast<int>(count % 4);
+      arenaCase.name = "VX_AlphaGain by " + std::to_string(gain);
+      arenaCase.sources = {from};
+      arenaCase.destination = to;
+      arenaCase.seed = count;
+      arenaCase.widths = {1, 2, 5, 6, 7, 31, 64, 129, 385};
+      arenaCase.run = [&](const ArenaFrame* s, const ArenaFrame& d) {
+        return VX_AlphaGain(s->base, s->rowBytes, from, d.base, d.rowBytes, to, d.width, d.height, gain, hint);
+      };
+      EXPECT_TRUE(RunArena(arenaCase));
+      if (from != to) continue;
+      arenaCase.sources.clear();
+      arenaCase.destinationIsInput = true;
+      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) {
+        return VX_AlphaGain(d.base, d.rowBytes, to, d.base, d.rowBytes, to, d.width, d.height, gain, hint);
+      };
+      EXPECT_TRUE(RunArena(arenaCase)) << "in place";
+    }
+}
+
+// ---- Mask ----
+
+bool IsSelectable(F f) { return IsPixels(f) || f == kRgb10Format; }
+
+// The mask's last needed byte is the last one of its row.
+TEST(AlphaUtilities, MaskArena) {
+  int offset = 0;
+  for (const F to : FormatsThat(IsSelectable))
+    for (const F from : {to, F::UYVY_422_8u, F::V210_422_10u, F::PRGB_4444_32f, F::BGRX_4444_8u}) {
+      offset = (offset + 1) % 8;
+      const auto maskBytes = [=](int width) { return (offset + width + 7) / 8; };
+      ArenaCase arenaCase;
+      arenaCase.name = "VX_OneBitMaskComposite at bit " + std::to_string(offset);
+      arenaCase.sources = {from, to, F::BGRA_4444_8u};
+      arenaCase.destination = to;
+      arenaCase.sourceSize = [=](int source, ArenaSize size) {
+        return source == 2 ? ArenaSize{(maskBytes(size.width) + 3) / 4, size.height} : size;
+      };
+      const auto run = [=](const ArenaFrame& a, const ArenaFrame& b, const ArenaFrame& mask, const ArenaFrame& d) {
+        const uint8_t* bits = mask.Row(0) + 4 * mask.width - maskBytes(d.width);
+        return VX_OneBitMaskComposite(a.base, a.rowBytes, a.format, b.base, b.rowBytes, b.format, bits, mask.rowBytes,
+                                      offset, d.base, d.rowBytes, to, d.width, d.height, 2);
+      };
+      arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) { return run(s[0], s[1], s[2], d); };
+      ExpectArena(arenaCase);
+      arenaCase.destinationIsInput = true;
+      arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) { return run(s[0], d, s[2], d); };
+      ExpectArena(arenaCase);
+    }
+}
+
+TEST(AlphaUtilities, MaskChooses) {
+  constexpr int kWidth = 401, kHeight = 66, kMaskBytes = 60;
+  std::vector<uint8_t> mask(kMaskBytes * kHeight);
+  Random(5).Fill(mask.data(), mask.size());
+  for (const F to : FormatsThat(IsSelectable))
+    for (const F from : {to, F::YUYV_422_8u_709, F::ARGB_4444_15u})
+      for (int offset = 0; offset < 8; ++offset) {
+        Picture a(from, kWidth, kHeight), b(to, kWidth, kHeight), dst(to, kWidth, kHeight),
+            converted(to, kWidth, kHeight);
+        Random random(static_cast<uint64_t>(offset));
+        FillSamples(a.bytes.data(), a.bytes.size(), from, Contents::Random, random);
+        FillSamples(b.bytes.data(), b.bytes.size(), to, Contents::Random, random);
+        ASSERT_EQ(
+            VX_Convert(a.bytes.data(), a.rowBytes, from, converted.bytes.data(), b.rowBytes, to, kWidth, kHeight, 3),
+            VX_Success);
+        ASSERT_EQ(VX_OneBitMaskComposite(a.bytes.data(), a.rowBytes, from, b.bytes.data(), b.rowBytes, to,
+                                         mask.data() + kMaskBytes * (kHeight - 1), -kMaskBytes, offset,
+                                         dst.bytes.data(), b.rowBytes, to, kWidth, kHeight, 3),
+                  VX_Success);
+        const size_t pixel = b.bytes.size() / kWidth / kHeight;
+        for (int y = 0; y < kHeight; ++y)
+          for (int x = 0; x < kWidth; ++x) {
+            const int bit = mask[static_cast<size_t>((kHeight - 1 - y) * kMaskBytes + (offset + x) / 8)] &
+                            (0x80 >> (offset + x) % 8);
+            const size_t at = static_cast<size_t>(y * kWidth + x) * pixel;
+            ASSERT_EQ(0, std::memcmp(&dst.bytes[at], bit ? &converted.bytes[at] : &b.bytes[at], pixel))
+                << FormatName(from) << " over " << FormatName(to) << ", bit " << offset << ", pixel " << x << ", " << y;
+          }
+      }
+}
+
+// ---- Edges ----
+
+TEST(AlphaUtilities, OpacityThatDoesNothing) {
+  struct {
+    int mode;
+    float opacity;
+    bool expected;
+  } const cases[] = {{18, 1, true},           {6, 1, true},           {17, 1, false},        {-1, 1, false},
+                     {27, 1, false},          {18, 0.9999921f, true}, {6, 1.0000079f, true}, {18, 0.9999919f, false},
+                     {18, 1.0000081f, false}, {18, 0, false},         {18, NAN, false}};
+  for (const auto& test : cases)
+    EXPECT_EQ(VX_IsOpacityNOP(test.mode, test.opacity), test.expected) << test.mode << " " << test.opacity;
+}
+
+TEST(AlphaUtilities, ConstantAlphas) {
+  constexpr float kInfinity = std::numeric_limits<float>::infinity();
+  struct {
+    float alpha;
+    int code8, code15;
+  } const cases[] = {
+      {0, 0, 0},        {1, 255, 32768},         {0.5f, 128, 16384}, {-0.1f, 0, 0},        {1.1f, 255, 32768},
+      {NAN, 0, 0},      {kInfinity, 255, 32768}, {-kInfinity, 0, 0}, {1.5f / 32768, 0, 2}, {2.5f / 32768, 0, 2},
+      {0.1f, 26, 3277}, {0.1f - 1e-8f, 25, 3277}};
+  for (const auto& test : cases) {
+    const uint16_t in[4] = {1, 2, 3, 4};
+    uint16_t wide[4];
+    uint8_t narrow[8];
+    EXPECT_EQ(VX_CopyAndSetAlpha(in, 8, wide, 8, F::ARGB_4444_15u, 1, 1, test.alpha), VX_Success);
+    EXPECT_EQ(VX_CopyAndSetAlpha(in, 8, narrow, 8, F::BGRA_4444_8u, 2, 1, test.alpha), VX_Success);
+    EXPECT_EQ(wide[0], test.code15) << test.alpha;
+    EXPECT_EQ(narrow[3], test.code8) << test.alpha;
+  }
+  // Rows are stepped in whole words, toward zero.
+  std::vector<uint8_t> in(64), odd(64), even(64);
+  Random(1).Fill(in.data(), in.size());
+  for (const int sign : {1, -1}) {
+    EXPECT_EQ(VX_CopyAndSetAlpha(&in[32], 11 * sign, &odd[32], 15 * sign, F::BGRA_4444_8u, 2, 2, 1), VX_Success);
+    EXPECT_EQ(VX_CopyAndSetAlpha(&in[32], 8 * sign, &even[32], 12 * sign, F::BGRA_4444_8u, 2, 2, 1), VX_Success);
+    EXPECT_EQ(odd, even);
+  }
+}
+
+TEST(AlphaUtilities, SpecialFloats) {
+  constexpr float kInfinity = std::numeric_limits<float>::infinity();
+  float pixel[4] = {NAN, 0.5f, -1, 0}, out[4];
+  const float matte[4] = {1, 1, 0.25f, 1};
+  EXPECT_EQ(VX_UnPremultiplyAgainstMatteColor(pixel, 16, out, 16, F::BGRA_4444_32f, 1, 1, matte, F::BGRA_4444_32f, 0),
+            VX_Success);
+  EXPECT_TRUE(std::isnan(out[0]));
+  EXPECT_EQ(out[1], 0);
+  EXPECT_EQ(out[2], 0);
+  EXPECT_EQ(VX_AlphaGain(pixel, 16, F::BGRP_4444_32f, out, 16, F::BGRP_4444_32f, 1, 1, kInfinity, 0), VX_Success);
+  EXPECT_EQ(out[2], -kInfinity);
+  EXPECT_TRUE(std::isnan(out[3]));
+}
+
+// Nothing is touched, and the first reason counts.
+TEST(AlphaUtilities, Refusals) {
+  constexpr F kDv = F::NTSCDV25, k420 = F::YUV_420_MPEG2_FRAME, kBgra = F::BGRA_4444_8u, kRgba10 = FromBits(0x44);
+  struct Size {
+    int width, height;
+    VX_Result expected;
+  };
+  constexpr Size kSizes[] = {{0, 5, VX_Success},
+                             {5, 0, VX_Success},
+                             {-1, 5, VX_ErrArgumentOutOfRange},
+                             {5, INT_MIN, VX_ErrArgumentOutOfRange},
+                             {INT_MAX, 1, VX_ErrArgumentOutOfRange},
+                             {1 << 29, 2, VX_ErrArgumentOutOfRange}};
+  const uint8_t matte[16] = {};
+  struct Call {
+    const char* name;
+    std::function<VX_Result(const void* s, void* d, F f, int w, int h)> run;
+    VX_Result badFormat;
+    std::vector<F> refused;
+  };
+  const std::vector<Call> calls = {
+      {"gain to",
+       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, kBgra, d, 64, f, w, h, 1, 0); },
+       VX_ErrUnsupportedDestinationFormat,
+       {kDv, k420}},
+      {"gain from",
+       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, f, d, 64, kBgra, w, h, 1, 0); },
+       VX_ErrUnsupportedFormat,
+       {kDv, k420}},
+      {"gain 0 from",
+       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, f, d, 64, kBgra, w, h, f == kBgra, 0); },
+       VX_ErrUnsupportedFormat,
+       {kDv, k420}},
+      {"invert",
+       [](auto s, auto d, F f, int w, int h) { return VX_InvertAlpha(s, 64, d, 64, f, w, h); },
+       VX_ErrUnsupportedFormat,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10}},
+      {"set",
+       [](auto s, auto d, F f, int w, int h) { return VX_CopyAndSetAlpha(s, 64, d, 64, f, w, h, 1); },
+       VX_ErrFormatNotHandled,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10}},
+      {"matte",
+       [&](auto s, auto d, F f, int w, int h) {
+         return VX_UnPremultiplyAgainstMatteColor(s, 64, d, 64, f, w, h, matte, kBgra, 0);
+       },
+       VX_ErrUnsupportedFormat,
+       {F::Invalid, kDv, k420, F::VUYA_4444_8u, F::BGRX_4444_8u, F::XRGB_4444_32f, kRgb10Format}},
+      {"mask",
+       [](auto s, auto d, F f, int w, int h) {
+         return VX_OneBitMaskComposite(s, 64, kBgra, s, 64, kBgra, s, 8, 0, d, 64, f, w, h, 0);
+       },
+       VX_ErrUnsupportedDestinationFormat,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, F::V210_422_10u, F::UYVY_422_32f}},
+  };
+  for (const Call& call : calls) {
+    for (const Size& size : kSizes)
+      ExpectRefusal(call.name, size.expected, [&](void* p) { return call.run(p, p, kBgra, size.width, size.height); });
+    for (const F f : call.refused)
+      ExpectRefusal(call.name, call.badFormat, [&](void* p) { return call.run(p, p, f, -1, 5); });
+    ExpectRefusal(call.name, VX_ErrNullSource, [&](void* p) { return call.run(nullptr, p, kBgra, 5, 5); });
+    ExpectRefusal(call.name, VX_ErrNullDestination, [&](void* p) { return call.run(p, nullptr, kBgra, 5, 5); });
+  }
+  const auto mask = [](void* p, F a, F b, const void* bits, int offset) {
+    return VX_OneBitMaskComposite(p, 64, a, p, 64, b, bits, 8, offset, p, 64, kBgra, 5, 5, 0);
+  };
+  for (const int offset : {-1, 8, INT_MIN, INT_MAX})
+    ExpectRefusal("bit offset", VX_ErrArgumentOutOfRange, [&](void* p) { return mask(p, kBgra, kBgra, p, offset); });
+  ExpectRefusal("no mask", VX_ErrNullSource, [&](void* p) { return mask(p, kBgra, kBgra, nullptr, 0); });
+  ExpectRefusal("4:2:0 A", VX_ErrUnsupportedFormat, [&](void* p) { return mask(p, k420, kBgra, p, 0); });
+  ExpectRefusal("nameless B", VX_ErrFailed, [&](void* p) { return mask(p, kBgra, kRgba10, p, 0); });
+  const auto matted = [](void* p, F f, const void* color, F colorFormat) {
+    return VX_UnPremultiplyAgainstMatteColor(p, 64, p, 64, f, 5, 5, color, colorFormat, 0);
+  };
+  ExpectRefusal("matte depth", VX_ErrFormatNotHandled, [&](void* p) { return matted(p, kRgba10, p, kRgba10); });
+  ExpectRefusal("no matte", VX_ErrNullSource, [&](void* p) { return matted(p, kBgra, nullptr, F::VUYA_4444_8u); });
+  ExpectRefusal("DV matte", VX_ErrUnsupportedFormat, [&](void* p) { return matted(p, kBgra, p, kDv); });
+  const auto setAll = [](void* p, uint32_t w, uint32_t h, int rowBytes) {
+    return VX_SetAlphaChannel(w, h, p, rowBytes, kBgra, true);
+  };
+  ExpectRefusal("empty", VX_Success, [&](void* p) { return setAll(p, 0, 5, 64); });
+  ExpectRefusal("empty", VX_Success, [&](void* p) { return setAll(p, 5, 0, 64); });
+  for (const uint32_t huge : {0x20000000u, 0x80000000u, UINT_MAX}) {
+    ExpectRefusal("too wide", VX_ErrFailed, [&](void* p) { return setAll(p, huge, 1, 64); });
+    ExpectRefusal("too high", VX_ErrFailed, [&](void* p) { return setAll(p, 1, huge | 0x80000000u, 4); });
+  }
+  ExpectRefusal("short rows", VX_ErrFailed, [&](void* p) { return setAll(p, 5, 2, 19); });
+  ExpectRefusal("null", VX_ErrFailed, [&](void*) { return setAll(nullptr, 5, 2, 20); });
+}
+
+// Rows that need memory: 4:2:2 is converted row by row.
+TEST(AlphaUtilities, FailingAllocations) {
+  constexpr int kWidth = 20000;
+  Picture pairs(F::UYVY_422_8u, kWidth, 2), pixels(F::BGRA_4444_32f, kWidth, 2);
+  const std::vector<uint8_t> mask(kWidth / 8);
+  const auto gain = [&] {
+    return VX_AlphaGain(pairs.bytes.data(), pairs.rowBytes, F::UYVY_422_8u, pixels.bytes.data(), pixels.rowBytes,
+                        F::BGRA_4444_32f, kWidth, 2, 0.5f, 0);
+  };
+  EXPECT_GE(ExpectSurvivesFailingAllocations("VX_AlphaGain", gain), 1);
+  const auto choose = [&] {
+    return VX_OneBitMaskComposite(pairs.bytes.data(), pairs.rowBytes, F::UYVY_422_8u, pixels.bytes.data(),
+                                  pixels.rowBytes, F::BGRA_4444_32f, mask.data(), 0, 0, pixels.bytes.data(),
+                                  pixels.rowBytes, F::BGRA_4444_32f, kWidth, 2, 0);
+  };
+  EXPECT_GE(ExpectSurvivesFailingAllocations("VX_OneBitMaskComposite", choose), 1);
+}
+
+}  // namespace
+}  // namespace vexel::testing
