@@ -2,6 +2,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "composite/DvBlackFrames.h"
 #include "composite/FillValues.h"
 #include "convert/Planar420.h"
 #include "formats/FormatBits.h"
@@ -75,7 +76,19 @@ VX_Result Fill420(const Raster& block, VX_PixelFormat format, FillLevel level) n
   return VX_Success;
 }
 
+// A DV frame has its standard's size, whatever the width and height.
+VX_Result FillDv(const Raster& frame, VX_PixelFormat format) noexcept {
+  bool done;
+  const VX_Result check = CheckBuffer(frame.base, 0, frame.width, frame.height, &done);
+  if (check != VX_Success || done) return check;
+  WriteDvBlackFrame(format == VX_PixelFormat::PALDV25 ? DvSystem::Lines625 : DvSystem::Lines525,
+                    static_cast<uint8_t*>(frame.base));
+  return VX_Success;
+}
+
 VX_Result FillOpaque(const Raster& raster, VX_PixelFormat format, FillLevel level) noexcept {
+  const bool isDv25 = format == VX_PixelFormat::NTSCDV25 || format == VX_PixelFormat::PALDV25;
+  if (isDv25 && level == FillLevel::Black) return FillDv(raster, format);
   if (Is420(format)) return Fill420(raster, format, level);
   FillUnit unit;
   return MakeFillUnit(format, level, true, &unit) ? FillRaster(raster, unit) : VX_ErrFormatNotHandled;

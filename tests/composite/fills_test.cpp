@@ -237,6 +237,48 @@ TEST(Fills, Refusals) {
     }
 }
 
+// A DV frame as its blocks say: every section where it belongs, video that decodes to black by its mean values.
+TEST(Fills, DvFramesAreWhole) {
+  for (const F format : {F::NTSCDV25, F::PALDV25}) {
+    const bool is625 = format == F::PALDV25;
+    const size_t size = is625 ? 144000 : 120000;
+    Bytes frame(size + 1, 0x77), again(size + 1, 0x88);
+    ASSERT_EQ(VX_FillWithOpaqueBlack(frame.data(), 0, 720, 480, format), VX_Success);
+    ASSERT_EQ(VX_FillWithOpaqueBlack(again.data(), 1, 1, 1, format), VX_Success);
+    EXPECT_EQ(frame[size], 0x77);
+    EXPECT_TRUE(std::equal(frame.begin(), frame.end() - 1, again.begin()));
+    int videoSources = 0, audioSources = 0;
+    for (size_t i = 0; i < size / 80; ++i) {
+      const uint8_t* block = &frame[80 * i];
+      const size_t inSequence = i % 150, inGroup = inSequence < 6 ? 0 : (inSequence - 6) % 16;
+      const int section = inSequence == 0 ? 0 : inSequence < 3 ? 1 : inSequence < 6 ? 2 : inGroup == 0 ? 3 : 4;
+      const size_t number = section < 2    ? inSequence - section
+                            : section == 2 ? inSequence - 3
+                            : section == 3 ? (inSequence - 6) / 16
+                                           : (inSequence - 6) / 16 * 15 + inGroup - 1;
+      ASSERT_EQ(block[0] >> 5, section);
+      ASSERT_EQ(block[1] >> 4, static_cast<int>(i / 150));
+      ASSERT_EQ(block[2], number);
+      ASSERT_TRUE(section != 0 || block[3] >> 7 == is625);
+      if (section == 2)
+        for (const uint8_t* pack = block + 3; pack < block + 78; pack += 5)
+          videoSources += pack[0] == 0x60 && (pack[3] >> 5 & 1) == is625;
+      if (section == 3) {
+        audioSources += block[3] == 0x50;
+        for (int k = 8; k < 80; ++k) ASSERT_EQ(block[k], 0);
+      }
+      for (size_t k = 0; section == 4 && k < 6; ++k) {
+        const uint8_t* dct = block + 4 + (k < 4 ? 14 * k : 56 + 10 * (k - 4));
+        const int mean = static_cast<int8_t>(dct[0]) * 2 + (dct[1] >> 7);
+        ASSERT_EQ(mean / 2 + 128, k < 4 ? 16 : 128);
+        ASSERT_EQ(dct[1] & 0x7F, 0x06);
+      }
+    }
+    EXPECT_EQ(videoSources, is625 ? 12 : 10);
+    EXPECT_EQ(audioSources, is625 ? 12 : 10);
+  }
+}
+
 TEST(Fills, GiantStrides) {
   for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
     const ArenaFrame giant = GiantStrideFrame(F::ARGB_4444_8u, 37, 7, rowBytes);
