@@ -11,6 +11,8 @@ void AddConvertCommand(CLI::App& app);
 void AddDemoCommand(CLI::App& app);
 void AddTransposeCommand(CLI::App& app);
 void AddRotateCommand(CLI::App& app);
+void AddFillCommand(CLI::App& app);
+void AddDissolveCommand(CLI::App& app);
 void AddColorCommand(CLI::App& app);
 
 }  // namespace tool

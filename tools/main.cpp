@@ -22,6 +22,8 @@ void AddCommands(CLI::App& app) {
   tool::AddDemoCommand(app);
   tool::AddTransposeCommand(app);
   tool::AddRotateCommand(app);
+  tool::AddFillCommand(app);
+  tool::AddDissolveCommand(app);
   tool::AddColorCommand(app);
 }
 
