@@ -39,7 +39,15 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   if (IsSpecial(src.format) || IsSpecial(background.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
   F result = ResultFormat(dst.format);
-  const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, HasUsableAlpha(src.format),
+  // Where everything is alpha-first RGB of one depth, three reversals are saved; the bytes are the same.
+  const auto alphaFirst = [](F format) {
+    return (Bits(format) & ~(kAlphaMask | kDepthMask)) == kReversedBit &&
+           (Depth(format) == kDepth8u || Depth(format) == kDepth32f);
+  };
+  const bool keepsOrder = alphaFirst(src.format) && alphaFirst(background.format) && alphaFirst(dst.format) &&
+                          Depth(src.format) == Depth(dst.format) && Depth(background.format) == Depth(dst.format);
+  if (keepsOrder) result = FromBits(Bits(result) | kReversedBit);
+  const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, keepsOrder, HasUsableAlpha(src.format),
                           HasUsableAlpha(background.format)};
   const auto input = [&](bool alpha) { return WithAlphaKind(result, alpha ? kAlphaStraight : kAlphaIgnored); };
   const F srcFormat = input(choice.sourceAlpha), backgroundFormat = input(choice.backgroundAlpha);

@@ -1,4 +1,4 @@
-// Row kernels of normal compositing: a source over a background, both with straight alpha in the fourth channel.
+// Row kernels of normal compositing: a source over a background, both with straight alpha.
 #pragma once
 
 #include <cstddef>
@@ -14,36 +14,28 @@ using OverKernel = void (*)(const uint8_t* source, const uint8_t* background, ui
                             float opacity);
 using OverKernelSet = KernelVariants<OverKernel>;
 
-// What a kernel is chosen by. Where alpha is not usable the fourth channel is not looked at and counts as opaque. With
-// a background without alpha, the result is opaque and straight and premultiplied are the same.
+// What a kernel is chosen by. Where alpha is not usable its channel is not looked at and counts as opaque.
 struct OverChoice {
-  bool yuv;  // 8u only: black is 128, 128, 16 instead of 0
-  bool straight;
+  bool yuv;         // 8u: black is 128, 128, 16 instead of 0
+  bool straight;    // the result; premultiplied otherwise
+  bool alphaFirst;  // in memory, in all three rows; last otherwise
   bool sourceAlpha, backgroundAlpha;
 };
 
-// Calls pick with the choice as a template argument; those with the same results become one.
-template <class Pick>
-const OverKernelSet& PickOver(OverChoice choice, const Pick& pick) noexcept {
-  constexpr bool no = false, yes = true;
-  if (!choice.backgroundAlpha)
-    return choice.sourceAlpha ? pick.template operator()<OverChoice{no, yes, yes, no}>()
-                              : pick.template operator()<OverChoice{no, yes, no, no}>();
-  if (choice.sourceAlpha) {
-    if (choice.straight)
-      return choice.yuv ? pick.template operator()<OverChoice{yes, yes, yes, yes}>()
-                        : pick.template operator()<OverChoice{no, yes, yes, yes}>();
-    return choice.yuv ? pick.template operator()<OverChoice{yes, no, yes, yes}>()
-                      : pick.template operator()<OverChoice{no, no, yes, yes}>();
-  }
-  if (choice.straight)
-    return choice.yuv ? pick.template operator()<OverChoice{yes, yes, no, yes}>()
-                      : pick.template operator()<OverChoice{no, yes, no, yes}>();
-  return choice.yuv ? pick.template operator()<OverChoice{yes, no, no, yes}>()
-                    : pick.template operator()<OverChoice{no, no, no, yes}>();
-}
-
 const OverKernelSet& Over8u(OverChoice choice) noexcept;
 const OverKernelSet& Over32f(OverChoice choice) noexcept;
+
+// For the tables: the choice of an index of five bits, or the one that gives the same results. Over a background
+// without alpha every result is opaque, and straight and premultiplied are the same.
+inline constexpr size_t kOverChoices = 32;
+constexpr size_t IndexOf(OverChoice c) noexcept {
+  return size_t{c.yuv} | size_t{c.straight} << 1 | size_t{c.alphaFirst} << 2 | size_t{c.sourceAlpha} << 3 |
+         size_t{c.backgroundAlpha} << 4;
+}
+constexpr OverChoice OverChoiceAt(size_t index) noexcept {
+  const auto bit = [index](int i) { return (index >> i & 1) != 0; };
+  const bool mixes = bit(4);
+  return {bit(0) && mixes && !bit(2), bit(1) || !mixes, bit(2), bit(3), mixes};
+}
 
 }  // namespace vexel

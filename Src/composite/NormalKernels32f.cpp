@@ -24,6 +24,8 @@ namespace {
 // A straight result with less alpha than this has no colour.
 constexpr float kLeastAlpha = 8e-6f;
 
+constexpr size_t AlphaAt(OverChoice choice) { return choice.alphaFirst ? 0 : 3; }
+
 }  // namespace
 }  // namespace vexel
 #endif
@@ -37,18 +39,21 @@ namespace {
 template <OverChoice kChoice>
 HWY_INLINE F32 Over(F32 s, F32 d, F32 opacity) {
   const FloatTag df;
+  constexpr size_t kAlpha = AlphaAt(kChoice);
+  constexpr int kAlphaBit = 1 << kAlpha;
   const auto one = hn::Set(df, 1.0f);
   auto as = opacity;
-  if constexpr (kChoice.sourceAlpha) as = hn::Mul(hn::Broadcast<3>(s), opacity);
+  if constexpr (kChoice.sourceAlpha) as = hn::Mul(hn::Broadcast<kAlpha>(s), opacity);
   const auto mix = [&](F32 t) HWY_ATTR { return hn::Add(hn::Mul(hn::Sub(one, t), d), hn::Mul(t, s)); };
-  if constexpr (!kChoice.backgroundAlpha) return TakeChannels<8>(mix(as), one);
-  const auto ab = hn::Broadcast<3>(d);
+  if constexpr (!kChoice.backgroundAlpha) return TakeChannels<kAlphaBit>(mix(as), one);
+  const auto ab = hn::Broadcast<kAlpha>(d);
   const auto both = hn::Mul(as, ab);
   const auto ao = hn::Sub(hn::Add(ab, as), both);
-  if constexpr (!kChoice.straight) return TakeChannels<8>(hn::Add(hn::Mul(s, as), hn::Mul(d, hn::Sub(ab, both))), ao);
+  if constexpr (!kChoice.straight)
+    return TakeChannels<kAlphaBit>(hn::Add(hn::Mul(s, as), hn::Mul(d, hn::Sub(ab, both))), ao);
   const auto clear = hn::Lt(hn::Abs(ao), hn::Set(df, kLeastAlpha));
   const auto t = hn::Mul(as, hn::Div(one, hn::IfThenElse(clear, one, ao)));
-  return TakeChannels<8>(hn::IfThenZeroElse(clear, mix(t)), ao);
+  return TakeChannels<kAlphaBit>(hn::IfThenZeroElse(clear, mix(t)), ao);
 }
 
 template <OverChoice kChoice>
@@ -84,21 +89,22 @@ void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size
     float s[4], d[4];
     std::memcpy(s, source + 16 * i, sizeof s);
     std::memcpy(d, background + 16 * i, sizeof d);
-    const float as = kChoice.sourceAlpha ? s[3] * opacity : opacity;
-    const float ab = kChoice.backgroundAlpha ? d[3] : 1.0f;
+    const float as = kChoice.sourceAlpha ? s[AlphaAt(kChoice)] * opacity : opacity;
+    const float ab = kChoice.backgroundAlpha ? d[AlphaAt(kChoice)] : 1.0f;
     const float ao = kChoice.backgroundAlpha ? ab + as - as * ab : 1.0f;
     const bool clear = kChoice.straight && std::fabs(ao) < kLeastAlpha;
     const float t = kChoice.backgroundAlpha && !clear ? as * (1 / ao) : as;
     float out[4];
-    ForChannels<3>([&](size_t k) {
-      if (clear)
+    ForChannels([&](size_t k) {
+      if (k == AlphaAt(kChoice))
+        out[k] = ao;
+      else if (clear)
         out[k] = 0;
       else if (kChoice.straight)
         out[k] = (1 - t) * d[k] + t * s[k];
       else
         out[k] = s[k] * as + d[k] * (ab - as * ab);
     });
-    out[3] = ao;
     std::memcpy(dst + 16 * i, out, sizeof out);
   }
 }
@@ -115,7 +121,11 @@ const OverKernelSet kOver32 = VX_KERNEL_VARIANTS(Over32<kChoice>);
 
 const OverKernelSet& Over32f(OverChoice choice) noexcept {
   choice.yuv = false;
-  return PickOver(choice, []<OverChoice kChoice>() -> const OverKernelSet& { return kOver32<kChoice>; });
+  return *[&]<size_t... i>(std::index_sequence<i...>) {
+    static constexpr const OverKernelSet* kTable[] = {&kOver32<OverChoiceAt(i & ~size_t{1})>...};
+    return kTable[IndexOf(choice)];
+  }
+  (std::make_index_sequence<kOverChoices>());
 }
 
 }  // namespace vexel

@@ -1,8 +1,9 @@
-// 8-bit normal compositing. Every pixel's result depends on that pixel only.
+// 8-bit normal compositing, within 0.52 of the exact result in every channel. Every pixel's result depends on that
+// pixel only.
 //
-// Over an opaque pixel: at opacity 1 the exact quotient rounded to nearest; below, integer arithmetic that is within
-// 0.52 of the exact result. Over any other: floats with one division for each pixel, which give the same bytes for
-// opaque pixels at opacity 1 (quotients by 255 keep 1/510 away from ties, the floats are off by less than 1/5000).
+// Over an opaque pixel the colours are mixed with a weight of 15 bits, alpha times opacity. Over any other the weight
+// comes from floats, with one division for each pixel. There opaque pixels take their alpha times opacity from the
+// same 15 bits, so that both ways give them the same bytes.
 #include <cstddef>
 #include <cstdint>
 
@@ -15,7 +16,7 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
-#include "composite/Over8-inl.h"
+#include "composite/Bytes-inl.h"
 #include "composite/TwoRows-inl.h"
 #include "frame/KernelTable.h"
 
@@ -24,10 +25,12 @@
 namespace vexel {
 namespace {
 
-// Result alpha up to this counts as none; the colour is black then.
+// A straight result's alpha up to this counts as none; the colour is black then.
 constexpr float kClearAlpha = 7.6293945e-6f;
-constexpr int kBlackVuy[3] = {128, 128, 16};
+constexpr int kBlackVuy[4] = {128, 128, 16, 0};
 constexpr uint32_t kBlackVuyWord = 0x00108080;
+
+constexpr size_t AlphaAt(OverChoice choice) { return choice.alphaFirst ? 0 : 3; }
 
 }  // namespace
 }  // namespace vexel
@@ -39,113 +42,119 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
 
-template <size_t kChannel>
-HWY_INLINE F32 ChannelFloats(U8 v) {
+template <size_t kByte>
+HWY_INLINE I32 ByteOf(U8 v) {
   const hn::ScalableTag<uint32_t> du;
   auto words = hn::BitCast(du, v);
-  if constexpr (kChannel > 0) words = hn::ShiftRight<8 * kChannel>(words);
-  if constexpr (kChannel < 3) words = hn::And(words, hn::Set(du, 255));
-  return hn::ConvertTo(hn::ScalableTag<float>(), hn::BitCast(hn::ScalableTag<int32_t>(), words));
+  if constexpr (kByte > 0) words = hn::ShiftRight<8 * kByte>(words);
+  if constexpr (kByte < 3) words = hn::And(words, hn::Set(du, 255));
+  return hn::BitCast(hn::ScalableTag<int32_t>(), words);
+}
+template <size_t kByte>
+HWY_INLINE F32 FloatOf(U8 v) {
+  return hn::ConvertTo(hn::ScalableTag<float>(), ByteOf<kByte>(v));
+}
+template <size_t kByte>
+HWY_INLINE U32 PlaceByte(I32 v) {
+  const auto words = hn::BitCast(hn::ScalableTag<uint32_t>(), v);
+  if constexpr (kByte == 0) return words;
+  return hn::ShiftLeft<8 * kByte>(words);
 }
 
-template <size_t kChannel>
-HWY_INLINE U32 ChannelBytes(F32 v) {
-  const auto bytes = hn::BitCast(hn::ScalableTag<uint32_t>(), ConvertNearest(v));
-  if constexpr (kChannel == 0) return bytes;
-  return hn::ShiftLeft<8 * kChannel>(bytes);
-}
+template <OverChoice kChoice>
+struct Compositor {
+  static constexpr size_t kAlpha = AlphaAt(kChoice), kColour = kChoice.alphaFirst ? 1 : 0;
 
-// The source's part in a result: its alpha times opacity, as floats and for opaque backgrounds. kFull means opacity 1
-// and a source with alpha.
-template <bool kFull, bool kSourceAlpha>
-struct Part {
-  explicit HWY_INLINE Part(float opacity)
-      : scale(hn::Set(hn::ScalableTag<float>(), kSourceAlpha ? opacity * k8uTo32f : opacity)),
+  explicit HWY_INLINE Compositor(float opacity)
+      : scale(hn::Set(df, kChoice.sourceAlpha ? opacity * k8uTo32f : opacity)),
         fixedOpacity(hn::Set(hn::ScalableTag<uint16_t>(), plain::FixedOpacity(opacity))),
-        constant(Weight15(hn::Set(hn::ScalableTag<uint16_t>(), 65535), fixedOpacity)) {}
+        weight(static_cast<int16_t>(plain::Weight15(255, plain::FixedOpacity(opacity)))) {}
 
-  HWY_INLINE F32 Alpha(U8 s) const {
-    if constexpr (kSourceAlpha) return hn::Mul(ChannelFloats<3>(s), scale);
-    return scale;
-  }
-  HWY_INLINE U8 OnOpaque(U8 s, U8 d) const {
-    U8 result;
-    if constexpr (kFull)
-      result = OverOpaque(s, d, SpreadChannel<3>(s));
-    else if constexpr (kSourceAlpha)
-      result = OverOpaqueWeighted(s, d, WeightsOf(SpreadChannel<3>(s), fixedOpacity));
-    else
-      result = OverOpaqueWeighted(s, d, {constant, constant});
-    return hn::Or(result, OpaqueVector<3, uint8_t>());
+  HWY_INLINE U8 OverOpaque(U8 s, U8 d) const {
+    return hn::Or(Mix15(s, d, Weights(s)), OpaqueVector<kAlpha, uint8_t>());
   }
 
-  F32 scale;
-  U16 fixedOpacity, constant;
+  HWY_INLINE U8 OverAny(U8 s, U8 d) const {
+    // Not hn::Eq of floats: 255 / 255 is 1, but nobody has to know.
+    const auto isOpaque = hn::RebindMask(df, hn::Eq(ByteOf<kAlpha>(d), hn::Set(di, 255)));
+    auto as = scale;
+    if constexpr (kChoice.sourceAlpha) as = hn::Mul(FloatOf<kAlpha>(s), scale);
+    as = hn::IfThenElse(isOpaque, hn::Mul(hn::ConvertTo(df, WeightOfPixel(s)), hn::Set(df, 1.0f / 32768)), as);
+    const auto ab = hn::Mul(FloatOf<kAlpha>(d), hn::Set(df, k8uTo32f));
+    const auto ao = hn::Add(as, hn::Sub(ab, hn::Mul(ab, as)));
+    const auto alpha = PlaceByte<kAlpha>(ConvertNearest(hn::Mul(ao, hn::Set(df, 255.0f))));
+    const auto colour = kChoice.straight ? StraightColour(s, d, as, ao) : PremultipliedColour(s, d, as, ao);
+    auto result = hn::Or(colour, alpha);
+    if constexpr (kChoice.straight) {
+      const auto isClear = hn::RebindMask(du, hn::Le(ao, hn::Set(df, kClearAlpha)));
+      result = hn::IfThenElse(isClear, hn::Set(du, kChoice.yuv ? kBlackVuyWord : 0), result);
+    }
+    return hn::BitCast(d8, result);
+  }
+
+ private:
+  // Alpha times opacity in 1/32768, in all channels and in one lane for each pixel.
+  HWY_INLINE Halves Weights(U8 s) const {
+    const hn::ScalableTag<int16_t> d16;
+    if constexpr (!kChoice.sourceAlpha) return {hn::Set(d16, weight), hn::Set(d16, weight)};
+    const Halves alpha = SpreadByte<kAlpha, true>(s);
+    return {hn::BitCast(d16, hn::MulHigh(hn::BitCast(dw, alpha.lower), fixedOpacity)),
+            hn::BitCast(d16, hn::MulHigh(hn::BitCast(dw, alpha.upper), fixedOpacity))};
+  }
+  HWY_INLINE I32 WeightOfPixel(U8 s) const {
+    if constexpr (!kChoice.sourceAlpha) return hn::Set(di, weight);
+    const auto alpha = hn::ShiftLeft<8>(ByteOf<kAlpha>(s));
+    return hn::BitCast(di, hn::MulHigh(hn::BitCast(dw, alpha), fixedOpacity));
+  }
+
+  static HWY_INLINE U32 StraightColour(U8 s, U8 d, F32 as, F32 ao) {
+    const auto inverse = hn::Div(hn::Set(df, 32768.0f), hn::Max(ao, hn::Set(df, kClearAlpha)));
+    const auto part = hn::Min(ConvertNearest(hn::Mul(as, inverse)), hn::Set(di, 32767));
+    return hn::BitCast(du, hn::AndNot(OpaqueVector<kAlpha, uint8_t>(), Mix15(s, d, SpreadWords(part))));
+  }
+  static HWY_INLINE U32 PremultipliedColour(U8 s, U8 d, F32 as, F32 ao) {
+    const auto channel = [&](F32 cs, F32 cd, int black) HWY_ATTR {
+      auto sum = hn::Add(hn::Mul(cd, ao), hn::Mul(hn::Sub(cs, cd), as));
+      if constexpr (kChoice.yuv)
+        sum = hn::Add(sum, hn::Mul(hn::Sub(hn::Set(df, 1.0f), ao), hn::Set(df, static_cast<float>(black))));
+      return Truncate(hn::Add(sum, hn::Set(df, 0.5f)));
+    };
+    constexpr size_t k0 = kColour, k1 = kColour + 1, k2 = kColour + 2;
+    const auto c0 = PlaceByte<k0>(channel(FloatOf<k0>(s), FloatOf<k0>(d), kBlackVuy[k0]));
+    const auto c1 = PlaceByte<k1>(channel(FloatOf<k1>(s), FloatOf<k1>(d), kBlackVuy[k1]));
+    const auto c2 = PlaceByte<k2>(channel(FloatOf<k2>(s), FloatOf<k2>(d), kBlackVuy[k2]));
+    return hn::Or(c0, hn::Or(c1, c2));
+  }
+
+  static constexpr hn::ScalableTag<uint8_t> d8{};
+  static constexpr hn::ScalableTag<uint16_t> dw{};
+  static constexpr hn::ScalableTag<uint32_t> du{};
+  static constexpr hn::ScalableTag<int32_t> di{};
+  static constexpr hn::ScalableTag<float> df{};
+
+  F32 scale;  // times a source's alpha code; the opacity itself where there is none
+  U16 fixedOpacity;
+  int16_t weight;  // of a source without alpha
 };
 
-// Over pixels of any alpha.
-template <bool kYuv, bool kStraight, bool kFull, bool kSourceAlpha>
-HWY_INLINE U8 OnAny(U8 s, U8 d, const Part<kFull, kSourceAlpha>& part) {
-  const hn::ScalableTag<uint8_t> d8;
-  const hn::ScalableTag<uint32_t> du;
-  const hn::ScalableTag<float> df;
-  const auto one = hn::Set(df, 1.0f);
-  const auto as = part.Alpha(s);
-  const auto ab = hn::Mul(ChannelFloats<3>(d), hn::Set(df, k8uTo32f));
-  const auto rest = hn::Sub(ab, hn::Mul(ab, as));
-  const auto ao = hn::Add(as, rest);
-  auto forSource = as, forBackground = rest;
-  if constexpr (kStraight) {
-    const auto inverse = hn::Div(one, hn::Max(ao, hn::Set(df, kClearAlpha)));
-    forSource = hn::Mul(as, inverse);
-    forBackground = hn::Mul(rest, inverse);
-  }
-  const auto mix = [&](F32 cs, F32 cd, int black) HWY_ATTR {
-    auto sum = hn::Add(hn::Mul(cs, forSource), hn::Mul(cd, forBackground));
-    if (kYuv && !kStraight) sum = hn::Add(sum, hn::Mul(hn::Sub(one, ao), hn::Set(df, static_cast<float>(black))));
-    return sum;
-  };
-  const auto c0 = ChannelBytes<0>(mix(ChannelFloats<0>(s), ChannelFloats<0>(d), kBlackVuy[0]));
-  const auto c1 = ChannelBytes<1>(mix(ChannelFloats<1>(s), ChannelFloats<1>(d), kBlackVuy[1]));
-  const auto c2 = ChannelBytes<2>(mix(ChannelFloats<2>(s), ChannelFloats<2>(d), kBlackVuy[2]));
-  const auto alpha = ChannelBytes<3>(hn::Mul(ao, hn::Set(df, 255.0f)));
-  auto result = hn::Or(hn::Or(c0, c1), hn::Or(c2, alpha));
-  if constexpr (kStraight) {
-    const auto clear = hn::RebindMask(du, hn::Le(ao, hn::Set(df, kClearAlpha)));
-    result = hn::IfThenElse(clear, hn::Set(du, kYuv ? kBlackVuyWord : 0), result);
-  }
-  if constexpr (!kFull) {
-    const auto opaque = hn::Eq(hn::ShiftRight<24>(hn::BitCast(du, d)), hn::Set(du, 255));
-    result = hn::IfThenElse(opaque, hn::BitCast(du, part.OnOpaque(s, d)), result);
-  }
-  return hn::BitCast(d8, result);
-}
-
-template <OverChoice kChoice, bool kFull>
-HWY_INLINE void OverRow(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
-  const Part<kFull, kChoice.sourceAlpha> part(opacity);
+template <OverChoice kChoice>
+HWY_ATTR void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+  const Compositor<kChoice> compositor(opacity);
+  const auto opaque = OpaqueVector<AlphaAt(kChoice), uint8_t>();
   TwoRowLoop<2 * HWY_MAX_BYTES / 4, 4>(
       source, background, dst, count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
         const auto s0 = LoadVector<uint8_t>(from, 0), s1 = LoadVector<uint8_t>(from, 1);
         const auto d0 = LoadVector<uint8_t>(onto, 0), d1 = LoadVector<uint8_t>(onto, 1);
-        const auto opaque = OpaqueVector<3, uint8_t>();
-        if (!kChoice.backgroundAlpha ||
-            hn::AllTrue(hn::ScalableTag<uint8_t>(), hn::Eq(hn::And(hn::And(d0, d1), opaque), opaque))) {
-          StoreVector(part.OnOpaque(s0, d0), out, 0);
-          StoreVector(part.OnOpaque(s1, d1), out, 1);
+        const auto both = hn::And(hn::And(d0, d1), opaque);
+        if (!kChoice.backgroundAlpha || hn::AllTrue(hn::ScalableTag<uint8_t>(), hn::Eq(both, opaque))) {
+          StoreVector(compositor.OverOpaque(s0, d0), out, 0);
+          StoreVector(compositor.OverOpaque(s1, d1), out, 1);
         } else {
-          StoreVector(OnAny<kChoice.yuv, kChoice.straight>(s0, d0, part), out, 0);
-          StoreVector(OnAny<kChoice.yuv, kChoice.straight>(s1, d1, part), out, 1);
+          const auto r0 = compositor.OverAny(s0, d0), r1 = compositor.OverAny(s1, d1);
+          StoreVector(r0, out, 0);
+          StoreVector(r1, out, 1);
         }
       });
-}
-
-template <OverChoice kChoice>
-HWY_ATTR void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
-  if (kChoice.sourceAlpha && opacity == 1.0f)
-    OverRow<kChoice, kChoice.sourceAlpha>(source, background, dst, count, opacity);
-  else
-    OverRow<kChoice, false>(source, background, dst, count, opacity);
 }
 
 }  // namespace
@@ -159,43 +168,42 @@ namespace vexel {
 namespace plain {
 namespace {
 
-// One pixel over an opaque one.
-template <bool kSourceAlpha>
-void OnOpaque(const uint8_t* s, const uint8_t* d, float opacity, uint8_t* out) {
-  const int alpha = kSourceAlpha ? s[3] : 255;
+template <OverChoice kChoice>
+void PixelOverOpaque(const uint8_t* s, const uint8_t* d, float opacity, uint8_t* out) {
+  const int alpha = kChoice.sourceAlpha ? s[AlphaAt(kChoice)] : 255;
   const int weight = Weight15(alpha, FixedOpacity(opacity));
-  ForChannels<3>([&](size_t k) {
-    const bool exact = kSourceAlpha && opacity == 1.0f;
-    out[k] = exact ? OverOpaque(s[k], d[k], alpha) : OverOpaqueWeighted(s[k], d[k], weight);
-  });
-  out[3] = 255;
+  ForChannels([&](size_t k) { out[k] = k == AlphaAt(kChoice) ? 255 : Mix15(s[k], d[k], weight); });
 }
 
-template <bool kYuv, bool kStraight, bool kSourceAlpha>
-void OnAny(const uint8_t* s, const uint8_t* d, float opacity, uint8_t* out) {
-  const float as = kSourceAlpha ? s[3] * (opacity * k8uTo32f) : opacity;
-  const float ab = d[3] * k8uTo32f;
-  const float rest = ab - ab * as;
-  const float ao = as + rest;
-  const bool clear = kStraight && ao <= kClearAlpha;
-  const float inverse = !kStraight ? 1.0f : clear ? 0.0f : 1 / ao;
-  ForChannels<3>([&](size_t k) {
-    const int black = kYuv ? kBlackVuy[k] : 0;
-    float sum = s[k] * (as * inverse) + d[k] * (rest * inverse);
-    if (!kStraight) sum += (1 - ao) * black;
-    out[k] = static_cast<uint8_t>(clear ? black : ConvertNearest(sum));
+template <OverChoice kChoice>
+void PixelOverAny(const uint8_t* s, const uint8_t* d, float opacity, uint8_t* out) {
+  const float as = kChoice.sourceAlpha ? s[AlphaAt(kChoice)] * (opacity * k8uTo32f) : opacity;
+  const float ab = d[AlphaAt(kChoice)] * k8uTo32f;
+  const float ao = as + (ab - ab * as);
+  const bool clear = kChoice.straight && ao <= kClearAlpha;
+  const int weight = kChoice.straight && !clear ? Clamp(ConvertNearest(as * (32768 / ao)), 0, 32767) : 0;
+  ForChannels([&](size_t k) {
+    const int black = kChoice.yuv ? kBlackVuy[k] : 0;
+    if (k == AlphaAt(kChoice)) {
+      out[k] = static_cast<uint8_t>(clear ? 0 : ConvertNearest(ao * 255));
+    } else if (kChoice.straight) {
+      out[k] = clear ? static_cast<uint8_t>(black) : Mix15(s[k], d[k], weight);
+    } else {
+      float sum = d[k] * ao + (s[k] - d[k]) * as;
+      if (kChoice.yuv) sum += (1 - ao) * black;
+      out[k] = static_cast<uint8_t>(sum + 0.5f);
+    }
   });
-  out[3] = static_cast<uint8_t>(clear ? 0 : ConvertNearest(ao * 255));
 }
 
 template <OverChoice kChoice>
 void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
   for (size_t i = 0; i < 4 * count; i += 4) {
     uint8_t out[4];
-    if (!kChoice.backgroundAlpha || background[i + 3] == 255)
-      OnOpaque<kChoice.sourceAlpha>(source + i, background + i, opacity, out);
+    if (!kChoice.backgroundAlpha || background[i + AlphaAt(kChoice)] == 255)
+      PixelOverOpaque<kChoice>(source + i, background + i, opacity, out);
     else
-      OnAny<kChoice.yuv, kChoice.straight, kChoice.sourceAlpha>(source + i, background + i, opacity, out);
+      PixelOverAny<kChoice>(source + i, background + i, opacity, out);
     std::memcpy(dst + i, out, 4);
   }
 }
@@ -211,7 +219,11 @@ const OverKernelSet kOver8 = VX_KERNEL_VARIANTS(Over8<kChoice>);
 }  // namespace
 
 const OverKernelSet& Over8u(OverChoice choice) noexcept {
-  return PickOver(choice, []<OverChoice kChoice>() -> const OverKernelSet& { return kOver8<kChoice>; });
+  return *[&]<size_t... i>(std::index_sequence<i...>) {
+    static constexpr const OverKernelSet* kTable[] = {&kOver8<OverChoiceAt(i)>...};
+    return kTable[IndexOf(choice)];
+  }
+  (std::make_index_sequence<kOverChoices>());
 }
 
 }  // namespace vexel

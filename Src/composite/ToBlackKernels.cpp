@@ -13,7 +13,7 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
-#include "composite/Over8-inl.h"
+#include "composite/Bytes-inl.h"
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
 
@@ -29,7 +29,6 @@ struct BlackLayout {
 };
 constexpr BlackLayout kLast = {3, false}, kFirst = {0, false}, kVuya = {3, true};
 constexpr int kBlackVuy[4] = {128, 128, 16, 0};
-constexpr uint32_t kBlackVuyWord = 0x00108080;
 
 // 0..255; opacity is 0..1.
 inline int Opacity255(float opacity) { return static_cast<int>(opacity * 255 + 0.5f); }
@@ -59,35 +58,45 @@ HWY_INLINE void MapInPlace(const uint8_t* src, uint8_t* dst, size_t count, const
   }
 }
 
+// black + (c - black) alpha / 255 in 16-bit lanes: n + 128, all of 128..65153, for which (n + 128) * 257 >> 16 is the
+// rounded quotient. The differences wrap around where they are negative.
 template <BlackLayout kLayout, bool kFull>
 struct Darken8 {
-  U8 black;
-  U8 opacity;  // in the even bytes
+  U16 level;  // 0..255
+  U16 black;  // of the channels
 
   HWY_INLINE U8 operator()(U8 v) const {
-    auto alpha = SpreadChannel<kLayout.alpha>(v);
-    if constexpr (!kFull) {
-      // The product, in both bytes' place: n + 128 of 128..65153.
-      const hn::ScalableTag<uint16_t> d;
-      const auto low = hn::BitCast(d, alpha);
-      const auto product = hn::Add(hn::Mul(hn::And(low, hn::Set(d, 255)), hn::BitCast(d, opacity)), hn::Set(d, 128));
-      const auto scaled = hn::MulHigh(product, hn::Set(d, 257));
-      alpha = hn::BitCast(hn::ScalableTag<uint8_t>(), hn::Or(scaled, hn::ShiftLeft<8>(scaled)));
-    }
-    return hn::Or(OverOpaque(v, black, alpha), OpaqueVector<kLayout.alpha, uint8_t>());
+    const hn::ScalableTag<uint8_t> d8;
+    const Halves alpha = SpreadByte<kLayout.alpha, false>(v);
+    const auto zero = hn::Zero(d8);
+    const auto result = PackBlocks(Scaled(hn::InterleaveLower(v, zero), alpha.lower),
+                                   Scaled(hn::InterleaveUpper(d8, v, zero), alpha.upper));
+    return hn::Or(result, OpaqueVector<kLayout.alpha, uint8_t>());
   }
+
+ private:
+  HWY_INLINE I16 Scaled(U8 channels, I16 alpha) const {
+    auto a = hn::BitCast(d, alpha), c = hn::BitCast(d, channels);
+    if constexpr (!kFull) a = Divide255(hn::Mul(a, level));
+    if constexpr (!kLayout.vuy) return hn::BitCast(hn::ScalableTag<int16_t>(), Divide255(hn::Mul(c, a)));
+    const auto ofBlack = hn::Mul(black, hn::Set(d, 255));
+    return hn::BitCast(hn::ScalableTag<int16_t>(), Divide255(hn::Add(hn::Mul(hn::Sub(c, black), a), ofBlack)));
+  }
+  static HWY_INLINE U16 Divide255(U16 n) { return hn::MulHigh(hn::Add(n, hn::Set(d, 128)), hn::Set(d, 257)); }
+
+  static constexpr hn::ScalableTag<uint16_t> d{};
 };
 
 template <BlackLayout kLayout>
 HWY_ATTR void ToBlack8(const uint8_t* src, uint8_t* dst, size_t count, float opacity) {
-  const hn::ScalableTag<uint8_t> d8;
-  const int level = Opacity255(opacity);
-  const auto black = hn::BitCast(d8, hn::Set(hn::ScalableTag<uint32_t>(), kLayout.vuy ? kBlackVuyWord : 0));
-  const auto factor = hn::BitCast(d8, hn::Set(hn::ScalableTag<uint16_t>(), static_cast<uint16_t>(level)));
-  if (level == 255)
-    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, true>{black, factor});
+  const hn::ScalableTag<uint16_t> d;
+  const int opacity255 = Opacity255(opacity);
+  alignas(16) static constexpr uint16_t kBlack[8] = {128, 128, 16, 0, 128, 128, 16, 0};
+  const auto level = hn::Set(d, static_cast<uint16_t>(opacity255)), black = hn::LoadDup128(d, kBlack);
+  if (opacity255 == 255)
+    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, true>{level, black});
   else
-    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, false>{black, factor});
+    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, false>{level, black});
 }
 
 template <BlackLayout kLayout>
@@ -163,7 +172,8 @@ void ToBlack8(const uint8_t* src, uint8_t* dst, size_t count, float opacity) {
   MapPixels<uint8_t, uint8_t>(src, dst, count, [&](const uint8_t* in, uint8_t* out) {
     const int alpha = Divide255(in[kLayout.alpha] * level);
     ForChannels([&](size_t k) {
-      out[k] = k == kLayout.alpha ? 255 : OverOpaque(in[k], kLayout.vuy ? kBlackVuy[k] : 0, alpha);
+      const int black = kLayout.vuy ? kBlackVuy[k] : 0;
+      out[k] = static_cast<uint8_t>(k == kLayout.alpha ? 255 : Divide255(in[k] * alpha + black * (255 - alpha)));
     });
   });
 }

@@ -41,6 +41,8 @@ class BenchCase {
  public:
   BenchCase(std::string name, size_t pixels) : mName(std::move(name)), mPixels(pixels) {}
   BenchCase& Add(const std::string& contender, std::function<void()> work);
+  // For work on several threads: timed by the clock on the wall instead of the calling thread's.
+  BenchCase& AddThreaded(const std::string& contender, std::function<void()> work);
   // The floor of a call that reads and writes so many bytes, as contender "floor".
   BenchCase& AddFloor(size_t srcBytes, size_t dstBytes);
 

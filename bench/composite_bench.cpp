@@ -1,0 +1,167 @@
+// Normal compositing beside pixman and libyuv, which composite premultiplied pixels, and on one thread and two.
+#include <memory>
+#include <string>
+
+#include <vexel_host/host.h>
+
+#include "formats/FormatBits.h"
+#include "support/Bench.h"
+#include "vexel/compositing.h"
+
+#ifdef VEXEL_PEER_PIXMAN
+#include <pixman.h>
+#endif
+#ifdef VEXEL_PEER_YUV
+#include <libyuv.h>
+#endif
+
+namespace {
+
+using F = VX_PixelFormat;
+using vexel::bench::BenchCase;
+using vexel::bench::Memory;
+
+struct Size {
+  const char* name;
+  int width, height;
+  size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
+};
+constexpr Size k1080p = {"1080p", 1920, 1080}, k2160p = {"2160p", 3840, 2160};
+
+enum class Alpha { Opaque, Soft };
+
+// A frame of noise.
+class Frame {
+ public:
+  Frame(F format, Size size, Alpha alpha, uint64_t seed)
+      : mFormat(format),
+        mRowBytes(static_cast<int32_t>(vexel::UnpaddedRowBytes(format, size.width))),
+        mMemory(std::make_shared<Memory>(static_cast<size_t>(mRowBytes) * static_cast<size_t>(size.height))) {
+    const bool wide = vexel::Depth(format) == vexel::kDepth32f;
+    wide ? mMemory->FillFloats(seed) : mMemory->FillBytes(seed);
+    if (alpha == Alpha::Soft || vexel::AlphaKind(format) == vexel::kAlphaNone) return;
+    for (size_t i = 3; i < 4 * size.Pixels(); i += 4)
+      if (wide)
+        reinterpret_cast<float*>(data())[i] = 1;
+      else
+        data()[i] = 255;
+  }
+  uint8_t* data() const { return mMemory->data(); }
+  F format() const { return mFormat; }
+  int32_t rowBytes() const { return mRowBytes; }
+  size_t size() const { return mMemory->size(); }
+  // No colour above its alpha, for peers that need it.
+  const Frame& Premultiply() const {
+    for (size_t i = 0; i < size(); ++i)
+      if (i % 4 != 3) data()[i] = static_cast<uint8_t>(data()[i] * data()[i | 3] / 255);
+    return *this;
+  }
+
+ private:
+  F mFormat;
+  int32_t mRowBytes;
+  std::shared_ptr<Memory> mMemory;
+};
+
+void AddThreads(BenchCase& report, const std::function<void()>& work) {
+  for (const int threads : {1, 2})
+    report.AddThreaded(threads == 1 ? "vexel, wall clock" : "vexel, two threads", [=] {
+      vexel_host::SetThreadLimit(threads);
+      work();
+    });
+}
+
+struct Over {
+  F src, background, dst;
+  Alpha sourceAlpha, backgroundAlpha;
+  float opacity;
+};
+
+void CompositeCase(const char* name, const Over& over, Size size) {
+  const Frame src(over.src, size, over.sourceAlpha, 1), background(over.background, size, over.backgroundAlpha, 2),
+      dst(over.dst, size, Alpha::Soft, 3);
+  BenchCase report(std::string(name) + (over.opacity == 1 ? " " : " at 0.6 ") + size.name, size.Pixels());
+  const auto work = [=] {
+    VX_Composite(src.data(), src.rowBytes(), src.format(), background.data(), background.rowBytes(),
+                 background.format(), dst.data(), dst.rowBytes(), dst.format(), size.width, size.height, over.opacity,
+                 3, false);
+  };
+  report.Add("vexel", [=] {
+    vexel_host::SetThreadLimit(1);
+    work();
+  });
+  report.AddFloor(src.size() + background.size(), dst.size());
+  AddThreads(report, work);
+  if (over.src != F::BGRA_4444_8u || over.opacity != 1) return;
+#ifdef VEXEL_PEER_PIXMAN
+  const Frame from = Frame(over.src, size, over.sourceAlpha, 1).Premultiply();
+  const Frame onto = Frame(over.src, size, over.backgroundAlpha, 2).Premultiply();
+  const auto image = [size](const Frame& frame) {
+    return std::shared_ptr<pixman_image_t>(
+        pixman_image_create_bits(PIXMAN_a8r8g8b8, size.width, size.height, reinterpret_cast<uint32_t*>(frame.data()),
+                                 frame.rowBytes()),
+        pixman_image_unref);
+  };
+  report.Add("pixman OVER in place, premultiplied", [=, fromImage = image(from), ontoImage = image(onto)] {
+    pixman_image_composite32(PIXMAN_OP_OVER, fromImage.get(), nullptr, ontoImage.get(), 0, 0, 0, 0, 0, 0, size.width,
+                             size.height);
+    (void)from, (void)onto;
+  });
+#endif
+#ifdef VEXEL_PEER_YUV
+  const Frame from2 = Frame(over.src, size, over.sourceAlpha, 1).Premultiply();
+  const Frame onto2 = Frame(over.src, size, over.backgroundAlpha, 2).Premultiply();
+  report.Add("libyuv ARGBBlend, premultiplied", [=] {
+    libyuv::ARGBBlend(from2.data(), from2.rowBytes(), onto2.data(), onto2.rowBytes(), dst.data(), dst.rowBytes(),
+                      size.width, size.height);
+  });
+#endif
+}
+
+void ToBlackCase(F format, float opacity, Size size, bool tested) {
+  const Frame src(format, size, Alpha::Soft, 1), dst(format, size, Alpha::Soft, 3);
+  BenchCase report(std::string(tested ? "tested to black " : "to black ") + VX_PixelFormatName(format) +
+                       (opacity == 1 ? " " : " at 0.6 ") + size.name,
+                   size.Pixels());
+  report.Add("vexel", [=] {
+    vexel_host::SetThreadLimit(1);
+    int32_t state;
+    if (tested)
+      VX_CompositeToBlackAndTestSourceAlpha(src.data(), src.rowBytes(), format, dst.data(), dst.rowBytes(), format,
+                                            size.width, size.height, &state, 0);
+    else
+      VX_CompositeToBlack(src.data(), src.rowBytes(), format, dst.data(), dst.rowBytes(), format, size.width,
+                          size.height, opacity, 0);
+  });
+  report.AddFloor(src.size(), dst.size());
+}
+
+}  // namespace
+
+void RegisterBenchmarks() {
+  const F bgra = F::BGRA_4444_8u;
+  for (const Size size : {k1080p, k2160p}) {
+    for (const float opacity : {1.0f, 0.6f}) {
+      CompositeCase("over opaque BGRA8", {bgra, bgra, bgra, Alpha::Soft, Alpha::Opaque, opacity}, size);
+      CompositeCase("over BGRX8 in BGRX8",
+                    {bgra, F::BGRX_4444_8u, F::BGRX_4444_8u, Alpha::Soft, Alpha::Opaque, opacity}, size);
+      CompositeCase("over soft BGRA8", {bgra, bgra, bgra, Alpha::Soft, Alpha::Soft, opacity}, size);
+    }
+    CompositeCase("over soft BGRA8 in BGRP8", {bgra, bgra, F::BGRP_4444_8u, Alpha::Soft, Alpha::Soft, 1}, size);
+    CompositeCase("opaque over opaque BGRA8", {F::BGRX_4444_8u, bgra, bgra, Alpha::Opaque, Alpha::Opaque, 0.6f}, size);
+    CompositeCase("over soft VUYA8", {F::VUYA_4444_8u, F::VUYA_4444_8u, F::VUYA_4444_8u, Alpha::Soft, Alpha::Soft, 1},
+                  size);
+    CompositeCase("over soft ARGB8", {F::ARGB_4444_8u, F::ARGB_4444_8u, F::ARGB_4444_8u, Alpha::Soft, Alpha::Soft, 1},
+                  size);
+    CompositeCase("over UYVY8 in UYVY8", {bgra, F::UYVY_422_8u, F::UYVY_422_8u, Alpha::Soft, Alpha::Opaque, 1}, size);
+    CompositeCase("BGRA32f over soft BGRA32f",
+                  {F::BGRA_4444_32f, F::BGRA_4444_32f, F::BGRA_4444_32f, Alpha::Soft, Alpha::Soft, 1}, size);
+    CompositeCase("BGRA32f over V210 in V210",
+                  {F::BGRA_4444_32f, F::V210_422_10u, F::V210_422_10u, Alpha::Soft, Alpha::Opaque, 1}, size);
+    for (const F format : {bgra, F::VUYA_4444_8u, F::BGRA_4444_32f}) {
+      ToBlackCase(format, 1, size, false);
+      ToBlackCase(format, 0.6f, size, false);
+      ToBlackCase(format, 1, size, true);
+    }
+  }
+}
