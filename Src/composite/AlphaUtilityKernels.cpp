@@ -32,10 +32,12 @@ using First32f = Channels<float, 0>;
 
 // The codes of black, about which 8u pixels are scaled.
 struct Rgb8 {
-  static constexpr int kBlack[4] = {0, 0, 0, 0};
+  static constexpr bool kIsZero = true;
+  alignas(16) static constexpr int32_t kBlack[4] = {0, 0, 0, 0};
 };
 struct Vuy8 {
-  static constexpr int kBlack[4] = {128, 128, 16, 0};
+  static constexpr bool kIsZero = false;
+  alignas(16) static constexpr int32_t kBlack[4] = {128, 128, 16, 0};
 };
 
 constexpr size_t kMaskPixels = 32;
@@ -100,40 +102,41 @@ HWY_INLINE Full<T> LoadPattern(const PixelPattern& pattern) {
 
 // ---- Gain ----
 
-// Byte kByte of each pixel scaled about black, at its place.
-template <size_t kByte, class Black>
-HWY_INLINE U32 ScaledByte(U32 pixels, F32 gain) {
-  constexpr int kBlack = Black::kBlack[kByte];
-  const hn::ScalableTag<float> df;
-  const hn::ScalableTag<int32_t> di;
-  const hn::ScalableTag<uint32_t> du;
-  const auto code =
-      kByte == 3 ? hn::ShiftRight<24>(pixels) : hn::And(hn::ShiftRight<8 * kByte>(pixels), hn::Set(du, 255));
-  auto c = hn::ConvertTo(df, hn::BitCast(di, code));
-  if constexpr (kBlack != 0) c = hn::Sub(c, hn::Set(df, kBlack));
-  auto scaled = hn::Min(hn::Mul(c, gain), hn::Set(df, 255 - kBlack));
-  if constexpr (kBlack != 0) scaled = hn::Max(scaled, hn::Set(df, -kBlack));
-  auto result = ConvertNearest(scaled);
-  if constexpr (kBlack != 0) result = hn::Add(result, hn::Set(di, kBlack));
-  return hn::ShiftLeft<8 * kByte>(hn::BitCast(du, result));
-}
-
 template <class L>
 void GainAlpha8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
-  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
+  const hn::ScalableTag<float> df;
+  const hn::ScalableTag<uint32_t> du;
+  constexpr int kShift = 8 * L::kAlpha;
+  const auto factor = hn::Set(df, gain), most = hn::Set(df, 255);
+  const auto others = hn::Set(du, ~(uint32_t{255} << kShift));
   MapBytes<uint32_t>(src, dst, count * 4, [&](U32 v) HWY_ATTR {
-    const auto alpha = hn::Set(hn::ScalableTag<uint32_t>(), uint32_t{255} << (8 * L::kAlpha));
-    return hn::Or(hn::AndNot(alpha, v), ScaledByte<L::kAlpha, Rgb8>(v, factor));
+    const auto alpha =
+        hn::ConvertTo(df, hn::BitCast(hn::ScalableTag<int32_t>(), hn::ShiftRight<kShift>(hn::AndNot(others, v))));
+    const auto scaled = ConvertNearest(hn::Min(hn::Mul(alpha, factor), most));
+    return hn::Or(hn::And(v, others), hn::ShiftLeft<kShift>(hn::BitCast(du, scaled)));
   });
 }
 
 template <class Black>
 void GainAll8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
-  const auto factor = hn::Set(hn::ScalableTag<float>(), gain);
-  MapBytes<uint32_t>(src, dst, count * 4, [&](U32 v) HWY_ATTR {
-    return hn::Or(hn::Or(ScaledByte<0, Black>(v, factor), ScaledByte<1, Black>(v, factor)),
-                  hn::Or(ScaledByte<2, Black>(v, factor), ScaledByte<3, Black>(v, factor)));
-  });
+  const hn::ScalableTag<float> df;
+  const auto factor = hn::Set(df, gain);
+  const auto black = hn::LoadDup128(hn::ScalableTag<int32_t>(), Black::kBlack);
+  const auto blackFloat = hn::ConvertTo(df, black);
+  // Packing saturates.
+  const auto scaled = [&](const uint8_t* in) HWY_ATTR {
+    const auto c = hn::ConvertTo(df, LoadPromoted<int32_t, uint8_t>(in));
+    if constexpr (Black::kIsZero)
+      return ConvertNearest(hn::Mul(c, factor));
+    else
+      return hn::Add(ConvertNearest(hn::Mul(hn::Sub(c, blackFloat), factor)), black);
+  };
+  constexpr size_t kQuarter = HWY_MAX_BYTES / 4;
+  MergeLoop<HWY_MAX_BYTES>(
+      src, src, dst, count * 4, [&](const uint8_t* in, const uint8_t*, uint8_t* out, size_t) HWY_ATTR {
+        StoreVector(PackTo8(scaled(in), scaled(in + kQuarter), scaled(in + 2 * kQuarter), scaled(in + 3 * kQuarter)),
+                    out);
+      });
 }
 
 template <class L>
@@ -171,24 +174,54 @@ void ReplaceBits(const uint8_t* src, uint8_t* dst, size_t bytes, const PixelPatt
 
 // ---- Matte ----
 
-template <class L>
-void MatteUnderInverse(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
-  using T = typename L::Type;
-  const auto color = LoadPattern<T>(matte);
-  MapBytes<T>(src, dst, count * kPixelBytes<L>, [&](Full<T> v) HWY_ATTR {
-    if constexpr (sizeof(T) == 2) v = hn::Min(v, hn::Set(hn::ScalableTag<T>(), kFullScale<T>));
-    return WithAlphaOf<L>(Inverse<T>(v), color);
-  });
+// M (1 - a) as premultiplying rounds it, for a matte whose alpha channel is 0; so is the result's.
+template <size_t kAlpha>
+HWY_INLINE U8 MatteUnder(U8 v, U8 matte) {
+  const hn::ScalableTag<uint8_t> d8;
+  const hn::ScalableTag<uint16_t> d;
+  constexpr uint8_t a = kAlpha, no = 0x80;
+  alignas(16) static constexpr uint8_t kSpread[16] = {a,     no, a,     no, a + 4,  no, a + 4,  no,
+                                                      a + 8, no, a + 8, no, a + 12, no, a + 12, no};
+  const auto rest = hn::BitCast(d, hn::TableLookupBytesOr0(hn::Not(v), hn::LoadDup128(d8, kSpread)));
+  const auto pairs = hn::BitCast(d, matte);
+  const auto half = hn::Set(d, 128);
+  // t = 255 q + r + 128; t * 257 >> 16 is the rounded quotient.
+  const auto even = hn::Add(hn::Mul(hn::And(pairs, hn::Set(d, 0x00FF)), rest), half);
+  const auto odd = hn::Add(hn::Mul(hn::ShiftRight<8>(pairs), rest), half);
+  const auto oddResult = hn::And(hn::Add(odd, hn::ShiftRight<8>(odd)), hn::Set(d, 0xFF00));
+  return hn::BitCast(d8, hn::Or(hn::MulHigh(even, hn::Set(d, 257)), oddResult));
+}
+
+// The rounding signed multiply holds 0..32768 as negative numbers, whose product is positive.
+template <size_t kAlpha>
+HWY_INLINE U16 MatteUnder(U16 v, U16 matte) {
+  const hn::ScalableTag<uint8_t> d8;
+  const hn::ScalableTag<uint16_t> d;
+  const hn::ScalableTag<int16_t> di;
+  constexpr uint8_t a = 2 * kAlpha, b = a + 1;
+  alignas(16) static constexpr uint8_t kSpread[16] = {a,     b,     a,     b,     a,     b,     a,     b,
+                                                      a + 8, b + 8, a + 8, b + 8, a + 8, b + 8, a + 8, b + 8};
+  const auto alpha = hn::BitCast(d, hn::TableLookupBytes(hn::BitCast(d8, v), hn::LoadDup128(d8, kSpread)));
+  const auto opaque = hn::Set(d, kFullScale<uint16_t>);
+  const auto minusRest = hn::Sub(hn::Min(alpha, opaque), opaque), minusMatte = hn::Sub(hn::Zero(d), matte);
+  return hn::BitCast(d, hn::MulFixedPoint15(hn::BitCast(di, minusMatte), hn::BitCast(di, minusRest)));
+}
+
+template <size_t kAlpha>
+HWY_INLINE F32 MatteUnder(F32 v, F32 matte) {
+  return hn::Mul(matte, hn::Sub(hn::Set(hn::ScalableTag<float>(), 1.0f), hn::Broadcast<kAlpha>(v)));
 }
 
 template <class L>
-void SubtractMatte(const uint8_t* src, const uint8_t* matte, uint8_t* dst, size_t count) {
+void SubtractMatte(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
   using T = typename L::Type;
-  MergeRow<T>(src, matte, dst, count * kPixelBytes<L>, [](Full<T> v, Full<T> m) HWY_ATTR {
+  const auto color = LoadPattern<T>(matte);
+  MapBytes<T>(src, dst, count * kPixelBytes<L>, [&](Full<T> v) HWY_ATTR {
+    const auto m = MatteUnder<L::kAlpha>(v, color);
     if constexpr (sizeof(T) == 4)
       return WithAlphaOf<L>(v, hn::IfThenZeroElse(hn::Gt(m, v), hn::Sub(v, m)));
     else
-      return WithAlphaOf<L>(v, hn::SaturatedSub(v, m));
+      return hn::SaturatedSub(v, m);
   });
 }
 
@@ -209,14 +242,16 @@ void SelectPixels(const uint8_t* a, const uint8_t* b, const uint32_t* mask, uint
   constexpr size_t kBlock = kMaskPixels * kBytes, kVectorPixels = HWY_MAX_BYTES / kBytes;
   const hn::ScalableTag<uint32_t> d;
   const auto laneBits = hn::Load(d, kLaneBits.lanes);
-  MergeLoop<kBlock>(
-      a, b, dst, count * kBytes, [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t index) HWY_ATTR {
-        uint32_t bits = mask[index];
-        for (size_t i = 0; i < kBlock / HWY_MAX_BYTES; ++i, bits <<= kVectorPixels) {
-          const auto takeA = hn::TestBit(hn::Set(d, bits), laneBits);
-          StoreVector(hn::IfThenElse(takeA, LoadVector<uint32_t>(inA, i), LoadVector<uint32_t>(inB, i)), out, i);
-        }
-      });
+  // Where masks have registers of their own, loads under a mask wait for it; so it is made a vector.
+  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t index) HWY_ATTR {
+    uint32_t bits = mask[index];
+    for (size_t i = 0; i < kBlock / HWY_MAX_BYTES; ++i, bits <<= kVectorPixels) {
+      const auto takeA = hn::VecFromMask(d, hn::TestBit(hn::Set(d, bits), laneBits));
+      const auto fromA = LoadVector<uint32_t>(inA, i), fromB = LoadVector<uint32_t>(inB, i);
+      StoreVector(hn::Or(hn::And(takeA, fromA), hn::AndNot(takeA, fromB)), out, i);
+    }
+  };
+  MergeLoop<kBlock>(a, b, dst, count * kBytes, body);
 }
 
 }  // namespace
@@ -292,24 +327,27 @@ void ReplaceBits(const uint8_t* src, uint8_t* dst, size_t bytes, const PixelPatt
   }
 }
 
+// m (1 - a) as premultiplying rounds it: to nearest, ties up.
+template <class T>
+T MatteUnder(T alpha, T matte) {
+  if constexpr (sizeof(T) == 4) {
+    return matte * (1.0f - alpha);
+  } else {
+    constexpr uint64_t kMost = kFullScale<T>;
+    const uint64_t rest = alpha > kMost ? 0 : kMost - alpha;
+    return static_cast<T>((2 * matte * rest + kMost) / (2 * kMost));
+  }
+}
+
 template <class L>
-void MatteUnderInverse(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
+void SubtractMatte(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte) {
   using T = typename L::Type;
   T color[4];
   std::memcpy(color, matte.bytes, sizeof color);
   MapPixels<T, T>(src, dst, count, [&](const T* in, T* out) {
-    ForChannels([&](size_t k) { out[k] = color[k]; });
-    const T alpha = in[L::kAlpha];
-    out[L::kAlpha] = sizeof(T) == 2 && alpha > kFullScale<T> ? T{0} : static_cast<T>(kFullScale<T> - alpha);
-  });
-}
-
-template <class L>
-void SubtractMatte(const uint8_t* src, const uint8_t* matte, uint8_t* dst, size_t count) {
-  using T = typename L::Type;
-  MergePixels<T>(src, matte, dst, count, [](const T* in, const T* m, T* out) {
     ForChannels([&](size_t k) {
-      out[k] = k == L::kAlpha ? in[k] : m[k] > in[k] ? T{0} : static_cast<T>(in[k] - m[k]);
+      const T m = MatteUnder(in[L::kAlpha], color[k]);
+      out[k] = k == L::kAlpha ? in[k] : m > in[k] ? T{0} : static_cast<T>(in[k] - m);
     });
   });
 }
@@ -341,8 +379,7 @@ const GainKernels kGainPixel32f = VX_KERNEL_VARIANTS(GainAll32f);
 // clang-format on
 
 const MergeKernels kInvertAlpha[kDepthClasses][2] = VX_BY_LAYOUT(InvertAlpha);
-const MatteKernels kMatteUnderInverse[kDepthClasses][2] = VX_BY_LAYOUT(MatteUnderInverse);
-const MergeKernels kSubtractMatte[kDepthClasses][2] = VX_BY_LAYOUT(SubtractMatte);
+const MatteKernels kSubtractMatte[kDepthClasses][2] = VX_BY_LAYOUT(SubtractMatte);
 const KernelVariants<ReplaceKernel> kReplaceBits = VX_KERNEL_VARIANTS(ReplaceBits);
 
 const SelectKernels kSelectPixels4 = VX_KERNEL_VARIANTS(SelectPixels<4>);

@@ -38,12 +38,11 @@ using ReplaceKernel = void (*)(const uint8_t* src, uint8_t* dst, size_t bytes, c
                                const PixelPattern& mask);
 extern const KernelVariants<ReplaceKernel> kReplaceBits;
 
-// The matte's colour under the inverse of the alpha of `src`; in 15u, alpha above 32768 counts as 32768.
+// Each colour channel minus the matte's under the inverse of the pixel's alpha, premultiplied as rows are (see
+// convert/AlphaKernels.cpp); 0 where that is the larger one. In the matte, alpha is 0 and no 15u channel above 32768.
 using MatteKernel = void (*)(const uint8_t* src, uint8_t* dst, size_t count, const PixelPattern& matte);
 using MatteKernels = KernelVariants<MatteKernel>;
-extern const MatteKernels kMatteUnderInverse[kDepthClasses][2];
-// Colour of `src` minus that of `matte`, 0 where that is the larger one; the alpha of `src`.
-extern const MergeKernels kSubtractMatte[kDepthClasses][2];
+extern const MatteKernels kSubtractMatte[kDepthClasses][2];
 
 // For each pixel that of `a` where the mask's bit is set, that of `b` where it is clear. A word of the mask is 32
 // pixels, the first in its uppermost bit.

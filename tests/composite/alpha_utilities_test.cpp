@@ -10,6 +10,9 @@
 #include <functional>
 #include <iterator>
 #include <limits>
+#include <string>
+#include <tuple>
+#include <utility>
 #include <vector>
 
 #include "support/Arena.h"
@@ -193,8 +196,8 @@ TEST(AlphaUtilities, WholeDomains) {
 
 // ---- Arena ----
 
-void ExpectArena(ArenaCase arenaCase, bool longRows = true) {
-  if (longRows) arenaCase.widths.insert(arenaCase.widths.end(), {383, 384, 385, 773});
+void ExpectArena(ArenaCase arenaCase, bool addLongRows = true) {
+  if (addLongRows) arenaCase.widths.insert(arenaCase.widths.end(), {383, 384, 385, 773});
   EXPECT_TRUE(RunArena(arenaCase));
   arenaCase.widths = {1, 5, 33};
   arenaCase.heights = {65, 80};
@@ -270,6 +273,17 @@ TEST(AlphaUtilities, GainConvertsInAndOut) {
       }
 }
 
+TEST(AlphaUtilities, GainOfNothingFills) {
+  for (const F f : RasterFormats())
+    for (const float gain : {0.0f, 7.9e-6f, -1.0f, NAN}) {
+      Picture src(F::BGRA_4444_8u, 7, 3), want(f, 7, 3), got(f, 7, 3);
+      EXPECT_EQ(
+          VX_AlphaGain(src.frame.base, src.rowBytes, F::BGRA_4444_8u, got.frame.base, got.rowBytes, f, 7, 3, gain, 0),
+          VX_FillWithTransparentBlack(want.frame.base, want.rowBytes, 7, 3, f));
+      EXPECT_EQ(got.bytes, want.bytes) << FormatName(f) << " by " << gain;
+    }
+}
+
 TEST(AlphaUtilities, GainArena) {
   constexpr float kGains[] = {0.25f, 0.999f, 1.0f, 3.5f, std::numeric_limits<float>::infinity()};
   uint64_t count = 0;
@@ -301,61 +315,48 @@ TEST(AlphaUtilities, GainArena) {
 
 bool IsSelectable(F f) { return IsPixels(f) || f == kRgb10Format; }
 
-// The mask's last needed byte is the last one of its row.
-TEST(AlphaUtilities, MaskArena) {
-  int offset = 0;
-  for (const F to : FormatsThat(IsSelectable))
-    for (const F from : {to, F::UYVY_422_8u, F::V210_422_10u, F::PRGB_4444_32f, F::BGRX_4444_8u}) {
-      offset = (offset + 1) % 8;
-      const auto maskBytes = [=](int width) { return (offset + width + 7) / 8; };
-      ArenaCase arenaCase;
-      arenaCase.name = "VX_OneBitMaskComposite at bit " + std::to_string(offset);
-      arenaCase.sources = {from, to, F::BGRA_4444_8u};
-      arenaCase.destination = to;
-      arenaCase.sourceSize = [=](int source, ArenaSize size) {
-        return source == 2 ? ArenaSize{(maskBytes(size.width) + 3) / 4, size.height} : size;
-      };
-      const auto run = [=](const ArenaFrame& a, const ArenaFrame& b, const ArenaFrame& mask, const ArenaFrame& d) {
-        const uint8_t* bits = mask.Row(0) + 4 * mask.width - maskBytes(d.width);
-        return VX_OneBitMaskComposite(a.base, a.rowBytes, a.format, b.base, b.rowBytes, b.format, bits, mask.rowBytes,
-                                      offset, d.base, d.rowBytes, to, d.width, d.height, 2);
-      };
-      arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) { return run(s[0], s[1], s[2], d); };
-      ExpectArena(arenaCase);
-      arenaCase.destinationIsInput = true;
-      arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) { return run(s[0], d, s[2], d); };
-      ExpectArena(arenaCase);
+// The mask's last needed byte is the last one of its row. VX_ErrReserved1 if any pixel is not what its bit says.
+VX_Result ChooseAndCheck(const ArenaFrame& a, const ArenaFrame& b, const ArenaFrame& mask, const ArenaFrame& d,
+                         int offset) {
+  const F to = d.format;
+  const int maskBytes = (offset + d.width + 7) / 8, pixel = static_cast<int>(UnpaddedRowBytes(to, 1));
+  Picture fromA(to, d.width, d.height), fromB(to, d.width, d.height);
+  for (const auto& [image, copy] : {std::pair(&a, &fromA), std::pair(&b, &fromB)})
+    VX_Convert(image->base, image->rowBytes, image->format, copy->frame.base, copy->rowBytes, to, d.width, d.height, 2);
+  const uint8_t* bits = mask.Row(0) + 4 * mask.width - maskBytes;
+  const VX_Result result = VX_OneBitMaskComposite(a.base, a.rowBytes, a.format, b.base, b.rowBytes, to, bits,
+                                                  mask.rowBytes, offset, d.base, d.rowBytes, to, d.width, d.height, 2);
+  for (int y = 0; y < d.height; ++y)
+    for (int x = 0; x < d.width; ++x) {
+      const bool takesA = (bits[y * ptrdiff_t{mask.rowBytes} + (offset + x) / 8] & 0x80 >> (offset + x) % 8) != 0;
+      if (std::memcmp(d.Row(y) + pixel * x, (takesA ? fromA : fromB).frame.Row(y) + pixel * x, pixel))
+        return VX_ErrReserved1;
     }
+  return result;
 }
 
 TEST(AlphaUtilities, MaskChooses) {
-  constexpr int kWidth = 401, kHeight = 66, kMaskBytes = 60;
-  std::vector<uint8_t> mask(kMaskBytes * kHeight);
-  Random(5).Fill(mask.data(), mask.size());
   for (const F to : FormatsThat(IsSelectable))
-    for (const F from : {to, F::YUYV_422_8u_709, F::ARGB_4444_15u})
-      for (int offset = 0; offset < 8; ++offset) {
-        Picture a(from, kWidth, kHeight), b(to, kWidth, kHeight), dst(to, kWidth, kHeight),
-            converted(to, kWidth, kHeight);
-        Random random(static_cast<uint64_t>(offset));
-        FillSamples(a.bytes.data(), a.bytes.size(), from, Contents::Random, random);
-        FillSamples(b.bytes.data(), b.bytes.size(), to, Contents::Random, random);
-        ASSERT_EQ(
-            VX_Convert(a.bytes.data(), a.rowBytes, from, converted.bytes.data(), b.rowBytes, to, kWidth, kHeight, 3),
-            VX_Success);
-        ASSERT_EQ(VX_OneBitMaskComposite(a.bytes.data(), a.rowBytes, from, b.bytes.data(), b.rowBytes, to,
-                                         mask.data() + kMaskBytes * (kHeight - 1), -kMaskBytes, offset,
-                                         dst.bytes.data(), b.rowBytes, to, kWidth, kHeight, 3),
-                  VX_Success);
-        const size_t pixel = b.bytes.size() / kWidth / kHeight;
-        for (int y = 0; y < kHeight; ++y)
-          for (int x = 0; x < kWidth; ++x) {
-            const int bit = mask[static_cast<size_t>((kHeight - 1 - y) * kMaskBytes + (offset + x) / 8)] &
-                            (0x80 >> (offset + x) % 8);
-            const size_t at = static_cast<size_t>(y * kWidth + x) * pixel;
-            ASSERT_EQ(0, std::memcmp(&dst.bytes[at], bit ? &converted.bytes[at] : &b.bytes[at], pixel))
-                << FormatName(from) << " over " << FormatName(to) << ", bit " << offset << ", pixel " << x << ", " << y;
-          }
+    for (const F from : {to, F::UYVY_422_8u, F::V210_422_10u, F::PRGB_4444_32f})
+      for (int offset = from == to ? 0 : 6; offset < 8; ++offset) {
+        ArenaCase arenaCase;
+        arenaCase.name = "VX_OneBitMaskComposite at bit " + std::to_string(offset);
+        arenaCase.sources = {from, F::BGRA_4444_8u, to};
+        arenaCase.destination = to;
+        arenaCase.widths = {1, 2, 7, 8, 9, 23, 31, 32, 33, 64, 129, 384, 385, 773};
+        arenaCase.sourceSize = [=](int source, ArenaSize size) {
+          return source == 1 ? ArenaSize{((offset + size.width + 7) / 8 + 3) / 4, size.height} : size;
+        };
+        arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) {
+          return ChooseAndCheck(s[0], s[2], s[1], d, offset);
+        };
+        ExpectArena(arenaCase, false);
+        arenaCase.sources.pop_back();
+        arenaCase.destinationIsInput = true;
+        arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& d) {
+          return ChooseAndCheck(s[0], d, s[1], d, offset);
+        };
+        ExpectArena(arenaCase, false);
       }
 }
 
@@ -418,90 +419,76 @@ TEST(AlphaUtilities, SpecialFloats) {
 // Nothing is touched, and the first reason counts.
 TEST(AlphaUtilities, Refusals) {
   constexpr F kDv = F::NTSCDV25, k420 = F::YUV_420_MPEG2_FRAME, kBgra = F::BGRA_4444_8u, kRgba10 = FromBits(0x44);
-  struct Size {
-    int width, height;
-    VX_Result expected;
+  const uint8_t green[4] = {};
+  const auto gain = [](auto s, F from, auto d, F to, int w, int h, float by) {
+    return VX_AlphaGain(s, 64, from, d, 64, to, w, h, by, 0);
   };
-  constexpr Size kSizes[] = {{0, 5, VX_Success},
-                             {5, 0, VX_Success},
-                             {-1, 5, VX_ErrArgumentOutOfRange},
-                             {5, INT_MIN, VX_ErrArgumentOutOfRange},
-                             {INT_MAX, 1, VX_ErrArgumentOutOfRange},
-                             {1 << 29, 2, VX_ErrArgumentOutOfRange}};
-  const uint8_t matte[16] = {};
-  struct Call {
-    const char* name;
-    std::function<VX_Result(const void* s, void* d, F f, int w, int h)> run;
-    VX_Result badFormat;
-    std::vector<F> refused;
+  const auto mask = [](auto s, F a, F b, const void* bits, int offset, auto d, F f, int w, int h) {
+    return VX_OneBitMaskComposite(s, 64, a, s, 64, b, bits, 8, offset, d, 64, f, w, h, 0);
   };
-  const std::vector<Call> calls = {
-      {"gain to",
-       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, kBgra, d, 64, f, w, h, 1, 0); },
-       VX_ErrUnsupportedDestinationFormat,
-       {kDv, k420}},
-      {"gain from",
-       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, f, d, 64, kBgra, w, h, 1, 0); },
-       VX_ErrUnsupportedFormat,
-       {kDv, k420}},
-      {"gain 0 from",
-       [](auto s, auto d, F f, int w, int h) { return VX_AlphaGain(s, 64, f, d, 64, kBgra, w, h, f == kBgra, 0); },
-       VX_ErrUnsupportedFormat,
-       {kDv, k420}},
-      {"invert",
-       [](auto s, auto d, F f, int w, int h) { return VX_InvertAlpha(s, 64, d, 64, f, w, h); },
-       VX_ErrUnsupportedFormat,
-       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10}},
-      {"set",
-       [](auto s, auto d, F f, int w, int h) { return VX_CopyAndSetAlpha(s, 64, d, 64, f, w, h, 1); },
-       VX_ErrFormatNotHandled,
-       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10}},
-      {"matte",
-       [&](auto s, auto d, F f, int w, int h) {
-         return VX_UnPremultiplyAgainstMatteColor(s, 64, d, 64, f, w, h, matte, kBgra, 0);
-       },
-       VX_ErrUnsupportedFormat,
-       {F::Invalid, kDv, k420, F::VUYA_4444_8u, F::BGRX_4444_8u, F::XRGB_4444_32f, kRgb10Format}},
-      {"mask",
-       [](auto s, auto d, F f, int w, int h) {
-         return VX_OneBitMaskComposite(s, 64, kBgra, s, 64, kBgra, s, 8, 0, d, 64, f, w, h, 0);
-       },
-       VX_ErrUnsupportedDestinationFormat,
-       {F::Invalid, kDv, k420, F::UYVY_422_8u, F::V210_422_10u, F::UYVY_422_32f}},
+  const auto matted = [](auto s, auto d, F f, int w, int h, const void* color, F colorFormat) {
+    return VX_UnPremultiplyAgainstMatteColor(s, 64, d, 64, f, w, h, color, colorFormat, 0);
   };
-  for (const Call& call : calls) {
-    for (const Size& size : kSizes)
-      ExpectRefusal(call.name, size.expected, [&](void* p) { return call.run(p, p, kBgra, size.width, size.height); });
-    for (const F f : call.refused)
-      ExpectRefusal(call.name, call.badFormat, [&](void* p) { return call.run(p, p, f, -1, 5); });
-    ExpectRefusal(call.name, VX_ErrNullSource, [&](void* p) { return call.run(nullptr, p, kBgra, 5, 5); });
-    ExpectRefusal(call.name, VX_ErrNullDestination, [&](void* p) { return call.run(p, nullptr, kBgra, 5, 5); });
-  }
-  const auto mask = [](void* p, F a, F b, const void* bits, int offset) {
-    return VX_OneBitMaskComposite(p, 64, a, p, 64, b, bits, 8, offset, p, 64, kBgra, 5, 5, 0);
-  };
-  for (const int offset : {-1, 8, INT_MIN, INT_MAX})
-    ExpectRefusal("bit offset", VX_ErrArgumentOutOfRange, [&](void* p) { return mask(p, kBgra, kBgra, p, offset); });
-  ExpectRefusal("no mask", VX_ErrNullSource, [&](void* p) { return mask(p, kBgra, kBgra, nullptr, 0); });
-  ExpectRefusal("4:2:0 A", VX_ErrUnsupportedFormat, [&](void* p) { return mask(p, k420, kBgra, p, 0); });
-  ExpectRefusal("nameless B", VX_ErrFailed, [&](void* p) { return mask(p, kBgra, kRgba10, p, 0); });
-  const auto matted = [](void* p, F f, const void* color, F colorFormat) {
-    return VX_UnPremultiplyAgainstMatteColor(p, 64, p, 64, f, 5, 5, color, colorFormat, 0);
-  };
-  ExpectRefusal("matte depth", VX_ErrFormatNotHandled, [&](void* p) { return matted(p, kRgba10, p, kRgba10); });
-  ExpectRefusal("no matte", VX_ErrNullSource, [&](void* p) { return matted(p, kBgra, nullptr, F::VUYA_4444_8u); });
-  ExpectRefusal("DV matte", VX_ErrUnsupportedFormat, [&](void* p) { return matted(p, kBgra, p, kDv); });
   const auto setAll = [](void* p, uint32_t w, uint32_t h, int rowBytes) {
     return VX_SetAlphaChannel(w, h, p, rowBytes, kBgra, true);
   };
-  ExpectRefusal("empty", VX_Success, [&](void* p) { return setAll(p, 0, 5, 64); });
-  ExpectRefusal("empty", VX_Success, [&](void* p) { return setAll(p, 5, 0, 64); });
-  for (const uint32_t huge : {0x20000000u, 0x80000000u, UINT_MAX}) {
-    ExpectRefusal("too wide", VX_ErrFailed, [&](void* p) { return setAll(p, huge, 1, 64); });
-    ExpectRefusal("too high", VX_ErrFailed, [&](void* p) { return setAll(p, 1, huge | 0x80000000u, 4); });
+  using Call = std::function<VX_Result(const void* s, void* d, F f, int w, int h)>;
+  struct {
+    VX_Result badFormat;
+    std::vector<F> refused;
+    Call call;
+  } const calls[] = {
+      {VX_ErrUnsupportedDestinationFormat,
+       {kDv, k420},
+       [&](auto s, auto d, F f, int w, int h) { return gain(s, kBgra, d, f, w, h, 1); }},
+      {VX_ErrUnsupportedFormat,
+       {kDv, k420},
+       [&](auto s, auto d, F f, int w, int h) { return gain(s, f, d, kBgra, w, h, f == kBgra); }},
+      {VX_ErrUnsupportedFormat,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10},
+       [](auto s, auto d, F f, int w, int h) { return VX_InvertAlpha(s, 64, d, 64, f, w, h); }},
+      {VX_ErrFormatNotHandled,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, kRgb10Format, kRgba10},
+       [](auto s, auto d, F f, int w, int h) { return VX_CopyAndSetAlpha(s, 64, d, 64, f, w, h, 1); }},
+      {VX_ErrUnsupportedFormat,
+       {F::Invalid, kDv, k420, F::VUYA_4444_8u, F::BGRX_4444_8u, F::XRGB_4444_32f, kRgb10Format},
+       [&](auto s, auto d, F f, int w, int h) { return matted(s, d, f, w, h, green, kBgra); }},
+      {VX_ErrUnsupportedDestinationFormat,
+       {F::Invalid, kDv, k420, F::UYVY_422_8u, F::V210_422_10u, F::UYVY_422_32f},
+       [&](auto s, auto d, F f, int w, int h) { return mask(s, kBgra, kBgra, s, 0, d, f, w, h); }},
+  };
+  for (const auto& [badFormat, refused, call] : calls) {
+    const std::string name = "call " + std::to_string(&call - &calls[0].call);
+    for (const F f : refused) ExpectRefusal(name, badFormat, [&](void* p) { return call(p, p, f, -1, 5); });
+    for (const auto& [w, h, expected] : {std::tuple(0, 5, VX_Success),
+                                         {5, 0, VX_Success},
+                                         {-1, 5, VX_ErrArgumentOutOfRange},
+                                         {5, INT_MIN, VX_ErrArgumentOutOfRange},
+                                         {INT_MAX, 1, VX_ErrArgumentOutOfRange},
+                                         {1 << 29, 2, VX_ErrArgumentOutOfRange}})
+      ExpectRefusal(name, expected, [&](void* p) { return call(p, p, kBgra, w, h); });
+    ExpectRefusal(name, VX_ErrNullSource, [&](void* p) { return call(nullptr, p, kBgra, 5, 5); });
+    ExpectRefusal(name, VX_ErrNullDestination, [&](void* p) { return call(p, nullptr, kBgra, 5, 5); });
   }
-  ExpectRefusal("short rows", VX_ErrFailed, [&](void* p) { return setAll(p, 5, 2, 19); });
-  ExpectRefusal("null", VX_ErrFailed, [&](void*) { return setAll(nullptr, 5, 2, 20); });
+  const std::pair<VX_Result, std::function<VX_Result(void*)>> others[] = {
+      {VX_ErrArgumentOutOfRange, [&](void* p) { return mask(p, kBgra, kBgra, p, -1, p, kBgra, 5, 5); }},
+      {VX_ErrArgumentOutOfRange, [&](void* p) { return mask(p, kBgra, kBgra, p, 8, p, kBgra, 5, 5); }},
+      {VX_ErrNullSource, [&](void* p) { return mask(p, kBgra, kBgra, nullptr, 0, p, kBgra, 5, 5); }},
+      {VX_ErrUnsupportedFormat, [&](void* p) { return mask(p, k420, kBgra, p, 0, p, kBgra, 5, 5); }},
+      {VX_ErrFailed, [&](void* p) { return mask(p, kBgra, kRgba10, p, 0, p, kBgra, 5, 5); }},
+      {VX_ErrFormatNotHandled, [&](void* p) { return matted(p, p, kRgba10, 5, 5, p, kRgba10); }},
+      {VX_ErrNullSource, [&](void* p) { return matted(p, p, kBgra, 5, 5, nullptr, F::VUYA_4444_8u); }},
+      {VX_ErrUnsupportedFormat, [&](void* p) { return matted(p, p, kBgra, 5, 5, p, kDv); }},
+      {VX_Success, [&](void* p) { return setAll(p, 0, 5, 64); }},
+      {VX_Success, [&](void* p) { return setAll(p, 5, 0, 64); }},
+      {VX_ErrFailed, [&](void* p) { return setAll(p, 0x20000000, 1, 64); }},
+      {VX_ErrFailed, [&](void* p) { return setAll(p, UINT_MAX, 1, 64); }},
+      {VX_ErrFailed, [&](void* p) { return setAll(p, 1, 0x80000000, 4); }},
+      {VX_ErrFailed, [&](void* p) { return setAll(p, 5, 2, 19); }},
+      {VX_ErrFailed, [&](void*) { return setAll(nullptr, 5, 2, 20); }},
+  };
+  for (const auto& [expected, call] : others)
+    ExpectRefusal("case " + std::to_string(&call - &others[0].second), expected, call);
 }
 
 // Rows that need memory: 4:2:2 is converted row by row.
