@@ -23,12 +23,14 @@ extern "C" {
 /* ---- Compositing and blend modes --------------------------------------------------------------------------------- */
 
 /* The order is the contract; it is alphabetical but for the last two. */
-#define VX_BLEND_MODES(X)                                                                                              \
-  X(Color, 0)                                                                                                          \
-  X(ColorBurn, 1) X(ColorDodge, 2) X(Darken, 3) X(DarkerColor, 4) X(Difference, 5) X(Dissolve, 6) X(Exclusion, 7)      \
-      X(HardLight, 8) X(HardMix, 9) X(Hue, 10) X(Lighten, 11) X(LighterColor, 12) X(LinearBurn, 13) X(LinearDodge, 14) \
-          X(LinearLight, 15) X(Luminosity, 16) X(Multiply, 17) X(Normal, 18) X(Overlay, 19) X(PinLight, 20)            \
-              X(Saturation, 21) X(Screen, 22) X(SoftLight, 23) X(VividLight, 24) X(Subtract, 25) X(Divide, 26)
+#define VX_BLEND_MODES(X)                                                                                      \
+  X(Color, 0)                                                                                                  \
+  X(ColorBurn, 1)                                                                                              \
+  X(ColorDodge, 2)                                                                                             \
+  X(Darken, 3) X(DarkerColor, 4) X(Difference, 5) X(Dissolve, 6) X(Exclusion, 7) X(HardLight, 8) X(HardMix, 9) \
+      X(Hue, 10) X(Lighten, 11) X(LighterColor, 12) X(LinearBurn, 13) X(LinearDodge, 14) X(LinearLight, 15)    \
+          X(Luminosity, 16) X(Multiply, 17) X(Normal, 18) X(Overlay, 19) X(PinLight, 20) X(Saturation, 21)     \
+              X(Screen, 22) X(SoftLight, 23) X(VividLight, 24) X(Subtract, 25) X(Divide, 26)
 #ifdef __cplusplus
 enum class VX_BlendMode : int32_t {
 #define VX_BLEND_MODE_ENUMERATOR(name, value) name = value,
@@ -69,20 +71,53 @@ VX_API VX_Result VX_CompositeToBlackAndTestSourceAlpha(const void* src, int32_t 
 
 /* ---- Alpha ------------------------------------------------------------------------------------------------------- */
 
+/* Opaque alpha is 255 in 8u, 32768 in 15u, 1.0 in 32f. */
+
+/* Whether an opacity changes nothing: within 8e-6 of 1, in the modes Dissolve and Normal only. */
 VX_API bool VX_IsOpacityNOP(int32_t blendMode, float opacity) VX_NOEXCEPT;
+
+/* Scales alpha, and with premultiplied alpha the colour too (8-bit Y'CbCr about video black). 8u results are rounded as
+ * the processor is set to (to nearest, ties to even) and saturated, so a gain above 1 is clamped; 32f results are not
+ * clamped. A gain below 8e-6, a negative one and NaN give VX_FillWithTransparentBlack and its result. Done in the
+ * destination's own format if that has straight or premultiplied alpha in 8u or 32f, else in VUYP_4444_32f (Y'CbCr,
+ * precision hint above 2), VUYP_4444_8u (Y'CbCr), BGRA_4444_32f (32f RGB) or BGRA_4444_8u (any other, 15u too). The
+ * precision hint is also the render quality of the row conversions.
+ * VX_ErrUnsupportedFormat: the source is no raster format. VX_ErrUnsupportedDestinationFormat: likewise the
+ * destination. */
 VX_API VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                               int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height, float gain,
                               int32_t precisionHint) VX_NOEXCEPT;
+
+/* Sets alpha to opaque or to 0, in place; for BGRA_4444_8u, _15u, _32f and _32f_Linear, ARGB_4444_32f and _32f_Linear,
+ * VUYA_4444_8u and _32f. VX_ErrFormatNotHandled: any other format. VX_ErrFailed: a null base, rows that overlap, a size
+ * that cannot be expressed. */
 VX_API VX_Result VX_SetAlphaChannel(uint32_t width, uint32_t height, void* base, int32_t rowBytes,
                                     VX_PixelFormat format, bool opaque) VX_NOEXCEPT;
+/* Writes opaque minus the source's alpha into the destination, whose colours stay as they are. A 15u alpha above 32768
+ * wraps around. VX_ErrUnsupportedFormat: not 4:4:4:4 with an alpha channel (an ignored one is one) in 8u, 15u or 32f.
+ */
 VX_API VX_Result VX_InvertAlpha(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
                                 VX_PixelFormat format, int32_t width, int32_t height) VX_NOEXCEPT;
+/* Copies the colours and sets alpha to a constant of 0..1: in 8u and 15u rounded to nearest and clamped, NaN as 0; in
+ * 32f the value itself, whatever it is. Row bytes are rounded toward zero to a multiple of 4. VX_ErrFormatNotHandled:
+ * formats that VX_InvertAlpha refuses. */
 VX_API VX_Result VX_CopyAndSetAlpha(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
                                     VX_PixelFormat format, int32_t width, int32_t height, float alpha) VX_NOEXCEPT;
+/* Takes out a matte colour M that was mixed into the colour: each colour channel C becomes C - M (1 - a), rounded as
+ * premultiplying is, or 0 where that is negative; alpha is copied. `matteColor` is one pixel of its own format, whose
+ * alpha counts only where its conversion to `format` makes it count. A 15u alpha above 32768 is opaque.
+ * VX_ErrUnsupportedFormat: not RGB 4:4:4:4 with straight or premultiplied alpha. VX_ErrFormatNotHandled: such a format
+ * in a depth other than 8u, 15u and 32f. Otherwise what VX_Convert says about the matte. */
 VX_API VX_Result VX_UnPremultiplyAgainstMatteColor(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
                                                    VX_PixelFormat format, int32_t width, int32_t height,
                                                    const void* matteColor, VX_PixelFormat matteFormat,
                                                    int32_t conversionOption) VX_NOEXCEPT;
+/* Takes each pixel from `a` where its bit in the mask is set, from `b` where it is clear. A mask row holds one bit for
+ * each pixel, uppermost first; pixel 0 is bit 7 - maskBitOffset of its first byte. The mask's rows belong to the
+ * destination's stored rows and may have any signed row bytes; no byte beyond a row's last bit is read.
+ * `conversionOption` is the render quality with which a and b are converted to the destination's format.
+ * VX_ErrUnsupportedDestinationFormat: not pixels of 4, 8 or 16 bytes (4:4:4:4, or 10-bit RGB).
+ * VX_ErrArgumentOutOfRange: a bit offset outside 0..7 too. VX_ErrNullSource: no mask, too. */
 VX_API VX_Result VX_OneBitMaskComposite(const void* a, int32_t aRowBytes, VX_PixelFormat aFormat, const void* b,
                                         int32_t bRowBytes, VX_PixelFormat bFormat, const void* mask,
                                         int32_t maskRowBytes, int32_t maskBitOffset, void* dst, int32_t dstRowBytes,
