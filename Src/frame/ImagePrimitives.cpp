@@ -6,6 +6,7 @@
 
 #include "frame/Bands.h"
 #include "frame/Lifecycle.h"
+#include "frame/Platform.h"
 #include "frame/StreamCopy.h"
 
 #undef HWY_TARGET_INCLUDE
@@ -162,6 +163,32 @@ constinit const Kernels<uint8_t*, size_t, const Pattern&, const Pattern&> kSetMa
 constinit const Kernels<const uint8_t*, uint8_t*, size_t, const Pattern&, const Scale&> kMultiplyRow =
     VX_KERNEL_VARIANTS(MultiplyRow);
 
+// The processor's string store, which needs no vectors, fills whole cache lines without reading them first and goes
+// past the cache by itself. Short runs are over before it is at full speed.
+constexpr size_t kStringStoreFrom = 16 * 1024;
+
+bool HasFastStringStore() {
+  static const bool has = [] {
+    const auto& cpuid = platform::kProcessor.cpuid;
+    return cpuid(0, 0).eax >= 7 && (cpuid(7, 0).ebx >> 9 & 1) != 0;
+  }();
+  return has;
+}
+
+bool RepeatsEvery8(const Pattern& pattern) { return std::memcmp(pattern.bytes, pattern.bytes + 8, 8) == 0; }
+
+// For at least a cache line; the ends overlap the aligned middle.
+void FillRowByString(uint8_t* dst, size_t bytes, const Pattern& pattern, bool) {
+  const size_t skip = -reinterpret_cast<uintptr_t>(dst) & 63;
+  std::memcpy(dst, pattern.bytes, 64);
+  std::memcpy(dst + bytes - 8, pattern.bytes + bytes % 8, 8);
+  uint64_t word;
+  std::memcpy(&word, pattern.bytes + skip % 8, 8);
+  uint8_t* middle = dst + skip;
+  size_t count = (bytes - skip) / 8;
+  asm volatile("rep stosq" : "+D"(middle), "+c"(count) : "a"(word) : "memory");
+}
+
 // Below it a fan-out costs more than it saves.
 constexpr size_t kBandsFrom = 256 * 1024;
 
@@ -201,10 +228,17 @@ Status FillWithPixel(const T (&pixel)[N], T* dst, ptrdiff_t rowBytes, int width,
   if (const Status status = Check(dst, rowBytes, width, height, sizeof pixel); status != Status::Ok) return status;
   const size_t bytes = static_cast<size_t>(width) * sizeof pixel, bytesOfAll = bytes * static_cast<size_t>(height);
   const Pattern pattern = MakePattern(pixel);
-  const bool stream = bytesOfAll >= std::max<size_t>(kBandsFrom, UnifiedCache().bytes / 2);
-  const auto fillRow = kFillRow[ActiveKernelVariant()];
+  const KernelVariant variant = ActiveKernelVariant();
+  const bool withoutGaps = rowBytes == static_cast<ptrdiff_t>(bytes);
+  const bool byString = variant != KernelVariant::Plain && (withoutGaps ? bytesOfAll : bytes) >= kStringStoreFrom &&
+                        RepeatsEvery8(pattern) && HasFastStringStore();
+  const bool stream = !byString && bytesOfAll >= std::max<size_t>(kBandsFrom, UnifiedCache().bytes / 2);
+  const auto fillRow = byString ? &FillRowByString : kFillRow[variant];
   const auto rows = [&](int first, int end) {
-    for (int r = first; r < end; ++r) fillRow(RowAt(dst, rowBytes, r), bytes, pattern, stream);
+    if (withoutGaps)
+      fillRow(RowAt(dst, rowBytes, first), bytes * static_cast<size_t>(end - first), pattern, stream);
+    else
+      for (int r = first; r < end; ++r) fillRow(RowAt(dst, rowBytes, r), bytes, pattern, stream);
     if (stream) StreamFence();
   };
   if (bytesOfAll < kBandsFrom)

@@ -279,6 +279,23 @@ TEST(Fills, DvFramesAreWhole) {
   }
 }
 
+// Long runs of bytes, with gaps between the rows and without, from every alignment.
+TEST(Fills, LongRows) {
+  for (const F format : {F::BGRA_4444_8u, F::YUYV_422_8u, F::ARGB_4444_15u, F::V210_422_10u, F::BGRA_4444_32f})
+    for (const int gap : {0, 36})
+      for (size_t offset = 0; offset < 64; offset += format == F::BGRA_4444_8u ? 1 : 9) {
+        const int width = 4300 + static_cast<int>(offset), height = 5;
+        const Bytes unit = UnitByName(FormatName(format), false, true);
+        const size_t rowBytes = static_cast<size_t>(UnpaddedRowBytes(format, width)), pitch = rowBytes + gap;
+        Bytes picture(pitch * height + 128, 0x77), expected = picture;
+        for (size_t row = 0; row < height; ++row)
+          for (size_t i = 0; i < rowBytes; ++i) expected[offset + row * pitch + i] = unit[i % unit.size()];
+        ASSERT_EQ(VX_FillWithOpaqueBlack(&picture[offset], static_cast<int32_t>(pitch), width, height, format),
+                  VX_Success);
+        ASSERT_TRUE(picture == expected) << FormatName(format) << " " << width << " at " << offset << " gap " << gap;
+      }
+}
+
 TEST(Fills, GiantStrides) {
   for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
     const ArenaFrame giant = GiantStrideFrame(F::ARGB_4444_8u, 37, 7, rowBytes);
