@@ -4,8 +4,8 @@
 #include <limits>
 
 #include "composite/BlendKernels.h"
+#include "composite/PlainBlend.h"
 #include "composite/RowJob.h"
-#include "convert/PlainPixels.h"
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
 #include "frame/RuntimeRandom.h"
@@ -80,26 +80,33 @@ VX_Result Blend(const BlendJob& blend, const BlendKernels& kernels) noexcept {
 
 // ---- Dissolve
 
-// Copies the source pixel with a probability of its alpha times `opacity`, else the background's. kPixel is the size of
-// a pixel. kPlaced draws for every pixel, needed or not, so that a pixel's place decides what it gets.
+// Copies the source pixel with a probability of its alpha times `opacity`, else the background's. kPixel is
+// the size of a pixel. kPlaced draws for every pixel, needed or not, so that a pixel's place decides what it gets.
+// Without branches, which nothing could predict.
 template <size_t kPixel, bool kPlaced>
-void DissolveRow(const RowSpan& span, size_t alphaAt, float opacity, RandomSequence& sequence) noexcept {
-  for (size_t at = 0; at < span.count * kPixel; at += kPixel) {
-    const uint8_t *const s = span.src[0] + at, *const d = span.src[1] + at;
-    float alpha = s[alphaAt] * k8uTo32f;
-    if constexpr (kPixel == 16) std::memcpy(&alpha, s + alphaAt, sizeof alpha);
+void DissolveRow(const RowSpan& span, size_t alphaAt, float opacity, RandomSequence& randomSequence) noexcept {
+  const uint8_t *const src = span.src[0], *const background = span.src[1];
+  uint8_t* const dst = span.dst;
+  const size_t end = span.count * kPixel;
+  RandomSequence sequence = randomSequence;
+  for (size_t at = 0; at < end; at += kPixel) {
+    float alpha = src[at + alphaAt] * k8uTo32f;
+    if constexpr (kPixel == 16) std::memcpy(&alpha, src + at + alphaAt, sizeof alpha);
     const float p = alpha * opacity;
+    // More than certain is certain; NaN counts as negative.
+    const int n = static_cast<int>(plain::Min(plain::Max(p, -1), 1) * 32767.0f);
     const bool isNothing = std::fabs(p) < kAlphaGuard;
-    // More than certain is certain; what is no number is converted like a negative one.
-    const int n = p >= 1 ? 32767 : p > -1 ? static_cast<int>(p * 32767.0f) : -1;
     RandomSequence next = sequence;
     const int r = next.Next();
-    const bool draws = !isNothing && n >= 0;
-    if (kPlaced || draws) sequence = next;
-    uint8_t pixel[kPixel];
-    std::memcpy(pixel, isNothing || (n >= 0 && r > n) ? d : s, kPixel);
-    std::memcpy(span.dst + at, pixel, kPixel);
+    if (kPlaced || (!isNothing & (n >= 0))) sequence = next;
+    const uint32_t fromBackground = 0u - static_cast<uint32_t>(isNothing | ((n >= 0) & (r > n)));
+    uint32_t s[kPixel / 4], d[kPixel / 4];
+    std::memcpy(s, src + at, kPixel);
+    std::memcpy(d, background + at, kPixel);
+    for (size_t i = 0; i < kPixel / 4; ++i) d[i] = (d[i] & fromBackground) | (s[i] & ~fromBackground);
+    std::memcpy(dst + at, d, kPixel);
   }
+  randomSequence = sequence;
 }
 
 template <size_t kPixel>
