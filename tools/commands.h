@@ -14,5 +14,7 @@ void AddRotateCommand(CLI::App& app);
 void AddFillCommand(CLI::App& app);
 void AddDissolveCommand(CLI::App& app);
 void AddColorCommand(CLI::App& app);
+void AddCompositeCommand(CLI::App& app);
+void AddBlendSheetCommand(CLI::App& app);
 
 }  // namespace tool

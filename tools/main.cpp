@@ -25,6 +25,8 @@ void AddCommands(CLI::App& app) {
   tool::AddFillCommand(app);
   tool::AddDissolveCommand(app);
   tool::AddColorCommand(app);
+  tool::AddCompositeCommand(app);
+  tool::AddBlendSheetCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".

@@ -55,7 +55,26 @@ VX_API VX_Result VX_Composite(const void* src, int32_t srcRowBytes, VX_PixelForm
                               int32_t backgroundRowBytes, VX_PixelFormat backgroundFormat, void* dst,
                               int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                               float opacity, int32_t conversionOption, bool flag) VX_NOEXCEPT;
-/* The same through one of the VX_BLEND_MODES. A mode outside the list is VX_ErrFormatNotHandled. */
+/* The same through one of the VX_BLEND_MODES; Normal is VX_Composite itself. docs/blending.md has the formula of each.
+ *
+ * Pixels are blended as BGRA_4444_32f with straight alpha; as = source alpha x opacity, ab = background alpha:
+ *
+ *   ao = ab + as - ab as,  t = as / ao,  colour = (1 - t) d + t ((1 - ab) s + ab B(s, d))
+ *
+ * where B is the mode's function, and colour 0 where |ao| < 8e-6. Only some modes clamp, so float results may leave
+ * 0..1 and integer ones saturate. DarkerColor and LighterColor take a pixel as a whole by its luma, with the weights of
+ * BT.709 in rows of more than 720 pixels and those of BT.601 otherwise; ties keep the background.
+ *
+ * Dissolve mixes nothing: a pixel with as >= 8e-6 is the source's, its own alpha included, with a probability of as,
+ * else the background's. Up to 64 rows draw from the generator of the C run-time library, one value for each pixel that
+ * needs one; more than one row seed it with 1 first, one row goes on with the calling thread's. In taller pictures the
+ * pixel in stored row r, column x of the destination takes value r x width + x of the sequence seeded with 1.
+ *
+ * Opacities outside 0..1 are used as they are, NaN counts as 0. A NaN colour stays in its channel in the modes that
+ * work channel by channel, a NaN alpha spreads over its pixel; clamping takes a NaN for its lower limit.
+ *
+ * In this order: VX_ErrUnsupportedFormat and VX_ErrUnsupportedDestinationFormat as above, VX_ErrFormatNotHandled for a
+ * mode outside the list and for formats that BGRA_4444_32f cannot be had from or made into. */
 VX_API VX_Result VX_CompositeWithBlendMode(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat,
                                            const void* background, int32_t backgroundRowBytes,
                                            VX_PixelFormat backgroundFormat, void* dst, int32_t dstRowBytes,

@@ -1,0 +1,72 @@
+#include "blend.h"
+
+#include <algorithm>
+#include <cctype>
+#include <vector>
+
+#include "convert_picture.h"
+#include "format_catalogue.h"
+#include "nearest_name.h"
+#include "tool_error.h"
+
+namespace tool {
+namespace {
+
+bool SameIgnoringCase(const std::string& a, const std::string& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](unsigned char x, unsigned char y) { return std::tolower(x) == std::tolower(y); });
+}
+
+// The stretch of one direction in which both pictures have pixels.
+struct Overlap {
+  int front, back, length;
+};
+
+Overlap OverlapOf(int frontLength, int backLength, int offset) {
+  const int64_t first = std::max(0, offset), end = std::min<int64_t>(int64_t{offset} + frontLength, backLength);
+  return {static_cast<int>(first - offset), static_cast<int>(first),
+          static_cast<int>(std::max<int64_t>(end - first, 0))};
+}
+
+// The first stored pixel of a rectangle.
+std::byte* FirstPixel(const Picture& picture, int x, int y, int height) {
+  return picture.Row(picture.IsBottomUp() ? y + height - 1 : y) + TightRowBytes(picture.Format(), x);
+}
+
+}  // namespace
+
+std::span<const BlendModeEntry> BlendModes() {
+#define VX_BLEND_MODE_ENTRY(name, value) {VX_BlendMode::name, #name},
+  static constexpr BlendModeEntry kModes[] = {VX_BLEND_MODES(VX_BLEND_MODE_ENTRY)};
+#undef VX_BLEND_MODE_ENTRY
+  return kModes;
+}
+
+VX_BlendMode ParseBlendMode(const std::string& name) {
+  std::vector<std::string> names;
+  for (const BlendModeEntry& entry : BlendModes()) {
+    if (SameIgnoringCase(name, entry.name)) return entry.mode;
+    names.push_back(entry.name);
+  }
+  throw ToolError("unknown blend mode \"" + name + "\"; did you mean " + NearestNames(name, names) +
+                  "? (\"vexel composite --help\" lists all)");
+}
+
+Picture BlendPictures(const Picture& back, const Picture& front, const BlendOptions& options) {
+  const bool isDeep = !Is8Bit(back.Format()) || !Is8Bit(front.Format());
+  const VX_PixelFormat format = isDeep ? VX_PixelFormat::BGRA_4444_32f : VX_PixelFormat::BGRA_4444_8u;
+  Picture result = ConvertPicture(back, format, {});
+  const Picture source = ConvertPicture(front, format, {});
+  const Overlap x = OverlapOf(source.Width(), result.Width(), options.x),
+                y = OverlapOf(source.Height(), result.Height(), options.y);
+  if (x.length == 0 || y.length == 0) return result;
+  std::byte* const target = FirstPixel(result, x.back, y.back, y.length);
+  const VX_Result code =
+      VX_CompositeWithBlendMode(FirstPixel(source, x.front, y.front, y.length), source.RowBytes(), format, target,
+                                result.RowBytes(), format, target, result.RowBytes(), format, x.length, y.length,
+                                options.opacity, static_cast<int32_t>(options.mode), 3, false);
+  if (code != VX_Success) throw ToolError(std::string("cannot blend the pictures: ") + VX_ResultName(code));
+  return result;
+}
+
+}  // namespace tool
