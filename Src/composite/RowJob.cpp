@@ -49,14 +49,17 @@ bool RowJob::TargetIsASource() const noexcept {
 
 void RowJob::Layout() noexcept {
   int64_t bytes = UnpaddedRowBytes(mTarget.format, mWidth);
-  bool whole = mTarget.converts && !mTarget.converter.IsPointWise();
+  bool whole = mTarget.converts && !mTarget.converter.IsPointWise(), converts = mTarget.converts;
   for (int i = 0; i < mSourceCount; ++i) {
     Side& side = mSources[i];
     side.upsideDown = VX_IsOriginTopLeft(side.format) != VX_IsOriginTopLeft(mTarget.format);
     bytes += UnpaddedRowBytes(side.format, mWidth);
     whole |= side.converts && !side.converter.IsPointWise();
+    converts |= side.converts;
   }
-  mBlock = whole ? mWidth : std::min<int32_t>(mWidth, kChainBlock);
+  // Small pixels gain from longer blocks; much longer ones keep reads and writes to memory too far apart.
+  const bool isLong = !converts && mTarget.bytesPerSixPixels <= 4 * kBlockMultiple;
+  mBlock = whole ? mWidth : std::min(mWidth, static_cast<int32_t>(isLong ? 2 * kChainBlock : kChainBlock));
   // A destination that is also read is in the cache already, and gains nothing from going past it.
   const uint32_t cache = VX_GetCacheSize();
   mStream = cache != 0 && bytes * mHeight >= static_cast<int64_t>(cache / 2) && !TargetIsASource();
@@ -66,13 +69,16 @@ void RowJob::Layout() noexcept {
   size_t own = mTarget.converts ? mTarget.converter.ScratchBytes() : 0;
   for (int i = 0; i < mSourceCount; ++i)
     if (mSources[i].converts) own = std::max(own, mSources[i].converter.ScratchBytes());
-  const size_t row = Rounded(static_cast<size_t>(mBlock) * 16);
   size_t end = Rounded(own);
+  const auto take = [&](VX_PixelFormat format) {
+    const size_t offset = end;
+    end += Rounded(static_cast<size_t>(UnpaddedRowBytes(format, mBlock)));
+    return offset;
+  };
   for (int i = 0; i < mSourceCount; ++i)
-    if (mSources[i].converts) mSources[i].scratchOffset = end, end += row;
-  mTarget.scratchOffset = end;
-  if (mTarget.converts || mStream) end += row;
-  if (mTarget.converts && mStream) end += row;  // converted, on its way out
+    if (mSources[i].converts) mSources[i].scratchOffset = take(mSources[i].working);
+  if (mTarget.converts || mStream) mTarget.scratchOffset = take(mTarget.working);
+  if (mTarget.converts && mStream) mStagingOffset = take(mTarget.format);
   mScratchBytes = end;
 }
 
@@ -109,7 +115,7 @@ void RowJob::Deliver(const RowSpan& span) const noexcept {
   } else if (!mStream) {
     mTarget.converter.ConvertBlock(span.dst, to, span.count);
   } else {
-    uint8_t* const staging = span.dst + Rounded(static_cast<size_t>(mBlock) * 16);
+    uint8_t* const staging = span.dst + (mStagingOffset - mTarget.scratchOffset);
     mTarget.converter.ConvertBlock(span.dst, staging, span.count);
     StreamCopy(to, staging, bytes, mVariant);
   }

@@ -119,7 +119,7 @@ class RowJob {
   Side mSources[3], mTarget;
   int mSourceCount = 0;
   int32_t mBlock = 0;
-  size_t mScratchBytes = 0;
+  size_t mScratchBytes = 0, mStagingOffset = 0;  // staging: a converted block on its way past the cache
   bool mStream = false;
 };
 

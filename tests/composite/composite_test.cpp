@@ -273,7 +273,7 @@ TEST(Composite, ThreadsAndStreamsChangeNothing) {
 }
 
 TEST(Composite, FailingAllocations) {
-  Image s(F::V210_422_10u, 20001, 2), d(F::BGRA_4444_15u, 20001, 2), out(F::UYVY_422_8u, 20001, 2);
+  Image s(F::V210_422_10u, 80001, 2), d(F::BGRA_4444_15u, 80001, 2), out(F::UYVY_422_8u, 80001, 2);
   EXPECT_GE(ExpectSurvivesFailingAllocations("wide rows", [&] { return Composite(s, d, out, 0.5f); }), 1);
 }
 

@@ -194,7 +194,7 @@ TEST(CompositeToBlack, ThreadsPlaceAndMemory) {
     }
     vexel_host::SetThreadLimit(0);
   }
-  Image s(F::PRGB_4444_15u, 20001, 2), out(F::UYVY_422_8u, 20001, 2);
+  Image s(F::PRGB_4444_15u, 80001, 2), out(F::UYVY_422_8u, 80001, 2);
   int32_t state;
   ExpectSurvivesFailingAllocations("to black", [&] { return ToBlack(s, out, 0.5f); });
   EXPECT_GE(ExpectSurvivesFailingAllocations("tested", [&] { return ToBlackTested(s, out, &state); }), 1);
