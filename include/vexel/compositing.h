@@ -46,11 +46,25 @@ enum {
 };
 #endif
 
-/* Lays the source over the background with an opacity of 0..1 (source-over, straight alpha: ao = as + ab (1 - as),
- * colour (s as + d ab (1 - as)) / ao). A source without alpha, or with an ignored one, is opaque. NaN opacity counts as
- * 0. `conversionOption` is the render quality of the row conversions (see VX_Convert); `flag` is reserved.
+/* Lays the source over the background: with as = source alpha times opacity and background alpha ab, the result has
+ * alpha ao = as + ab (1 - as) and colour (s as + d ab (1 - as)) / ao. A source or background whose alpha is absent or
+ * ignored is opaque.
+ *
+ * Opacity is clamped to 0..1; below 8e-6 and as NaN it is 0, above 1 - 8e-6 it is 1. At 0 the call converts the
+ * background with VX_Convert and gives its result, at 1 the source if that has no alpha; nothing is done where that
+ * picture is the destination itself.
+ *
+ * The arithmetic is the destination's: 8u in 8 bits, anything else (10u and 15u too) in 32f, linear formats in light,
+ * 4:2:2 in VUYP_4444_8u or VUYP_4444_32f, 709 formats among them. Destinations without alpha get the result over black.
+ * Each pixel's result depends on its own pixels only. In 8u every channel is within 0.52 of the exact result; alpha 0
+ * and 255 over an opaque background give background and source exactly. Straight results have black for a colour (16,
+ * 128, 128 in 8-bit Y'CbCr) where ao is 7.63e-6 or less in 8u, less than 8e-6 in 32f. 32f results are not clamped; the
+ * sign and payload of NaNs are unspecified.
+ *
+ * `conversionOption` is the render quality of the row conversions (see VX_Convert); `flag` is reserved.
  * VX_ErrUnsupportedFormat: source or background is no raster format. VX_ErrUnsupportedDestinationFormat: likewise the
- * destination. */
+ * destination. VX_ErrFormatNotHandled: raster formats between which no conversion leads. All codes are the same at
+ * every opacity, but for what VX_Convert says. */
 VX_API VX_Result VX_Composite(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, const void* background,
                               int32_t backgroundRowBytes, VX_PixelFormat backgroundFormat, void* dst,
                               int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
@@ -80,9 +94,27 @@ VX_API VX_Result VX_CompositeWithBlendMode(const void* src, int32_t srcRowBytes,
                                            VX_PixelFormat backgroundFormat, void* dst, int32_t dstRowBytes,
                                            VX_PixelFormat dstFormat, int32_t width, int32_t height, float opacity,
                                            int32_t blendMode, int32_t conversionOption, bool flag) VX_NOEXCEPT;
+/* Lays the source over opaque black; the result is opaque. Opacity as in VX_Composite; 0 is VX_FillWithOpaqueBlack and
+ * its result.
+ *
+ * Done in the destination's own format if that is BGRA, ARGB or VUYA in 8u or 32f, else in BGRA_4444 or VUYA_4444 (709
+ * for 709 destinations), in 32f if the precision hint is above 2, in 8u otherwise. Below opacity 1 the 709 formats,
+ * VUYA_4444_*_709 included, go through their 601 ones. The precision hint is also the render quality of the row
+ * conversions.
+ *
+ * 8u: opacity counts in 1/255, rounded half up; alpha times opacity and colour times alpha are divided by 255 and
+ * rounded to nearest; Y'CbCr is scaled about 16, 128, 128. 32f: colours are multiplied by alpha times opacity, or kept
+ * where that exceeds 1 - 8e-6.
+ *
+ * VX_ErrUnsupportedFormat: the source is no raster format or cannot be converted. VX_ErrUnsupportedDestinationFormat:
+ * likewise the destination. */
 VX_API VX_Result VX_CompositeToBlack(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                                      int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                                      float opacity, int32_t precisionHint) VX_NOEXCEPT;
+/* The same at full opacity, row by row: rows whose alpha is opaque throughout (255, 1.0) are converted straight from
+ * the source format to the destination's, those whose alpha is 0 throughout are filled with opaque black. *alphaState
+ * receives 0 if every row was opaque (also if there are none), 1 if every row was clear, 2 otherwise; it may be null,
+ * and stays as it is on failure. In place, opaque rows are not touched. */
 VX_API VX_Result VX_CompositeToBlackAndTestSourceAlpha(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat,
                                                        void* dst, int32_t dstRowBytes, VX_PixelFormat dstFormat,
                                                        int32_t width, int32_t height, int32_t* alphaState,
