@@ -26,7 +26,7 @@ struct Scaling {
 
 // In double until the end: 16-bit limits are exact in float as well.
 Scaling ScalingOf(const SampleCoding& coding, VX_PixelFormat format, int component) {
-  const uint32_t maximum = (uint32_t{1} << coding.depth) - 1;
+  const uint32_t maximum = UINT32_MAX >> (32 - coding.depth);  // depth 32 is float, which takes no scaling
   const bool chroma = IsYuv(format) && (component == 1 || component == 2);
   if (component == 3 || !IsYuv(format)) return {0.0f, static_cast<float>(maximum), maximum};
   if (coding.fullRange)

@@ -47,7 +47,8 @@ Picture420 PictureFromBlock(const void* block, VX_PixelFormat format, int32_t wi
   const Layout420 layout = LayoutOf(format, width, height);
   Picture420 picture{{}, {}, width, height, format};
   for (int i = 0; i < 3; ++i) {
-    picture.planes[i] = layout.offset[i] < 0 ? nullptr : static_cast<const uint8_t*>(block) + layout.offset[i];
+    const bool there = block && layout.offset[i] >= 0;
+    picture.planes[i] = there ? static_cast<const uint8_t*>(block) + layout.offset[i] : nullptr;
     picture.rowBytes[i] = layout.rowBytes[i];
   }
   return picture;
