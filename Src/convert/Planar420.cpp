@@ -41,14 +41,18 @@ void CopyPlane(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBy
     CopyRows(src, srcRowBytes, dst, dstRowBytes, rows, bytes);
 }
 
+// As integers: callers ask for the offsets of a null block too.
+uint8_t* Plane(const void* base, int64_t offset) {
+  return reinterpret_cast<uint8_t*>(reinterpret_cast<uintptr_t>(base) + static_cast<uintptr_t>(offset));
+}
+
 }  // namespace
 
 Picture420 PictureFromBlock(const void* block, VX_PixelFormat format, int32_t width, int32_t height) noexcept {
   const Layout420 layout = LayoutOf(format, width, height);
   Picture420 picture{{}, {}, width, height, format};
   for (int i = 0; i < 3; ++i) {
-    const bool there = block && layout.offset[i] >= 0;
-    picture.planes[i] = there ? static_cast<const uint8_t*>(block) + layout.offset[i] : nullptr;
+    picture.planes[i] = layout.offset[i] < 0 ? nullptr : Plane(block, layout.offset[i]);
     picture.rowBytes[i] = layout.rowBytes[i];
   }
   return picture;
@@ -83,7 +87,7 @@ VX_Result VX_GetPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, 
                               int32_t rowBytes[3]) noexcept {
   const Layout420 layout = LayoutOf(format, width, height);
   for (int i = 0; i < 3; ++i) {
-    planes[i] = layout.offset[i] < 0 ? nullptr : static_cast<uint8_t*>(base) + layout.offset[i];
+    planes[i] = layout.offset[i] < 0 ? nullptr : Plane(base, layout.offset[i]);
     rowBytes[i] = static_cast<int32_t>(layout.rowBytes[i]);
   }
   return VX_Success;
@@ -93,7 +97,7 @@ VX_Result VX_GetBiPlanarBuffers(void* base, VX_PixelFormat, int32_t width, int32
                                 int32_t rowBytes[2]) noexcept {
   const int64_t pitch = RoundUp(width, 128);
   planes[0] = base;
-  planes[1] = static_cast<uint8_t*>(base) + height * pitch;
+  planes[1] = Plane(base, height * pitch);
   rowBytes[0] = rowBytes[1] = static_cast<int32_t>(pitch);
   return VX_Success;
 }
