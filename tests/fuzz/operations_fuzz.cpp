@@ -13,6 +13,7 @@
 #include "frame/KernelVariant.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
+#include "vexel/compositing.h"
 #include "vexel/vexel.h"
 
 namespace vexel::testing {
@@ -68,7 +69,64 @@ Operation Rotate(Input& input) {
           angle % 180 != 0};
 }
 
-constexpr Operation (*kOperations[])(Input&) = {Convert, Rotate};
+Operation Composite(Input& input) {
+  const int mode = input.ConsumeIntegralInRange(-1, 27), option = input.ConsumeIntegralInRange(-1, 6);
+  const float opacity = input.Fraction();
+  const F src = input.Raster(), background = input.Raster(), dst = input.Raster();
+  return {{src, background}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
+            return VX_CompositeWithBlendMode(from[0].base, from[0].rowBytes, from[0].format, from[1].base,
+                                             from[1].rowBytes, from[1].format, to.base, to.rowBytes, to.format,
+                                             to.width, to.height, opacity, mode, option, false);
+          }};
+}
+
+Operation CompositeToBlack(Input& input) {
+  const int hint = input.ConsumeIntegralInRange(0, 4);
+  const float opacity = input.Fraction();
+  const bool test = input.ConsumeBool();
+  const F src = input.Raster(), dst = input.Raster();
+  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
+            int32_t state;
+            return test ? VX_CompositeToBlackAndTestSourceAlpha(from->base, from->rowBytes, from->format, to.base,
+                                                                to.rowBytes, to.format, to.width, to.height, &state,
+                                                                hint)
+                        : VX_CompositeToBlack(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format,
+                                              to.width, to.height, opacity, hint);
+          }};
+}
+
+Operation CrossDissolve(Input& input) {
+  const int hint = input.ConsumeIntegralInRange(0, 4);
+  const float mix = input.Fraction();
+  const F a = input.Raster(), b = input.Raster(), dst = input.Raster();
+  return {{a, b}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
+            return VX_CrossDissolve(from[0].base, from[0].rowBytes, from[0].format, from[1].base, from[1].rowBytes,
+                                    from[1].format, to.base, to.rowBytes, to.format, to.width, to.height, mix, hint);
+          }};
+}
+
+Operation AlphaGain(Input& input) {
+  const int hint = input.ConsumeIntegralInRange(0, 4);
+  const float gain = input.Fraction();
+  const F src = input.Raster(), dst = input.Raster();
+  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
+            return VX_AlphaGain(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format, to.width,
+                                to.height, gain, hint);
+          }};
+}
+
+Operation Fill(Input& input) {
+  static constexpr auto kFills = {VX_FillWithOpaqueBlack, VX_FillWithTransparentBlack, VX_FillWithOpaqueWhite,
+                                  VX_FillWithTransparentWhite};
+  const auto fill = kFills.begin()[input.ConsumeIntegralInRange(0, 3)];
+  const F dst = input.Raster();
+  return {{}, dst, [fill](const ArenaFrame*, const ArenaFrame& to) {
+            return fill(to.base, to.rowBytes, to.width, to.height, to.format);
+          }};
+}
+
+constexpr Operation (*kOperations[])(Input&) = {Convert,       Rotate,    Composite, CompositeToBlack,
+                                                CrossDissolve, AlphaGain, Fill};
 
 // A refusal depends on formats and arguments only, not on the buffers.
 VX_Result Verdict(const Operation& operation) {
