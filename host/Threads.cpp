@@ -11,6 +11,7 @@
 #include <oneapi/tbb/parallel_for.h>
 #include <oneapi/tbb/partitioner.h>
 #include <oneapi/tbb/task_arena.h>
+#include <oneapi/tbb/task_group.h>
 
 #include "Sanitizers.h"
 #include "System.h"
@@ -64,16 +65,19 @@ void RunParallel(const boost::function<void(int)>& function, int count, Crew* cr
 }
 #else
 // Bands differ in cost, so each piece is handed out alone. Isolated: a thread that waits for its own pieces must not
-// pick up pieces of an unrelated call, whose stack and thread-local state would pile up on its own.
+// pick up pieces of an unrelated call, whose stack and thread-local state would pile up on its own. The pieces run in
+// the caller's floating-point mode; otherwise it would be that of the thread's first call of oneTBB, whenever that was.
 void RunParallel(const boost::function<void(int)>& function, int count, Crew* crew) {
   const auto run = [&function, count] {
     tbb::this_task_arena::isolate([&function, count] {
+      tbb::task_group_context context;
+      context.capture_fp_settings();
       tbb::parallel_for(
           tbb::blocked_range<int>(0, count, 1),
           [&function](const tbb::blocked_range<int>& range) {
             for (int i = range.begin(); i != range.end(); ++i) function(i);
           },
-          tbb::simple_partitioner());
+          tbb::simple_partitioner(), context);
     });
   };
   // Without a limit the caller's own arena serves, and with it whatever limit the program has set there.
