@@ -68,10 +68,10 @@ void RunParallel(const boost::function<void(int)>& function, int count, Crew* cr
 // pick up pieces of an unrelated call, whose stack and thread-local state would pile up on its own. The pieces run in
 // the caller's floating-point mode; otherwise it would be that of the thread's first call of oneTBB, whenever that was.
 void RunParallel(const boost::function<void(int)>& function, int count, Crew* crew) {
-  const auto run = [&function, count] {
-    tbb::this_task_arena::isolate([&function, count] {
-      tbb::task_group_context context;
-      context.capture_fp_settings();
+  tbb::task_group_context context;
+  context.capture_fp_settings();
+  const auto run = [&] {
+    tbb::this_task_arena::isolate([&] {
       tbb::parallel_for(
           tbb::blocked_range<int>(0, count, 1),
           [&function](const tbb::blocked_range<int>& range) {
