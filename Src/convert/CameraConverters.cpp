@@ -1,13 +1,11 @@
 // Canon Log 3 to display gamma. A sample has 65,536 codes, so each result is computed once and then looked up: the same
 // floats in every kernel variant.
-#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstring>
 #include <xmmintrin.h>
 
-#include "frame/StreamCopy.h"
-#include "frame/KernelVariant.h"
+#include "convert/StagedRows.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
@@ -79,20 +77,8 @@ VX_Result VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(const void* s
   if (width < 1 || height < 1) return VX_Success;
   const float* table = CanonLog3ToDisplay();
   const auto convert = bigEndian ? CanonLog3Row<true> : CanonLog3Row<false>;
-  const auto pixels = static_cast<size_t>(width);
-  const bool stream = VX_GetCacheSize() != 0 && pixels * static_cast<size_t>(height) * 24 >= VX_GetCacheSize() / 2;
-  const KernelVariant variant = ActiveKernelVariant();
-  alignas(64) uint8_t staging[8192];
-  const size_t piece = stream ? sizeof staging / 16 : pixels;
-  for (int32_t row = 0; row < height; ++row) {
-    const uint8_t* from = static_cast<const uint8_t*>(src) + row * ptrdiff_t{srcRowBytes};
-    uint8_t* to = static_cast<uint8_t*>(dst) + row * ptrdiff_t{dstRowBytes};
-    for (size_t i = 0; i < pixels; i += piece) {
-      const size_t count = std::min(piece, pixels - i);
-      convert(table, from + i * 8, stream ? staging : to, count);
-      if (stream) StreamCopy(to + i * 16, staging, count * 16, variant);
-    }
-  }
-  if (stream) StreamFence();
+  ConvertStaged(SourceRows(src, srcRowBytes, 8), DestinationRows(dst, dstRowBytes, 16), static_cast<size_t>(width),
+                height, ActiveKernelVariant(),
+                [=](const uint8_t* from, uint8_t* to, size_t count) { convert(table, from, to, count); });
   return VX_Success;
 }

@@ -5,48 +5,12 @@
 #include <cstring>
 
 #include "convert/PackerKernels.h"
+#include "convert/StagedRows.h"
 #include "frame/FpModeGuard.h"
-#include "frame/StreamCopy.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
 namespace {
-
-struct Source {
-  const uint8_t* base;
-  ptrdiff_t rowBytes;
-  size_t unitBytes;
-  Source(const void* b, ptrdiff_t bytes, size_t unit)
-      : base(static_cast<const uint8_t*>(b)), rowBytes(bytes), unitBytes(unit) {}
-};
-struct Destination {
-  uint8_t* base;
-  ptrdiff_t rowBytes;
-  size_t unitBytes;
-  Destination(void* b, ptrdiff_t bytes, size_t unit)
-      : base(static_cast<uint8_t*>(b)), rowBytes(bytes), unitBytes(unit) {}
-};
-
-// Converts `units` pixels or groups of each row. What cannot stay in the cache is staged piece by piece and streamed.
-void ConvertRows(const RowKernelSet& kernels, const Source& src, const Destination& dst, size_t units, int32_t height,
-                 KernelVariant variant) {
-  if (units == 0 || height < 1) return;
-  const RowKernel convert = kernels[variant];
-  const size_t bytes = units * (src.unitBytes + dst.unitBytes);
-  const bool stream = VX_GetCacheSize() != 0 && bytes * static_cast<size_t>(height) >= VX_GetCacheSize() / 2;
-  alignas(64) uint8_t staging[8192];
-  const size_t piece = stream ? sizeof staging / dst.unitBytes : units;
-  for (int32_t row = 0; row < height; ++row) {
-    const uint8_t* from = src.base + row * src.rowBytes;
-    uint8_t* to = dst.base + row * dst.rowBytes;
-    for (size_t i = 0; i < units; i += piece) {
-      const size_t count = std::min(piece, units - i);
-      convert(from + i * src.unitBytes, stream ? staging : to, count);
-      if (stream) StreamCopy(to + i * dst.unitBytes, staging, count * dst.unitBytes, variant);
-    }
-  }
-  if (stream) StreamFence();
-}
 
 template <class Function, class... Arguments>
 void ConvertInPlace(Function convert, void* base, ptrdiff_t rowBytes, size_t count, int32_t height,
@@ -56,9 +20,10 @@ void ConvertInPlace(Function convert, void* base, ptrdiff_t rowBytes, size_t cou
 
 constexpr size_t AtLeast0(int32_t n) { return static_cast<size_t>(std::max(n, 0)); }
 
-VX_Result ConvertPixels(const RowKernelSet& kernels, const Source& src, const Destination& dst, int32_t width,
+VX_Result ConvertPixels(const RowKernelSet& kernels, const SourceRows& src, const DestinationRows& dst, int32_t width,
                         int32_t height) {
-  ConvertRows(kernels, src, dst, AtLeast0(width), height, ActiveKernelVariant());
+  const KernelVariant variant = ActiveKernelVariant();
+  ConvertStaged(src, dst, AtLeast0(width), height, variant, kernels[variant]);
   return VX_Success;
 }
 
@@ -103,10 +68,10 @@ VX_Result VX_Convert_Uint32_BigEndian_InPlace(void* base, int32_t rowBytes, int3
 VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBytes,
                                                int32_t width, int32_t height) noexcept {
   const KernelVariant variant = ActiveKernelVariant();
-  const Source from(src, srcRowBytes, kUyvy16GroupBytes);
-  const Destination to(dst, dstRowBytes, kV210GroupBytes);
+  const SourceRows from(src, srcRowBytes, kUyvy16GroupBytes);
+  const DestinationRows to(dst, dstRowBytes, kV210GroupBytes);
   const size_t groups = AtLeast0(width) / kV210GroupPixels, rest = AtLeast0(width) % kV210GroupPixels;
-  ConvertRows(kUyvy10ToV210, from, to, groups, height, variant);
+  ConvertStaged(from, to, groups, height, variant, kUyvy10ToV210[variant]);
 
   const auto neededBytes = static_cast<int64_t>((groups + 1) * kV210GroupBytes);
   if (rest == 0 || neededBytes > dstRowBytes) return VX_Success;
@@ -122,10 +87,10 @@ VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBy
 VX_Result VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(const void* src, int32_t srcRowBytes, void* dst,
                                                         int32_t dstRowBytes, int32_t width, int32_t height) noexcept {
   const KernelVariant variant = ActiveKernelVariant();
-  const Source from(src, srcRowBytes, kV210GroupBytes);
-  const Destination to(dst, dstRowBytes, kUyvy16GroupBytes);
+  const SourceRows from(src, srcRowBytes, kV210GroupBytes);
+  const DestinationRows to(dst, dstRowBytes, kUyvy16GroupBytes);
   const size_t groups = AtLeast0(width) / kV210GroupPixels, rest = AtLeast0(width) % kV210GroupPixels;
-  ConvertRows(kV210ToUyvy10, from, to, groups, height, variant);
+  ConvertStaged(from, to, groups, height, variant, kV210ToUyvy10[variant]);
 
   if (rest == 0) return VX_Success;
   for (int32_t row = 0; row < height; ++row) {
@@ -138,7 +103,7 @@ VX_Result VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(const void* src, int32_t
 
 VX_Result VX_Convert_RGB_444_10u_To_DNxHD16u(const void* src, int32_t srcRowBytes, void* dst, int32_t width,
                                              int32_t height) noexcept {
-  // Not ConvertRows, which would stream whole pixels: each fourth sample stays as it is.
+  // Not ConvertStaged, which would stream whole pixels: each fourth sample stays as it is.
   const RowKernel convert = kRgb10ToDnxhd16[ActiveKernelVariant()];
   const size_t pixels = AtLeast0(width);
   for (int32_t row = 0; row < height; ++row)
