@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "frame/KernelVariant.h"
+#include "support/Arena.h"
 #include "support/Random.h"
 #include "vexel/vexel.h"
 
@@ -367,6 +368,140 @@ TEST(Packers, ChromaOffsetLeavesLuma) {
       VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(base, rowBytes, width, 3, -0.5f);
     });
     ASSERT_EQ(std::memcmp(rows.values.data(), expected.values.data(), rows.values.size() * 4), 0) << width;
+  }
+}
+
+// ---- Arena ----
+
+// Bytes of a side's rows: `bytes` for each `pixels` begun. No bytes: the packer works in place.
+struct RowUnit {
+  int bytes, pixels;
+  int RowBytes(int width) const { return (width + pixels - 1) / pixels * bytes; }
+};
+struct ArmedPacker {
+  const char* name;
+  RowUnit src, dst;
+  bool oneRow;  // a side that has no row bytes
+  void (*run)(const void* src, int srcRow, void* dst, int dstRow, int w, int h);
+};
+
+constexpr ArmedPacker kArmedPackers[] = {
+    {"RGB10 to DNxHD",
+     {4, 1},
+     {8, 1},
+     true,
+     [](auto s, int n, auto d, int, int w, int h) { VX_Convert_RGB_444_10u_To_DNxHD16u(s, n, d, w, h); }},
+    {"DNxHD to RGB10",
+     {8, 1},
+     {4, 1},
+     true,
+     [](auto s, int, auto d, int m, int w, int h) { VX_Convert_DNxHD16u_To_RGB_444_10u(s, d, m, w, h); }},
+    {"BGR16 to RGB10",
+     {6, 1},
+     {4, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_Convert_j2k_BGR16u_To_RGB_444_10u(s, n, d, m, w, h); }},
+    {"RGB10 to BGR16",
+     {4, 1},
+     {6, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(s, n, d, m, w, h);
+     }},
+    {"RGB8 to BGRA8",
+     {3, 1},
+     {4, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_8uToBGRA_4444_8u(s, n, d, m, w, h); }},
+    {"RGB16 to XRGB15",
+     {6, 1},
+     {8, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_16u_To_XRGB_4444_15u(s, n, d, m, w, h); }},
+    {"UYVY10 to V210",
+     {4, 1},
+     {16, 6},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertUYVY_422_10uToV210_422_10u(s, n, d, m, w, h); }},
+    {"V210 to UYVY10",
+     {16, 6},
+     {4, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(s, n, d, m, w, h);
+     }},
+    {"Canon Log 3",
+     {8, 1},
+     {16, 1},
+     false,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(s, n, d, m, w, h, w & 1);
+     }},
+    {"15u to 16u",
+     {},
+     {8, 1},
+     false,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_InPlace(d, m, w, h); }},
+    {"15u to big-endian",
+     {},
+     {8, 1},
+     false,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_BigEndian_InPlace(d, m, w, h); }},
+    {"byte swap",
+     {},
+     {4, 1},
+     true,
+     [](auto, int, auto d, int m, int w, int) {
+       VX_Convert_Uint32_BigEndian_InPlace(d, m < 0 ? -4 * w : 4 * w, w, 1);
+     }},
+    {"S-Gamut3",
+     {},
+     {8, 1},
+     false,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_SGamut3_16u_To_SGamut3Cine_16u(d, m, w, h); }},
+    {"X'Y'Z'",
+     {},
+     {16, 1},
+     false,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_ZYXx_32f_To_BGRX_32f_In_Place(d, m, w, h); }},
+    {"chroma offset",
+     {},
+     {16, 2},
+     false,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(d, m, w, h, 0.5f); }},
+};
+
+// The last byte of a side's row is the last one of the arena's, whose pixels are words here.
+TEST(Packers, Arena) {
+  for (const ArmedPacker& packer : kArmedPackers) {
+    const auto widthOf = [&](int words) {
+      const int pixels = words * 4 / packer.dst.bytes * packer.dst.pixels;
+      return std::max(pixels - words % packer.dst.pixels, 0);
+    };
+    const auto words = [](int bytes) { return std::max((bytes + 3) / 4, 1); };
+    testing::ArenaCase arenaCase;
+    arenaCase.name = packer.name;
+    arenaCase.destination = VX_PixelFormat::BGRA_4444_8u;
+    arenaCase.destinationIsInput = true;
+    arenaCase.everyContents = true;
+    if (packer.oneRow) arenaCase.heights = {1};
+    if (packer.src.bytes != 0) {
+      arenaCase.sources = {VX_PixelFormat::BGRA_4444_8u};
+      arenaCase.sourceSize = [&](int, testing::ArenaSize size) {
+        return testing::ArenaSize{words(packer.src.RowBytes(widthOf(size.width))), size.height};
+      };
+    }
+    arenaCase.run = [&](const testing::ArenaFrame* src, const testing::ArenaFrame& dst) {
+      const int width = widthOf(dst.width);
+      const auto flush = [&](const testing::ArenaFrame& frame, const RowUnit& unit) {
+        return frame.Row(0) + 4 * frame.width - unit.RowBytes(width);
+      };
+      const bool isInPlace = packer.src.bytes == 0;
+      packer.run(isInPlace ? nullptr : flush(*src, packer.src), isInPlace ? 0 : src->rowBytes, flush(dst, packer.dst),
+                 dst.rowBytes, width, dst.height);
+      return VX_Success;
+    };
+    EXPECT_TRUE(testing::RunArena(arenaCase));
   }
 }
 
