@@ -16,5 +16,6 @@ void AddDissolveCommand(CLI::App& app);
 void AddColorCommand(CLI::App& app);
 void AddCompositeCommand(CLI::App& app);
 void AddBlendSheetCommand(CLI::App& app);
+void AddKernelsCommand(CLI::App& app);
 
 }  // namespace tool

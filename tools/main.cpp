@@ -27,6 +27,7 @@ void AddCommands(CLI::App& app) {
   tool::AddColorCommand(app);
   tool::AddCompositeCommand(app);
   tool::AddBlendSheetCommand(app);
+  tool::AddKernelsCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".

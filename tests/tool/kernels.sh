@@ -1,0 +1,17 @@
+#!/usr/bin/env bash
+# vexel kernels: the list, and a picture of each kernel.
+. "$(dirname "$0")/common.sh"
+
+"$vexel" kernels >list || fail "kernels: no list"
+[ "$(wc -l <list)" = 8 ] || fail "kernels: $(cat list)"
+grep -Eq '^cubic +2 +4 +8 +16 ' list || fail "the cubic's taps: $(grep '^cubic ' list)"
+grep -Eq '^spline36 +6 +6 +- +- ' list || fail "Spline36 makes nothing smaller: $(grep spline36 list)"
+mkdir plots
+"$vexel" kernels --plot plots || fail "kernels --plot"
+[ "$(ls plots | wc -l)" = 15 ] || fail "plots: $(ls plots)"
+grep -L '</svg>' plots/*.svg | grep . && fail "unfinished plots"
+grep -l 'nan\|inf' plots/*.svg && fail "plots of no numbers"
+"$vexel" kernels --plot nowhere 2>err && fail "a plot into no directory"
+grep -q nowhere err || fail "no reason given: $(cat err)"
+
+exit $failed
