@@ -59,8 +59,8 @@ HWY_INLINE F32 Over(F32 s, F32 d, F32 opacity) {
 template <OverChoice kChoice>
 HWY_ATTR void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
   const auto part = hn::Set(FloatTag(), opacity);
-  TwoRowLoop<4 * kVectorPixels, 16>(
-      source, background, dst, count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+  TwoRowLoop<4 * HWY_MAX_BYTES>(
+      source, background, dst, 16 * count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
         const auto r0 = Over<kChoice>(LoadVector<float>(from, 0), LoadVector<float>(onto, 0), part);
         const auto r1 = Over<kChoice>(LoadVector<float>(from, 1), LoadVector<float>(onto, 1), part);
         const auto r2 = Over<kChoice>(LoadVector<float>(from, 2), LoadVector<float>(onto, 2), part);

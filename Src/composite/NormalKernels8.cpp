@@ -141,8 +141,8 @@ template <OverChoice kChoice>
 HWY_ATTR void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
   const Compositor<kChoice> compositor(opacity);
   const auto opaque = OpaqueVector<AlphaAt(kChoice), uint8_t>();
-  TwoRowLoop<2 * HWY_MAX_BYTES / 4, 4>(
-      source, background, dst, count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+  TwoRowLoop<2 * HWY_MAX_BYTES>(
+      source, background, dst, 4 * count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
         const auto s0 = LoadVector<uint8_t>(from, 0), s1 = LoadVector<uint8_t>(from, 1);
         const auto d0 = LoadVector<uint8_t>(onto, 0), d1 = LoadVector<uint8_t>(onto, 1);
         const auto both = hn::And(hn::And(d0, d1), opaque);

@@ -20,20 +20,19 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-// Calls body(source, background, dst) for each block of kBlock pixels of kBytes bytes. The padding of the tail is zero;
-// what is computed there is thrown away.
-template <size_t kBlock, size_t kBytes, class Body>
-HWY_INLINE void TwoRowLoop(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count,
-                           const Body& body) {
+// Calls body(a, b, dst) for each block of kBlock bytes. The padding of the tail is zero; what is computed there is
+// thrown away.
+template <size_t kBlock, class Body>
+HWY_INLINE void TwoRowLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
   size_t i = 0;
-  for (; i + kBlock <= count; i += kBlock) body(source + i * kBytes, background + i * kBytes, dst + i * kBytes);
-  if (const size_t rest = count - i) {
-    alignas(64) uint8_t in[2][kBlock * kBytes] = {};
-    alignas(64) uint8_t out[kBlock * kBytes];
-    std::memcpy(in[0], source + i * kBytes, rest * kBytes);
-    std::memcpy(in[1], background + i * kBytes, rest * kBytes);
+  for (; i + kBlock <= bytes; i += kBlock) body(a + i, b + i, dst + i);
+  if (const size_t rest = bytes - i) {
+    alignas(64) uint8_t in[2][kBlock] = {};
+    alignas(64) uint8_t out[kBlock];
+    std::memcpy(in[0], a + i, rest);
+    std::memcpy(in[1], b + i, rest);
     body(in[0], in[1], out);
-    std::memcpy(dst + i * kBytes, out, rest * kBytes);
+    std::memcpy(dst + i, out, rest);
   }
 }
 

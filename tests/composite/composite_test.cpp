@@ -277,25 +277,7 @@ TEST(Composite, FailingAllocations) {
   EXPECT_GE(ExpectSurvivesFailingAllocations("wide rows", [&] { return Composite(s, d, out, 0.5f); }), 1);
 }
 
-TEST(Composite, ControlWordComesBack) {
-  const unsigned callers = _mm_getcsr();
-  Image s(F::BGRA_4444_32f, 65, 65), d(F::BGRA_4444_8u, 65, 65), x(F::BGRX_4444_8u, 65, 65),
-      out(F::BGRA_4444_8u, 65, 65);
-  for (const unsigned word : {0x1F80u, 0x7F95u, 0x3FBFu}) {
-    _mm_setcsr(word);
-    unsigned after[5];
-    Composite(s, d, out, 0.5f), after[0] = _mm_getcsr();
-    Composite(s, d, out, 0), after[1] = _mm_getcsr();
-    Composite(x, d, out, 1), after[2] = _mm_getcsr();
-    out.format = F::PALDV25, Composite(s, d, out, 0.5f), after[3] = _mm_getcsr();
-    out.format = FromBits(0xFFFF), Composite(s, d, out, 0.5f), after[4] = _mm_getcsr();
-    _mm_setcsr(callers);
-    out.format = F::BGRA_4444_8u;
-    for (const unsigned left : after) EXPECT_EQ(left, word);
-  }
-}
-
-TEST(Composite, RefusesAlikeAtEveryOpacity) {
+TEST(Composite, RefusesAlikeAtEveryOpacityAndRestoresTheControlWord) {
   constexpr F kSpecial = F::YUV_420_MPEG2_FRAME, kNone = FromBits(0xFFFF), kRaster = F::BGRA_4444_8u;
   enum Null { kNothing, kSource, kBackground, kDestination };
   const struct {
@@ -321,9 +303,46 @@ TEST(Composite, RefusesAlikeAtEveryOpacity) {
     for (const float opacity : {0.0f, 0.5f, 1.0f})
       ExpectRefusal("composite at " + std::to_string(opacity), c.expected, [&](void* memory) {
         const auto at = [&](Null which) { return c.null == which ? nullptr : memory; };
-        return VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background, at(kDestination), 64, c.dst,
-                            c.width, c.height, opacity, 3, false);
+        const unsigned callers = _mm_getcsr();
+        _mm_setcsr(0x7F95);
+        const VX_Result result = VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background,
+                                              at(kDestination), 64, c.dst, c.width, c.height, opacity, 3, false);
+        const unsigned after = _mm_getcsr();
+        _mm_setcsr(callers);
+        EXPECT_EQ(after, 0x7F95u);
+        return result;
       });
+  // Calls that do something.
+  Image s(F::BGRA_4444_32f, 65, 65), d(F::BGRA_4444_8u, 65, 65), out = d;
+  for (const float opacity : {0.0f, 0.5f, 1.0f}) {
+    const unsigned callers = _mm_getcsr();
+    _mm_setcsr(0x3FBF);
+    const VX_Result result = Composite(s, d, out, opacity);
+    const unsigned after = _mm_getcsr();
+    _mm_setcsr(callers);
+    EXPECT_EQ(result, VX_Success);
+    EXPECT_EQ(after, 0x3FBFu);
+  }
+}
+
+TEST(Composite, GiantStrides) {
+  for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
+    const ArenaFrame giant = GiantStrideFrame(F::BGRA_4444_8u, 37, 7, rowBytes);
+    Image s(F::BGRA_4444_8u, 37, 7), d(F::BGRA_4444_8u, 37, 7, Contents::Random, 2), out(F::BGRA_4444_8u, 37, 7);
+    ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
+    for (int row = 0; row < 7; ++row) std::memcpy(giant.Row(row), d.Row(row), 37 * 4);
+    ASSERT_EQ(VX_Composite(s.bytes.data(), s.rowBytes, s.format, giant.base, rowBytes, giant.format, giant.base,
+                           rowBytes, giant.format, 37, 7, 0.6f, 3, false),
+              VX_Success);
+    for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
+    ASSERT_EQ(VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, out.bytes.data(), out.rowBytes,
+                                                    out.format, 37, 7, nullptr, 0),
+              VX_Success);
+    ASSERT_EQ(VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, giant.base, rowBytes,
+                                                    giant.format, 37, 7, nullptr, 0),
+              VX_Success);
+    for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
+  }
 }
 
 }  // namespace
