@@ -10,6 +10,7 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
+#include "composite/TwoRows-inl.h"
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
 
@@ -66,20 +67,6 @@ namespace {
 
 constexpr size_t kBlock = HWY_MAX_BYTES;
 
-// Calls body(a, b, dst) for each vector of bytes, the rest through the same body on a padded copy.
-template <class Body>
-HWY_INLINE void MixLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
-  size_t i = 0;
-  for (; i + kBlock <= bytes; i += kBlock) body(a + i, b + i, dst + i);
-  if (const size_t rest = bytes - i) {
-    alignas(64) uint8_t blocks[2][kBlock] = {};
-    std::memcpy(blocks[0], a + i, rest);
-    std::memcpy(blocks[1], b + i, rest);
-    body(blocks[0], blocks[1], blocks[0]);
-    std::memcpy(dst + i, blocks[0], rest);
-  }
-}
-
 // A vector of samples as floats; `index` counts such vectors.
 template <class T>
 HWY_INLINE F32 LoadSamples(const uint8_t* p, size_t index) {
@@ -132,7 +119,7 @@ struct MixStraight {
 
 template <class T, AlphaWrite kAlpha, class Op>
 HWY_INLINE void MixSamples(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowDst, size_t bytes, const Op& op) {
-  MixLoop(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
+  TwoRowLoop<kBlock>(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
     const auto mixed = [&](size_t i) HWY_ATTR { return op(LoadSamples<T>(a, i), LoadSamples<T>(b, i)); };
     const auto code = [&](size_t i) HWY_ATTR { return ConvertNearest(mixed(i)); };
     if constexpr (sizeof(T) == 4) StoreVector(WriteAlpha<kAlpha, T>(mixed(0)), dst);
@@ -168,7 +155,7 @@ HWY_INLINE U32 IntoField(F32 value) {
 template <const Layout8& kLayout>
 HWY_ATTR void MixAlpha8(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowDst, size_t bytes, float mix) {
   const Weights weights(mix);
-  MixLoop(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
+  TwoRowLoop<kBlock>(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
     const hn::ScalableTag<uint32_t> d;
     constexpr int kAlpha = 8 * kLayout.alpha, kFirst = kAlpha == 0 ? 8 : 0;
     const U32 pixelA = LoadVector<uint32_t>(a), pixelB = LoadVector<uint32_t>(b);
@@ -190,7 +177,7 @@ HWY_ATTR void MixAlpha8(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowDs
 template <int kBit>
 HWY_ATTR void MixTenBits(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowDst, size_t bytes, float mix) {
   const Weights weights(mix);
-  MixLoop(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
+  TwoRowLoop<kBlock>(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
     const U32 wordA = LoadVector<uint32_t>(a), wordB = LoadVector<uint32_t>(b);
     const U32 low = IntoField<kBit>(weights.Mix(Field<kBit, 10>(wordA), Field<kBit, 10>(wordB)));
     const U32 middle = IntoField<kBit + 10>(weights.Mix(Field<kBit + 10, 10>(wordA), Field<kBit + 10, 10>(wordB)));
@@ -201,7 +188,7 @@ HWY_ATTR void MixTenBits(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowD
 
 HWY_ATTR void AddScaled(const uint8_t* rowA, const uint8_t* rowB, uint8_t* rowDst, size_t bytes, float weight) {
   const auto factor = hn::Set(hn::ScalableTag<float>(), weight);
-  MixLoop(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
+  TwoRowLoop<kBlock>(rowA, rowB, rowDst, bytes, [&](const uint8_t* a, const uint8_t* b, uint8_t* dst) HWY_ATTR {
     StoreVector(hn::Add(LoadVector<float>(b), hn::Mul(LoadVector<float>(a), factor)), dst);
   });
 }
