@@ -35,12 +35,13 @@ struct BlendKernels {
 };
 
 // Every mode but Dissolve, which has a kernel of its own kind, and Normal.
-#define VX_KERNEL_BLEND_MODES(X)                                                                                   \
-  X(Color)                                                                                                         \
-  X(ColorBurn)                                                                                                     \
-  X(ColorDodge) X(Darken) X(DarkerColor) X(Difference) X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten)      \
-      X(LighterColor) X(LinearBurn) X(LinearDodge) X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) X(PinLight) \
-          X(Saturation) X(Screen) X(SoftLight) X(VividLight) X(Subtract) X(Divide)
+#define VX_KERNEL_BLEND_MODES(X)                                                                                 \
+  X(Color)                                                                                                       \
+  X(ColorBurn)                                                                                                   \
+  X(ColorDodge)                                                                                                  \
+  X(Darken) X(DarkerColor) X(Difference) X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten) X(LighterColor)  \
+      X(LinearBurn) X(LinearDodge) X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) X(PinLight) X(Saturation) \
+          X(Screen) X(SoftLight) X(VividLight) X(Subtract) X(Divide)
 
 #define VX_DECLARE_BLEND(mode) extern const BlendKernels kBlend##mode;
 VX_KERNEL_BLEND_MODES(VX_DECLARE_BLEND)

@@ -21,11 +21,21 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
-// As many pixels as a vector has floats, in an order of the pixel type's own.
+// As many pixels as a vector has floats, in an order of the pixel type's own. Members instead of arrays, which
+// compilers keep in memory.
+struct Colour {
+  F32 blue, green, red;
+};
 struct Planes {
-  F32 colour[3];  // blue, green, red
+  Colour colour;
   F32 alpha;
 };
+
+// f of each channel of one colour or several.
+template <class F, class... Colours>
+HWY_INLINE Colour PerChannel(const F& f, const Colours&... c) {
+  return {f(c.blue...), f(c.green...), f(c.red...)};
+}
 
 HWY_INLINE F32 SetFloat(float value) { return hn::Set(hn::ScalableTag<float>(), value); }
 // NaN gives `least`.
@@ -42,12 +52,12 @@ class FloatPixels {
   HWY_INLINE Planes Load(const uint8_t* p) const {
     Planes planes;
     Transpose(LoadVector<float>(p, 0), LoadVector<float>(p, 1), LoadVector<float>(p, 2), LoadVector<float>(p, 3),
-              planes.colour[0], planes.colour[1], planes.colour[2], planes.alpha);
+              planes.colour.blue, planes.colour.green, planes.colour.red, planes.alpha);
     return planes;
   }
   HWY_INLINE void Store(const Planes& planes, uint8_t* p) const {
     F32 v0, v1, v2, v3;
-    Transpose(planes.colour[0], planes.colour[1], planes.colour[2], planes.alpha, v0, v1, v2, v3);
+    Transpose(planes.colour.blue, planes.colour.green, planes.colour.red, planes.alpha, v0, v1, v2, v3);
     StoreVector(v0, p, 0);
     StoreVector(v1, p, 1);
     StoreVector(v2, p, 2);
@@ -115,8 +125,8 @@ class BytePixelsOut : BytePixelsIn {
     const hn::ScalableTag<float> d;
     const hn::ScalableTag<int16_t> d16;
     const auto factor = hn::IfVecThenElse(hn::BitCast(d, mPremultiplied), planes.alpha, SetFloat(1.0f));
-    const auto b = Narrow(hn::Mul(planes.colour[0], factor)), g = Narrow(hn::Mul(planes.colour[1], factor)),
-               r = Narrow(hn::Mul(planes.colour[2], factor)), a = Narrow(planes.alpha);
+    const auto b = Narrow(hn::Mul(planes.colour.blue, factor)), g = Narrow(hn::Mul(planes.colour.green, factor)),
+               r = Narrow(hn::Mul(planes.colour.red, factor)), a = Narrow(planes.alpha);
     // In each block four bytes of every channel, then in the order of the pixels.
     alignas(16) static constexpr uint8_t kInterleave[16] = {0, 4, 8, 12, 1, 5, 9, 13, 2, 6, 10, 14, 3, 7, 11, 15};
     const auto packed = PackBlocks(hn::ReorderDemote2To(d16, b, g), hn::ReorderDemote2To(d16, r, a));
@@ -131,19 +141,17 @@ class BytePixelsOut : BytePixelsIn {
 };
 
 // The common form: `blended` takes part as far as the background is there.
-HWY_INLINE Planes Composite(const Planes& s, const Planes& d, F32 as, const F32 blended[3]) {
+HWY_INLINE Planes Composite(const Planes& s, const Planes& d, F32 as, const Colour& blended) {
   const auto one = SetFloat(1.0f);
   const auto ab = d.alpha, ao = hn::Sub(hn::Add(ab, as), hn::Mul(ab, as));
   const auto isClear = hn::Lt(hn::Abs(ao), SetFloat(kAlphaGuard));
   const auto t = hn::Mul(as, hn::Div(one, hn::IfThenElse(isClear, one, ao)));
   const auto rest = hn::Sub(one, t), uncovered = hn::Sub(one, ab);
-  Planes out;
-  for (int k = 0; k < 3; ++k) {
-    const auto top = hn::Add(hn::Mul(uncovered, s.colour[k]), hn::Mul(ab, blended[k]));
-    out.colour[k] = hn::IfThenZeroElse(isClear, hn::Add(hn::Mul(rest, d.colour[k]), hn::Mul(t, top)));
-  }
-  out.alpha = ao;
-  return out;
+  const auto channel = [&](F32 sc, F32 dc, F32 bc) HWY_ATTR {
+    const auto top = hn::Add(hn::Mul(uncovered, sc), hn::Mul(ab, bc));
+    return hn::IfThenZeroElse(isClear, hn::Add(hn::Mul(rest, dc), hn::Mul(t, top)));
+  };
+  return {PerChannel(channel, s.colour, d.colour, blended), ao};
 }
 
 // Blends whole blocks. A function of its own, so that rows and their tails share one copy.

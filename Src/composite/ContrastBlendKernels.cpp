@@ -37,8 +37,7 @@ struct Mode {
   F32 opacity;
   explicit HWY_INLINE Mode(const BlendArguments& arguments) : opacity(SetFloat(arguments.opacity)) {}
   HWY_INLINE Planes operator()(const Planes& s, const Planes& d) const {
-    const F32 blended[3] = {Channel<kMode>(s.colour[0], d.colour[0]), Channel<kMode>(s.colour[1], d.colour[1]),
-                            Channel<kMode>(s.colour[2], d.colour[2])};
+    const Colour blended = PerChannel(Channel<kMode>, s.colour, d.colour);
     return Composite(s, d, hn::Mul(s.alpha, opacity), blended);
   }
 };

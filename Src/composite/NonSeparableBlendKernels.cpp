@@ -30,35 +30,48 @@ namespace {
 
 using M = VX_BlendMode;
 
-HWY_INLINE F32 Lum(const F32 c[3]) {
-  return hn::Add(hn::Add(hn::Mul(SetFloat(kLumRed), c[2]), hn::Mul(SetFloat(kLumGreen), c[1])),
-                 hn::Mul(SetFloat(kLumBlue), c[0]));
+HWY_INLINE F32 Lum(const Colour& c) {
+  return hn::Add(hn::Add(hn::Mul(SetFloat(kLumRed), c.red), hn::Mul(SetFloat(kLumGreen), c.green)),
+                 hn::Mul(SetFloat(kLumBlue), c.blue));
 }
-HWY_INLINE F32 Least(const F32 c[3]) { return hn::Min(hn::Min(c[0], c[1]), c[2]); }
-HWY_INLINE F32 Most(const F32 c[3]) { return hn::Max(hn::Max(c[0], c[1]), c[2]); }
-HWY_INLINE F32 Sat(const F32 c[3]) { return hn::Sub(Most(c), Least(c)); }
+HWY_INLINE F32 Least(const Colour& c) { return hn::Min(hn::Min(c.blue, c.green), c.red); }
+HWY_INLINE F32 Most(const Colour& c) { return hn::Max(hn::Max(c.blue, c.green), c.red); }
+HWY_INLINE F32 Sat(const Colour& c) { return hn::Sub(Most(c), Least(c)); }
 
 // Where `applies`, draws c toward the grey `lum` by the quotient, which is computed once for all channels.
 template <class Mask>
-HWY_INLINE void PullToGrey(F32 c[3], F32 lum, Mask applies, F32 numerator, F32 denominator) {
+HWY_INLINE Colour PullToGrey(const Colour& c, F32 lum, Mask applies, F32 numerator, F32 denominator) {
   const auto factor = hn::Div(numerator, hn::IfThenElse(applies, denominator, SetFloat(1.0f)));
-  for (int k = 0; k < 3; ++k) c[k] = hn::IfThenElse(applies, hn::Add(lum, hn::Mul(hn::Sub(c[k], lum), factor)), c[k]);
+  const auto pull = [&](F32 x)
+                        HWY_ATTR { return hn::IfThenElse(applies, hn::Add(lum, hn::Mul(hn::Sub(x, lum), factor)), x); };
+  return PerChannel(pull, c);
 }
 
-HWY_INLINE void SetLum(F32 c[3], F32 lum) {
+HWY_INLINE Colour SetLum(const Colour& c, F32 lum) {
   const auto zero = SetFloat(0.0f), one = SetFloat(1.0f);
   const auto delta = hn::Sub(Limit(lum), Limit(Lum(c)));
-  for (int k = 0; k < 3; ++k) c[k] = hn::Add(c[k], delta);
-  const auto grey = Limit(Lum(c)), least = Least(c), most = Most(c);
-  PullToGrey(c, grey, hn::Lt(least, zero), grey, hn::Sub(grey, least));
-  PullToGrey(c, grey, hn::Gt(most, one), hn::Sub(one, grey), hn::Sub(most, grey));
+  const Colour shifted = PerChannel([&](F32 x) HWY_ATTR { return hn::Add(x, delta); }, c);
+  const auto grey = Limit(Lum(shifted)), least = Least(shifted), most = Most(shifted);
+  const Colour raised = PullToGrey(shifted, grey, hn::Lt(least, zero), grey, hn::Sub(grey, least));
+  return PullToGrey(raised, grey, hn::Gt(most, one), hn::Sub(one, grey), hn::Sub(most, grey));
 }
 
-HWY_INLINE void SetSat(F32 c[3], F32 sat) {
+HWY_INLINE Colour SetSat(const Colour& c, F32 sat) {
   const auto least = Least(c), range = hn::Sub(Most(c), least);
   const auto isColour = hn::Gt(range, SetFloat(0.0f));
   const auto inverse = hn::Div(SetFloat(1.0f), hn::IfThenElse(isColour, range, SetFloat(1.0f)));
-  for (int k = 0; k < 3; ++k) c[k] = hn::IfThenElseZero(isColour, hn::Mul(hn::Mul(hn::Sub(c[k], least), inverse), sat));
+  const auto stretch = [&](F32 x) HWY_ATTR {
+    return hn::IfThenElseZero(isColour, hn::Mul(hn::Mul(hn::Sub(x, least), inverse), sat));
+  };
+  return PerChannel(stretch, c);
+}
+
+template <VX_BlendMode kMode>
+HWY_INLINE Colour Recoloured(const Colour& s, const Colour& d) {
+  if constexpr (kMode == M::Color) return SetLum(s, Lum(d));
+  if constexpr (kMode == M::Luminosity) return SetLum(d, Lum(s));
+  if constexpr (kMode == M::Hue) return SetLum(SetSat(s, Sat(d)), Lum(d));
+  if constexpr (kMode == M::Saturation) return SetLum(SetSat(d, Sat(s)), Lum(d));
 }
 
 template <VX_BlendMode kMode>
@@ -66,12 +79,7 @@ struct Mode {
   F32 opacity;
   explicit HWY_INLINE Mode(const BlendArguments& arguments) : opacity(SetFloat(arguments.opacity)) {}
   HWY_INLINE Planes operator()(const Planes& s, const Planes& d) const {
-    constexpr bool kKeepsBackground = kMode == M::Luminosity || kMode == M::Saturation;
-    Planes c = kKeepsBackground ? d : s;
-    if constexpr (kMode == M::Hue) SetSat(c.colour, Sat(d.colour));
-    if constexpr (kMode == M::Saturation) SetSat(c.colour, Sat(s.colour));
-    SetLum(c.colour, Lum(kMode == M::Luminosity ? s.colour : d.colour));
-    return Composite(s, d, hn::Mul(s.alpha, opacity), c.colour);
+    return Composite(s, d, hn::Mul(s.alpha, opacity), Recoloured<kMode>(s.colour, d.colour));
   }
 };
 

@@ -38,11 +38,10 @@ struct Mode {
   explicit HWY_INLINE Mode(const BlendArguments& arguments)
       : opacity(SetFloat(arguments.opacity)), most(SetFloat(arguments.most)) {}
   HWY_INLINE Planes operator()(const Planes& s, const Planes& d) const {
-    const F32 blended[3] = {Channel<kMode>(s.colour[0], d.colour[0]), Channel<kMode>(s.colour[1], d.colour[1]),
-                            Channel<kMode>(s.colour[2], d.colour[2])};
+    const Colour blended = PerChannel(Channel<kMode>, s.colour, d.colour);
     Planes out = Composite(s, d, hn::Mul(s.alpha, opacity), blended);
     if constexpr (kMode == VX_BlendMode::Divide)
-      for (F32& c : out.colour) c = hn::Min(most, c);  // NaN stays
+      out.colour = PerChannel([&](F32 c) HWY_ATTR { return hn::Min(most, c); }, out.colour);  // NaN stays
     return out;
   }
 };

@@ -22,20 +22,21 @@ namespace {
 // The pixel of `a` where the mask says so, else that of `b`.
 template <class Mask>
 HWY_INLINE Planes Choose(Mask mask, const Planes& a, const Planes& b) {
-  return {{hn::IfThenElse(mask, a.colour[0], b.colour[0]), hn::IfThenElse(mask, a.colour[1], b.colour[1]),
-           hn::IfThenElse(mask, a.colour[2], b.colour[2])},
-          hn::IfThenElse(mask, a.alpha, b.alpha)};
+  const auto choose = [&](F32 x, F32 y) HWY_ATTR { return hn::IfThenElse(mask, x, y); };
+  return {PerChannel(choose, a.colour, b.colour), choose(a.alpha, b.alpha)};
 }
 
 template <VX_BlendMode kMode>
 struct Mode {
-  F32 opacity, weights[3];
+  F32 opacity;
+  Colour weights;
   explicit HWY_INLINE Mode(const BlendArguments& arguments)
       : opacity(SetFloat(arguments.opacity)),
         weights{SetFloat(arguments.luma[0]), SetFloat(arguments.luma[1]), SetFloat(arguments.luma[2])} {}
 
-  HWY_INLINE F32 Luma(const F32 c[3]) const {
-    return Limit(hn::Add(hn::Add(hn::Mul(weights[2], c[2]), hn::Mul(weights[1], c[1])), hn::Mul(weights[0], c[0])));
+  HWY_INLINE F32 Luma(const Colour& c) const {
+    return Limit(
+        hn::Add(hn::Add(hn::Mul(weights.red, c.red), hn::Mul(weights.green, c.green)), hn::Mul(weights.blue, c.blue)));
   }
   HWY_INLINE Planes operator()(const Planes& s, const Planes& d) const {
     const auto as = hn::Mul(s.alpha, opacity), guard = SetFloat(kAlphaGuard);
