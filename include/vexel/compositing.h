@@ -177,6 +177,23 @@ VX_API VX_Result VX_OneBitMaskComposite(const void* a, int32_t aRowBytes, VX_Pix
 
 /* ---- Fills, dissolves, sums -------------------------------------------------------------------------------------- */
 
+/* Fill a whole buffer with a constant. Rows are whole pixels, 4:2:2 pairs (an odd width fills its last pair) or V210
+ * groups; their padding is not touched. Black and white are
+ *
+ *   RGB            0 and full scale (255, 32768, 1.0; 1023 in 10 bits), linear light too
+ *   YUV 8u         luma 16 and 235, chroma 128; in V210 four times that, in 32f 0 and 1 with chroma 0
+ *   4:2:0 planar   luma 16 and 235, chroma 128, full range too; width / 2 x height / 2 samples of chroma, rounded down.
+ *                  The block is laid out as VX_GetPlanarBuffers says, its row bytes are not used
+ *   4:2:0 biplanar the same, in 10 bits times 256, but for whole chroma planes, halves rounded up
+ *   NTSCDV25       black only: a compressed frame of 120,000 bytes, 720 x 480 4:1:1 with two silent channels of sound;
+ *   PALDV25        one of 144,000 bytes, 720 x 576 4:2:0. Whatever width, height (unless 0) and row bytes say
+ *
+ * An opaque fill writes alpha, the ignored one of X formats too, as full scale. Every other format (DV50, DV100, white
+ * DV25, planar 4:2:0 above 8 bits, Invalid) is VX_ErrFormatNotHandled. A transparent fill writes the same colours under
+ * alpha 0, in premultiplied formats too; formats without straight or premultiplied alpha are
+ * VX_ErrUnsupportedDestinationFormat.
+ *
+ * More than one row with |rowBytes| below a row's bytes is VX_ErrArgumentOutOfRange. */
 VX_API VX_Result VX_FillWithOpaqueBlack(void* base, int32_t rowBytes, int32_t width, int32_t height,
                                         VX_PixelFormat format) VX_NOEXCEPT;
 VX_API VX_Result VX_FillWithTransparentBlack(void* base, int32_t rowBytes, int32_t width, int32_t height,
@@ -185,14 +202,43 @@ VX_API VX_Result VX_FillWithOpaqueWhite(void* base, int32_t rowBytes, int32_t wi
                                         VX_PixelFormat format) VX_NOEXCEPT;
 VX_API VX_Result VX_FillWithTransparentWhite(void* base, int32_t rowBytes, int32_t width, int32_t height,
                                              VX_PixelFormat format) VX_NOEXCEPT;
+/* Fills a 4:4:4:4 buffer with an A, P or X channel with one pixel, converted into the buffer's format as VX_Convert
+ * does it; of a 4:2:2 pair or V210 group the first pixel counts. VX_ErrUnsupportedFormat: another buffer format, or a
+ * DV or 4:2:0 colour. VX_ErrNullSource: no colour. Other codes as VX_Convert. */
 VX_API VX_Result VX_FillWithColor(void* base, int32_t rowBytes, int32_t width, int32_t height, VX_PixelFormat format,
                                   const void* color, VX_PixelFormat colorFormat) VX_NOEXCEPT;
+
+/* dst = a (1 - mix) + b mix. A mix below 8e-6, NaN included, is VX_Convert of a, one within 8e-6 of 1 or above is
+ * VX_Convert of b, with all that it accepts (4:2:0, for instance) and returns; the other image is not looked at.
+ *
+ * In between, both images are converted into the destination's format and mixed there: channel by channel where alpha
+ * is premultiplied or missing, and under opaque alpha where it is ignored. Straight alpha weights the colours (c =
+ * (ca aa (1 - mix) + cb ab mix) / alpha, alpha = aa (1 - mix) + ab mix; black where alpha is below 8e-6), so pixels of
+ * equal alpha mix channel by channel as well. 10-bit formats mix as codes, linear ones in light. If any of the three
+ * depths differs from the others, all are mixed in 32-bit float and rounded once, unless `precisionHint` is 2. The hint
+ * is also the render quality of the conversions. Products and sums are single precision; integers round to nearest,
+ * ties to even, and 15u counts at most 32768. An odd width of 4:2:2 mixes its last pair whole.
+ *
+ * VX_ErrUnsupportedFormat: a DV or 4:2:0 source; VX_ErrUnsupportedDestinationFormat: such a destination. VX_ErrFailed:
+ * no conversion. */
 VX_API VX_Result VX_CrossDissolve(const void* a, int32_t aRowBytes, VX_PixelFormat aFormat, const void* b,
                                   int32_t bRowBytes, VX_PixelFormat bFormat, void* dst, int32_t dstRowBytes,
                                   VX_PixelFormat dstFormat, int32_t width, int32_t height, float mix,
                                   int32_t precisionHint) VX_NOEXCEPT;
+
+/* dst = min(255, src * constant * 2^-scale) for four channels of bytes, rounded to nearest, ties to even; any scale.
+ * Everything that it refuses is VX_ErrFailed: null pointers, sizes below 1, |rowBytes| below a row's. */
 VX_API VX_Result VX_MultiplyByConstant(int32_t width, int32_t height, const void* src, int32_t srcRowBytes, void* dst,
                                        int32_t dstRowBytes, const uint8_t constant[4], int32_t scale) VX_NOEXCEPT;
+
+/* dst = the sum of weights[i] * srcs[i] over `count` images of any raster formats, all of one size. Null weights are
+ * all 1; an image of weight 0 is not read. Sums are taken in 32-bit float in the order of the images, in the
+ * destination's channels, and brought to its depth once, saturated as VX_Convert does; YUV sums up about black. Alpha
+ * is a channel like the others, opaque where it is ignored; where straight alphas differ, sum up into a premultiplied
+ * format. `precisionHint` is the render quality of the conversions.
+ *
+ * No images give black, with alpha 0 where there is one. VX_ErrArgumentOutOfRange: a negative count too.
+ * VX_ErrNullSource: one of the arrays, or one of the images. Formats as in VX_CrossDissolve. */
 VX_API VX_Result VX_Accumulate(const void* const* srcs, const int32_t* srcRowBytes, const VX_PixelFormat* srcFormats,
                                int32_t count, void* dst, int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width,
                                int32_t height, const float* weights, int32_t precisionHint) VX_NOEXCEPT;

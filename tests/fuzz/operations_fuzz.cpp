@@ -115,6 +115,18 @@ Operation AlphaGain(Input& input) {
           }};
 }
 
+Operation Accumulate(Input& input) {
+  const std::vector<float> weights = {input.Fraction(), input.Fraction(), input.Fraction()};
+  const std::vector<F> sources = {input.Raster(), input.Raster(), input.Raster()};
+  const F dst = input.Raster();
+  return {sources, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
+            const void* const bases[] = {from[0].base, from[1].base, from[2].base};
+            const int32_t rowBytes[] = {from[0].rowBytes, from[1].rowBytes, from[2].rowBytes};
+            return VX_Accumulate(bases, rowBytes, sources.data(), 3, to.base, to.rowBytes, to.format, to.width,
+                                 to.height, weights.data(), 3);
+          }};
+}
+
 Operation Fill(Input& input) {
   static constexpr auto kFills = {VX_FillWithOpaqueBlack, VX_FillWithTransparentBlack, VX_FillWithOpaqueWhite,
                                   VX_FillWithTransparentWhite};
@@ -125,8 +137,8 @@ Operation Fill(Input& input) {
           }};
 }
 
-constexpr Operation (*kOperations[])(Input&) = {Convert,       Rotate,    Composite, CompositeToBlack,
-                                                CrossDissolve, AlphaGain, Fill};
+constexpr Operation (*kOperations[])(Input&) = {Convert,       Rotate,    Composite,  CompositeToBlack,
+                                                CrossDissolve, AlphaGain, Accumulate, Fill};
 
 // A refusal depends on formats and arguments only, not on the buffers.
 VX_Result Verdict(const Operation& operation) {
