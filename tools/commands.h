@@ -17,5 +17,7 @@ void AddColorCommand(CLI::App& app);
 void AddCompositeCommand(CLI::App& app);
 void AddBlendSheetCommand(CLI::App& app);
 void AddKernelsCommand(CLI::App& app);
+void AddPackCommand(CLI::App& app);
+void AddUnpackCommand(CLI::App& app);
 
 }  // namespace tool

@@ -28,6 +28,8 @@ void AddCommands(CLI::App& app) {
   tool::AddCompositeCommand(app);
   tool::AddBlendSheetCommand(app);
   tool::AddKernelsCommand(app);
+  tool::AddPackCommand(app);
+  tool::AddUnpackCommand(app);
 }
 
 // A word that is no command deserves better than "a command is required".
