@@ -3,6 +3,7 @@
 #include <cmath>
 
 #include "composite/AlphaUtilityKernels.h"
+#include "composite/Opacity.h"
 #include "composite/RowJob.h"
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
@@ -11,7 +12,6 @@
 namespace vexel {
 namespace {
 
-constexpr float kNothing = 8e-6f;   // opacities and gains below it are 0, ones as close to 1 are 1
 constexpr float kMostGain8u = 255;  // greater ones give the same codes
 
 // The kernel that works in a format itself; null if there is none.
@@ -42,7 +42,7 @@ using namespace vexel;
 bool VX_IsOpacityNOP(int32_t blendMode, float opacity) noexcept {
   const FpModeGuard fpMode;
   const auto mode = static_cast<VX_BlendMode>(blendMode);
-  return (mode == VX_BlendMode::Dissolve || mode == VX_BlendMode::Normal) && std::fabs(opacity - 1) < kNothing;
+  return (mode == VX_BlendMode::Dissolve || mode == VX_BlendMode::Normal) && std::fabs(opacity - 1) < kOpacityMargin;
 }
 
 VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
@@ -51,7 +51,7 @@ VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcF
   const FpModeGuard fpMode;
   if (IsSpecial(srcFormat)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dstFormat)) return VX_ErrUnsupportedDestinationFormat;
-  if (!(gain >= kNothing)) return VX_FillWithTransparentBlack(dst, dstRowBytes, width, height, dstFormat);
+  if (!(gain >= kOpacityMargin)) return VX_FillWithTransparentBlack(dst, dstRowBytes, width, height, dstFormat);
 
   const VX_PixelFormat working = WorkingFormat(dstFormat, precisionHint);
   RowJob job(width, height, precisionHint);

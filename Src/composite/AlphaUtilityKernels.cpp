@@ -10,6 +10,7 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
+#include "composite/TwoRows-inl.h"
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
 
@@ -52,24 +53,10 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
 
-// As RowLoop, for two sources of which each may be the destination. Calls body(a, b, dst, index) for each block.
-template <size_t kBlock, class Body>
-HWY_INLINE void MergeLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
-  size_t i = 0;
-  for (; i + kBlock <= bytes; i += kBlock) body(a + i, b + i, dst + i, i / kBlock);
-  if (const size_t rest = bytes - i) {
-    alignas(64) uint8_t blockA[kBlock] = {}, blockB[kBlock] = {}, out[kBlock];
-    std::memcpy(blockA, a + i, rest);
-    std::memcpy(blockB, b + i, rest);
-    body(blockA, blockB, out, i / kBlock);
-    std::memcpy(dst + i, out, rest);
-  }
-}
-
 // Maps vectors of lane type T by op(a, b).
 template <class T, class Op>
 HWY_INLINE void MergeRow(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Op& op) {
-  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t) HWY_ATTR {
+  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out) HWY_ATTR {
     const auto r0 = op(LoadVector<T>(inA, 0), LoadVector<T>(inB, 0));
     const auto r1 = op(LoadVector<T>(inA, 1), LoadVector<T>(inB, 1));
     const auto r2 = op(LoadVector<T>(inA, 2), LoadVector<T>(inB, 2));
@@ -79,7 +66,7 @@ HWY_INLINE void MergeRow(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_
     StoreVector(r2, out, 2);
     StoreVector(r3, out, 3);
   };
-  MergeLoop<4 * HWY_MAX_BYTES>(a, b, dst, bytes, body);
+  TwoRowLoop<4 * HWY_MAX_BYTES>(a, b, dst, bytes, body);
 }
 
 template <class T, class Op>
@@ -132,11 +119,9 @@ void GainAll8u(const uint8_t* src, uint8_t* dst, size_t count, float gain) {
       return hn::Add(ConvertNearest(hn::Mul(hn::Sub(c, blackFloat), factor)), black);
   };
   constexpr size_t kQuarter = HWY_MAX_BYTES / 4;
-  MergeLoop<HWY_MAX_BYTES>(
-      src, src, dst, count * 4, [&](const uint8_t* in, const uint8_t*, uint8_t* out, size_t) HWY_ATTR {
-        StoreVector(PackTo8(scaled(in), scaled(in + kQuarter), scaled(in + 2 * kQuarter), scaled(in + 3 * kQuarter)),
-                    out);
-      });
+  TwoRowLoop<HWY_MAX_BYTES>(src, src, dst, count * 4, [&](const uint8_t* in, const uint8_t*, uint8_t* out) HWY_ATTR {
+    StoreVector(PackTo8(scaled(in), scaled(in + kQuarter), scaled(in + 2 * kQuarter), scaled(in + 3 * kQuarter)), out);
+  });
 }
 
 template <class L>
@@ -243,15 +228,15 @@ void SelectPixels(const uint8_t* a, const uint8_t* b, const uint32_t* mask, uint
   const hn::ScalableTag<uint32_t> d;
   const auto laneBits = hn::Load(d, kLaneBits.lanes);
   // Where masks have registers of their own, loads under a mask wait for it; so it is made a vector.
-  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out, size_t index) HWY_ATTR {
-    uint32_t bits = mask[index];
+  const auto body = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out) HWY_ATTR {
+    uint32_t bits = *mask++;
     for (size_t i = 0; i < kBlock / HWY_MAX_BYTES; ++i, bits <<= kVectorPixels) {
       const auto takeA = hn::VecFromMask(d, hn::TestBit(hn::Set(d, bits), laneBits));
       const auto fromA = LoadVector<uint32_t>(inA, i), fromB = LoadVector<uint32_t>(inB, i);
       StoreVector(hn::Or(hn::And(takeA, fromA), hn::AndNot(takeA, fromB)), out, i);
     }
   };
-  MergeLoop<kBlock>(a, b, dst, count * kBytes, body);
+  TwoRowLoop<kBlock>(a, b, dst, count * kBytes, body);
 }
 
 }  // namespace
