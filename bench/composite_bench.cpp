@@ -92,7 +92,8 @@ void CompositeCase(const char* name, const Over& over, Size size) {
   });
   report.AddFloor(src.size() + background.size(), dst.size());
   AddThreads(report, work);
-  if (over.src != F::BGRA_4444_8u || over.opacity != 1) return;
+  if (vexel::IsYuv(over.dst) || vexel::IsReversed(over.dst) || vexel::Depth(over.dst) != vexel::kDepth8u) return;
+  if (over.opacity != 1) return;
 #ifdef VEXEL_PEER_PIXMAN
   const Frame from = Frame(over.src, size, over.sourceAlpha, 1).Premultiply();
   const Frame onto = Frame(over.src, size, over.backgroundAlpha, 2).Premultiply();
@@ -148,6 +149,10 @@ void RegisterBenchmarks() {
       CompositeCase("over soft BGRA8", {bgra, bgra, bgra, Alpha::Soft, Alpha::Soft, opacity}, size);
     }
     CompositeCase("over soft BGRA8 in BGRP8", {bgra, bgra, F::BGRP_4444_8u, Alpha::Soft, Alpha::Soft, 1}, size);
+    CompositeCase("BGRP8 over BGRP8 in BGRP8",
+                  {F::BGRP_4444_8u, F::BGRP_4444_8u, F::BGRP_4444_8u, Alpha::Soft, Alpha::Soft, 1}, size);
+    CompositeCase("BGRP8 over BGRX8 in BGRX8",
+                  {F::BGRP_4444_8u, F::BGRX_4444_8u, F::BGRX_4444_8u, Alpha::Soft, Alpha::Opaque, 1}, size);
     CompositeCase("opaque over opaque BGRA8", {F::BGRX_4444_8u, bgra, bgra, Alpha::Opaque, Alpha::Opaque, 0.6f}, size);
     CompositeCase("over soft VUYA8", {F::VUYA_4444_8u, F::VUYA_4444_8u, F::VUYA_4444_8u, Alpha::Soft, Alpha::Soft, 1},
                   size);

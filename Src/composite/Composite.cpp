@@ -49,7 +49,13 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   if (keepsOrder) result = FromBits(Bits(result) | kReversedBit);
   const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, keepsOrder, HasUsableAlpha(src.format),
                           HasUsableAlpha(background.format)};
-  const auto input = [&](bool alpha) { return WithAlphaKind(result, alpha ? kAlphaStraight : kAlphaIgnored); };
+  // Pictures that are premultiplied anyway are composited as they are.
+  const auto is = [](F format, uint32_t kind) { return AlphaKind(format) == kind; };
+  const bool premultiplied = (is(src.format, kAlphaPremultiplied) || is(background.format, kAlphaPremultiplied)) &&
+                             !is(src.format, kAlphaStraight) && !is(background.format, kAlphaStraight) &&
+                             !(choice.straight && choice.backgroundAlpha);
+  const uint32_t inputKind = premultiplied ? kAlphaPremultiplied : kAlphaStraight;
+  const auto input = [&](bool alpha) { return WithAlphaKind(result, alpha ? inputKind : kAlphaIgnored); };
   const F srcFormat = input(choice.sourceAlpha), backgroundFormat = input(choice.backgroundAlpha);
   // An opaque result is the same in every alpha kind.
   if (!choice.backgroundAlpha && AlphaKind(dst.format) == kAlphaIgnored) result = WithAlphaKind(result, kAlphaIgnored);
@@ -64,7 +70,10 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   opacity = UsableOpacity(opacity);
   if (opacity == 0.0f) return CopyPicture(background, dst, width, height, renderQuality);
   if (opacity == 1.0f && !choice.sourceAlpha) return CopyPicture(src, dst, width, height, renderQuality);
-  const OverKernel over = (Depth(result) == kDepth8u ? Over8u(choice) : Over32f(choice))[job.Variant()];
+  const bool narrow = Depth(result) == kDepth8u;
+  const OverKernelSet& kernels = premultiplied ? (narrow ? OverPremultiplied8u(choice) : OverPremultiplied32f(choice))
+                                               : (narrow ? Over8u(choice) : Over32f(choice));
+  const OverKernel over = kernels[job.Variant()];
   return job.Run([=](const RowSpan& span) { over(span.src[0], span.src[1], span.dst, span.count, opacity); });
 }
 

@@ -1,4 +1,4 @@
-// Row kernels of normal compositing: a source over a background, both with straight alpha.
+// Row kernels of normal compositing: a source over a background.
 #pragma once
 
 #include <cstddef>
@@ -22,11 +22,16 @@ struct OverChoice {
   bool sourceAlpha, backgroundAlpha;
 };
 
+// Both rows with straight alpha.
 const OverKernelSet& Over8u(OverChoice choice) noexcept;
 const OverKernelSet& Over32f(OverChoice choice) noexcept;
 
-// For the tables: the choice of an index of five bits, or the one that gives the same results. Over a background
-// without alpha every result is opaque, and straight and premultiplied are the same.
+// All rows premultiplied; `straight` does not count.
+const OverKernelSet& OverPremultiplied8u(OverChoice choice) noexcept;
+const OverKernelSet& OverPremultiplied32f(OverChoice choice) noexcept;
+
+// For the tables: the choice of an index of five bits, or the one that gives the same results with straight rows. Over
+// a background without alpha every result is opaque, and straight and premultiplied are the same.
 inline constexpr size_t kOverChoices = 32;
 constexpr size_t IndexOf(OverChoice c) noexcept {
   return size_t{c.yuv} | size_t{c.straight} << 1 | size_t{c.alphaFirst} << 2 | size_t{c.sourceAlpha} << 3 |

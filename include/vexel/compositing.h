@@ -55,8 +55,10 @@ enum {
  * picture is the destination itself.
  *
  * The arithmetic is the destination's: 8u in 8 bits, anything else (10u and 15u too) in 32f, linear formats in light,
- * 4:2:2 in VUYP_4444_8u or VUYP_4444_32f, 709 formats among them. Destinations without alpha get the result over black.
- * Each pixel's result depends on its own pixels only. In 8u every channel is within 0.52 of the exact result; alpha 0
+ * 4:2:2 in VUYP_4444_8u or VUYP_4444_32f, 709 formats among them. Inputs are brought to straight alpha, but stay
+ * premultiplied where neither is straight and the result is premultiplied or opaque. Destinations without alpha get the
+ * result over black.
+ * Each pixel's result depends on its own pixels only. In 8u every channel is within 0.54 of the exact result; alpha 0
  * and 255 over an opaque background give background and source exactly. Straight results have black for a colour (16,
  * 128, 128 in 8-bit Y'CbCr) where ao is 7.63e-6 or less in 8u, less than 8e-6 in 32f. 32f results are not clamped; the
  * sign and payload of NaNs are unspecified.
