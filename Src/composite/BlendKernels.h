@@ -5,6 +5,7 @@
 #include <cstdint>
 
 #include "frame/KernelVariant.h"
+#include "frame/RuntimeRandom.h"
 #include "vexel/compositing.h"
 
 namespace vexel {
@@ -34,18 +35,28 @@ struct BlendKernels {
   KernelVariants<BlendKernel> floats, bytes;
 };
 
-// Every mode but Dissolve, which has a kernel of its own kind, and Normal.
-#define VX_KERNEL_BLEND_MODES(X)                                                                                 \
-  X(Color)                                                                                                       \
-  X(ColorBurn)                                                                                                   \
-  X(ColorDodge)                                                                                                  \
-  X(Darken) X(DarkerColor) X(Difference) X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten) X(LighterColor)  \
-      X(LinearBurn) X(LinearDodge) X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) X(PinLight) X(Saturation) \
-          X(Screen) X(SoftLight) X(VividLight) X(Subtract) X(Divide)
+// Every mode but Normal, and Dissolve, whose kernels are of another kind.
+#define VX_KERNEL_BLEND_MODES(X)                                                                                    \
+  X(Color)                                                                                                          \
+  X(ColorBurn)                                                                                                      \
+  X(ColorDodge)                                                                                                     \
+  X(Darken)                                                                                                         \
+  X(DarkerColor)                                                                                                    \
+  X(Difference) X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten) X(LighterColor) X(LinearBurn) X(LinearDodge) \
+      X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) X(PinLight) X(Saturation) X(Screen) X(SoftLight)          \
+          X(VividLight) X(Subtract) X(Divide)
 
 #define VX_DECLARE_BLEND(mode) extern const BlendKernels kBlend##mode;
 VX_KERNEL_BLEND_MODES(VX_DECLARE_BLEND)
 #undef VX_DECLARE_BLEND
+
+// Dissolve copies the source pixel with a probability of its alpha times the opacity, else the background's: pixels of
+// four bytes with straight alpha, first if `reversed`, or BGRA_4444_32f. By place, every pixel draws from the sequence,
+// needed or not; in turn, only pixels that need it, so that one vector would have to wait for the other.
+using DissolveBlendKernel = void (*)(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count,
+                                     bool reversed, float opacity, RandomSequence& sequence);
+extern const KernelVariants<DissolveBlendKernel> kBlendDissolveBytesByPlace, kBlendDissolveFloatsByPlace;
+extern const DissolveBlendKernel kBlendDissolveBytesInTurn, kBlendDissolveFloatsInTurn;
 
 // Below this, an alpha counts as nothing.
 inline constexpr float kAlphaGuard = 8e-6f;

@@ -1,10 +1,8 @@
-// VX_CompositeWithBlendMode: the choice of a kernel, and Dissolve.
+// VX_CompositeWithBlendMode: the choice of a kernel and of its working formats.
 #include <cmath>
-#include <cstring>
 #include <limits>
 
 #include "composite/BlendKernels.h"
-#include "composite/PlainBlend.h"
 #include "composite/RowJob.h"
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
@@ -78,62 +76,30 @@ VX_Result Blend(const BlendJob& blend, const BlendKernels& kernels) noexcept {
   });
 }
 
-// ---- Dissolve
-
-// Copies the source pixel with a probability of its alpha times `opacity`, else the background's. kPixel is
-// the size of a pixel. kPlaced draws for every pixel, needed or not, so that a pixel's place decides what it gets.
-// Without branches, which nothing could predict.
-template <size_t kPixel, bool kPlaced>
-void DissolveRow(const RowSpan& span, size_t alphaAt, float opacity, RandomSequence& randomSequence) noexcept {
-  const uint8_t *const src = span.src[0], *const background = span.src[1];
-  uint8_t* const dst = span.dst;
-  const size_t end = span.count * kPixel;
-  RandomSequence sequence = randomSequence;
-  for (size_t at = 0; at < end; at += kPixel) {
-    float alpha = src[at + alphaAt] * k8uTo32f;
-    if constexpr (kPixel == 16) std::memcpy(&alpha, src + at + alphaAt, sizeof alpha);
-    const float p = alpha * opacity;
-    // More than certain is certain; NaN counts as negative.
-    const int n = static_cast<int>(plain::Min(plain::Max(p, -1), 1) * 32767.0f);
-    const bool isNothing = std::fabs(p) < kAlphaGuard;
-    RandomSequence next = sequence;
-    const int r = next.Next();
-    if (kPlaced || (!isNothing & (n >= 0))) sequence = next;
-    const uint32_t fromBackground = 0u - static_cast<uint32_t>(isNothing | ((n >= 0) & (r > n)));
-    uint32_t s[kPixel / 4], d[kPixel / 4];
-    std::memcpy(s, src + at, kPixel);
-    std::memcpy(d, background + at, kPixel);
-    for (size_t i = 0; i < kPixel / 4; ++i) d[i] = (d[i] & fromBackground) | (s[i] & ~fromBackground);
-    std::memcpy(dst + at, d, kPixel);
-  }
-  randomSequence = sequence;
-}
-
-template <size_t kPixel>
-VX_Result DissolveIn(const BlendJob& blend, size_t alphaAt) noexcept {
-  if (blend.height > RowJob::kInlineRows)
-    return RunJob(blend, kPixel == 4, [&](const RowSpan& span, KernelVariant) {
+// In taller pictures than one thread works on, a pixel's place decides what it draws.
+VX_Result Dissolve(const BlendJob& blend) noexcept {
+  // Pixels of four bytes can be copied where all three pictures have them alike.
+  const VX_PixelFormat format = blend.dst.format;
+  const bool inBytes = IsByteRgb(format) && AlphaKind(format) == kAlphaStraight && blend.src.format == format &&
+                       blend.background.format == format;
+  const bool reversed = IsReversed(format);
+  if (blend.height > RowJob::kInlineRows) {
+    const auto& variants = inBytes ? kBlendDissolveBytesByPlace : kBlendDissolveFloatsByPlace;
+    return RunJob(blend, inBytes, [&](const RowSpan& span, KernelVariant variant) {
       RandomSequence sequence(1);
       sequence.Skip(static_cast<uint64_t>(span.row) * static_cast<uint64_t>(blend.width) +
                     static_cast<uint64_t>(span.column));
-      DissolveRow<kPixel, true>(span, alphaAt, blend.opacity, sequence);
+      variants[variant](span.src[0], span.src[1], span.dst, span.count, reversed, blend.opacity, sequence);
     });
+  }
   // Not the thread's own sequence: scratch memory may draw from that one.
   RandomSequence sequence = RuntimeRandomSequence();
-  const VX_Result result = RunJob(blend, kPixel == 4, [&](const RowSpan& span, KernelVariant) {
-    DissolveRow<kPixel, false>(span, alphaAt, blend.opacity, sequence);
+  const DissolveBlendKernel kernel = inBytes ? kBlendDissolveBytesInTurn : kBlendDissolveFloatsInTurn;
+  const VX_Result result = RunJob(blend, inBytes, [&](const RowSpan& span, KernelVariant) {
+    kernel(span.src[0], span.src[1], span.dst, span.count, reversed, blend.opacity, sequence);
   });
   RuntimeRandomSequence() = sequence;
   return result;
-}
-
-// Pixels of four bytes can be copied where all three pictures have them alike.
-VX_Result Dissolve(const BlendJob& blend) noexcept {
-  const VX_PixelFormat format = blend.dst.format;
-  if (IsByteRgb(format) && AlphaKind(format) == kAlphaStraight && blend.src.format == format &&
-      blend.background.format == format)
-    return DissolveIn<4>(blend, IsReversed(format) ? 0 : 3);
-  return DissolveIn<16>(blend, 12);
 }
 
 }  // namespace

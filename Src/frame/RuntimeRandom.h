@@ -13,6 +13,7 @@ class RandomSequence {
     mState = mState * kFactor + kAddend;
     return static_cast<int>(mState >> 16 & 0x7FFF);
   }
+  constexpr uint32_t State() const { return mState; }
   // As `draws` calls of Next, in a few steps.
   constexpr void Skip(uint64_t draws) {
     uint32_t factor = kFactor, addend = kAddend;
