@@ -22,6 +22,8 @@ struct OverChoice {
   bool sourceAlpha, backgroundAlpha;
 };
 
+constexpr size_t AlphaAt(OverChoice choice) noexcept { return choice.alphaFirst ? 0 : 3; }
+
 // Both rows with straight alpha.
 const OverKernelSet& Over8u(OverChoice choice) noexcept;
 const OverKernelSet& Over32f(OverChoice choice) noexcept;

@@ -24,8 +24,6 @@ namespace {
 // A straight result with less alpha than this has no colour.
 constexpr float kLeastAlpha = 8e-6f;
 
-constexpr size_t AlphaAt(OverChoice choice) { return choice.alphaFirst ? 0 : 3; }
-
 }  // namespace
 }  // namespace vexel
 #endif

@@ -27,10 +27,7 @@ namespace {
 
 // A straight result's alpha up to this counts as none; the colour is black then.
 constexpr float kClearAlpha = 7.6293945e-6f;
-constexpr int kBlackVuy[4] = {128, 128, 16, 0};
 constexpr uint32_t kBlackVuyWord = 0x00108080;
-
-constexpr size_t AlphaAt(OverChoice choice) { return choice.alphaFirst ? 0 : 3; }
 
 }  // namespace
 }  // namespace vexel

@@ -1,9 +1,14 @@
-// Scalar definitions of 8-bit compositing over opaque pixels.
+// 8-bit compositing: black, and scalar definitions of the arithmetic.
 #pragma once
 
 #include <cstdint>
 
-namespace vexel::plain {
+namespace vexel {
+
+// Of V, U, Y and alpha.
+inline constexpr int kBlackVuy[4] = {128, 128, 16, 0};
+
+namespace plain {
 
 // n / 255 to nearest; there are no ties.
 inline int Divide255(int n) { return (2 * n + 255) / 510; }
@@ -20,4 +25,11 @@ inline int Weight15(int alpha, uint16_t fixedOpacity) { return alpha * fixedOpac
 // s weight + d (1 - weight), rounded to nearest, ties up. (A shift of negative numbers rounds down.)
 inline uint8_t Mix15(int s, int d, int weight) { return static_cast<uint8_t>(d + (((s - d) * weight + 16384) >> 15)); }
 
-}  // namespace vexel::plain
+// An opacity of 0..1 in 1/32768, at most 32767: a product with a code, rounded to 1/64, is then the code itself.
+inline int Factor15(float opacity) {
+  const float scaled = opacity * 32768.0f + 0.5f;
+  return static_cast<int>(scaled < 32767.0f ? scaled : 32767.0f);
+}
+
+}  // namespace plain
+}  // namespace vexel

@@ -17,25 +17,6 @@
 #include "convert/FloatPixels-inl.h"
 #include "frame/KernelTable.h"
 
-#ifndef VEXEL_COMPOSITE_PREMULTIPLIEDKERNELS_SHARED
-#define VEXEL_COMPOSITE_PREMULTIPLIEDKERNELS_SHARED
-namespace vexel {
-namespace {
-
-constexpr int kBlackVuy[4] = {128, 128, 16, 0};
-
-constexpr size_t AlphaAt(OverChoice choice) { return choice.alphaFirst ? 0 : 3; }
-
-// As a factor in 1/32768. At most 32767, which leaves a code in 1/64 as it is.
-inline int16_t Factor15(float opacity) {
-  const float scaled = opacity * 32768.0f + 0.5f;
-  return static_cast<int16_t>(scaled < 32767.0f ? scaled : 32767.0f);
-}
-
-}  // namespace
-}  // namespace vexel
-#endif
-
 #if HWY_TARGET != HWY_BASELINE_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
@@ -47,7 +28,7 @@ using I16Tag = hn::ScalableTag<int16_t>;
 template <OverChoice kChoice>
 struct Adder {
   explicit HWY_INLINE Adder(float opacity)
-      : forSource(hn::Set(I16Tag(), Factor15(opacity))),
+      : forSource(hn::Set(I16Tag(), static_cast<int16_t>(plain::Factor15(opacity)))),
         fixedOpacity(hn::Set(hn::ScalableTag<uint16_t>(), plain::FixedOpacity(opacity))) {}
 
   HWY_INLINE U8 operator()(U8 s, U8 d) const {

@@ -28,7 +28,6 @@ struct BlackLayout {
   bool vuy;
 };
 constexpr BlackLayout kLast = {3, false}, kFirst = {0, false}, kVuya = {3, true};
-constexpr int kBlackVuy[4] = {128, 128, 16, 0};
 
 // 0..255; opacity is 0..1.
 inline int Opacity255(float opacity) { return static_cast<int>(opacity * 255 + 0.5f); }

@@ -113,8 +113,8 @@ VX_API VX_Result VX_CompositeWithBlendMode(const void* src, int32_t srcRowBytes,
 VX_API VX_Result VX_CompositeToBlack(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                                      int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                                      float opacity, int32_t precisionHint) VX_NOEXCEPT;
-/* The same at full opacity, row by row: rows whose alpha is opaque throughout (255, 1.0) are converted straight from
- * the source format to the destination's, those whose alpha is 0 throughout are filled with opaque black. *alphaState
+/* The same at full opacity, row by row: rows whose alpha as worked on is opaque throughout (255, 1.0) are converted
+ * straight from the source format to the destination's, those with alpha 0 throughout are filled with opaque black. *alphaState
  * receives 0 if every row was opaque (also if there are none), 1 if every row was clear, 2 otherwise; it may be null,
  * and stays as it is on failure. In place, opaque rows are not touched. */
 VX_API VX_Result VX_CompositeToBlackAndTestSourceAlpha(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat,
