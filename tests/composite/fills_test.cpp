@@ -91,18 +91,6 @@ TEST(Fills, EveryRasterByItsName) {
     }
 }
 
-TEST(Fills, V210IsTheConvertedPixel) {
-  for (const F format : {F::V210_422_10u, F::V210_422_10u_709})
-    for (const auto& f : {kFills[0], kFills[2]}) {
-      const F pixels = format == F::V210_422_10u ? F::VUYP_4444_8u : F::VUYP_4444_8u_709;
-      Bytes row(48), group(16), filled(16);
-      ASSERT_EQ(f.fill(row.data(), 24, 6, 1, pixels), VX_Success);
-      ASSERT_EQ(VX_Convert(row.data(), 24, pixels, group.data(), 16, format, 6, 1, 3), VX_Success);
-      ASSERT_EQ(f.fill(filled.data(), 16, 1, 1, format), VX_Success);
-      EXPECT_EQ(filled, group);
-    }
-}
-
 // Planar chroma is half the size, rounded down; interleaved chroma is filled whole.
 TEST(Fills, PlanesOf420) {
   for (const F format : Formats420())
@@ -172,42 +160,27 @@ TEST(Fills, Arena) {
 }
 
 TEST(Fills, Refusals) {
-  constexpr F kOpaqueFrame = FromBits(0x7F000004), kPlanar10 = FromBits(0x0C000A71);
-  const struct {
-    F format;
-    VX_Result opaqueBlack, opaqueWhite, transparent, color;
-  } formats[] = {
-      {F::NTSCDV50, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
-       VX_ErrUnsupportedFormat},
-      {F::PAL_DV100_1080i, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
-       VX_ErrUnsupportedFormat},
-      {F::Invalid, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
-       VX_ErrUnsupportedFormat},
-      {kOpaqueFrame, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
-       VX_ErrUnsupportedFormat},
-      {kPlanar10, VX_ErrFormatNotHandled, VX_ErrFormatNotHandled, VX_ErrUnsupportedDestinationFormat,
-       VX_ErrUnsupportedFormat},
+  constexpr F kFrame = FromBits(0x7F000004), kPlanar10 = FromBits(0x0C000A71), kBiplanar10 = FromBits(0x0E000A71),
+              kBgra = F::BGRA_4444_8u;
+  const auto color = [](void* p, F format, F colorFormat) {
+    return VX_FillWithColor(p, 64, 4, 4, format, p, colorFormat);
   };
-  for (const auto& c : formats) {
-    const std::string name = VX_PixelFormatName(c.format);
-    for (const int32_t size : {4, 0, -1}) {
-      ExpectRefusal(name, c.opaqueBlack, [&](void* p) { return VX_FillWithOpaqueBlack(p, 64, size, 4, c.format); });
-      ExpectRefusal(name, c.opaqueWhite, [&](void* p) { return VX_FillWithOpaqueWhite(p, 64, size, 4, c.format); });
-      ExpectRefusal(name, c.transparent,
-                    [&](void* p) { return VX_FillWithTransparentBlack(p, 64, size, 4, c.format); });
-      ExpectRefusal(name, c.transparent,
-                    [&](void* p) { return VX_FillWithTransparentWhite(p, 64, size, 4, c.format); });
-      ExpectRefusal(name, c.color,
-                    [&](void* p) { return VX_FillWithColor(p, 64, size, 4, c.format, p, F::BGRA_4444_8u); });
-    }
+  for (const F format :
+       {F::NTSCDV50, F::PALDV50, F::NTSC_DV100_720p, F::PAL_DV100_1080i, F::Invalid, kFrame, kPlanar10}) {
+    for (const auto& f : kFills)
+      for (const int32_t size : {4, 0, -1})
+        ExpectRefusal(f.name, f.opaque ? VX_ErrFormatNotHandled : VX_ErrUnsupportedDestinationFormat,
+                      [&](void* p) { return f.fill(p, 64, size, 4, format); });
+    ExpectRefusal("colour into", VX_ErrUnsupportedFormat, [&](void* p) { return color(p, format, kBgra); });
   }
-  for (const F color : {F::NTSCDV25, F::YUV_420_MPEG2_FRAME, kOpaqueFrame})
-    ExpectRefusal("colour", VX_ErrUnsupportedFormat,
-                  [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_8u, p, color); });
-  ExpectRefusal("no chain", VX_ErrFailed,
-                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_32f, p, F::Invalid); });
-  ExpectRefusal("null colour", VX_ErrNullSource,
-                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, F::BGRA_4444_8u, nullptr, F::BGRA_4444_8u); });
+  for (const F format : {F::NTSCDV25, F::PALDV25})
+    ExpectRefusal("white DV", VX_ErrFormatNotHandled,
+                  [&](void* p) { return VX_FillWithOpaqueWhite(p, 0, 720, 480, format); });
+  for (const F format : {F::NTSCDV25, F::YUV_420_MPEG2_FRAME, kFrame})
+    ExpectRefusal("colour of", VX_ErrUnsupportedFormat, [&](void* p) { return color(p, kBgra, format); });
+  ExpectRefusal("no chain", VX_ErrFailed, [&](void* p) { return color(p, F::BGRA_4444_32f, F::Invalid); });
+  ExpectRefusal("no colour", VX_ErrNullSource,
+                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, kBgra, nullptr, kBgra); });
 
   const struct {
     int32_t width, height, rowBytes;
@@ -222,22 +195,22 @@ TEST(Fills, Refusals) {
                {4, 4, -15, false, VX_ErrArgumentOutOfRange},
                {4, 4, 64, true, VX_ErrNullDestination}};
   const uint32_t pixel = 0;
-  for (const auto& s : sizes)
-    for (const F format : {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, FromBits(0x0E000A71)}) {
-      if (Is420(format) && s.rowBytes != 64) continue;
-      const std::string what = std::to_string(s.width) + "x" + std::to_string(s.height);
-      for (const auto& f : kFills)
-        if (f.opaque || !Is420(format))
-          ExpectRefusal(what, s.expected,
-                        [&](void* p) { return f.fill(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format); });
-      if (!Is420(format))
-        ExpectRefusal(what, s.expected, [&](void* p) {
-          return VX_FillWithColor(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format, &pixel, format);
-        });
-    }
+  for (const auto& s : sizes) {
+    const std::string what = std::to_string(s.width) + "x" + std::to_string(s.height);
+    const auto refuses = [&](Fill fill, F format) {
+      ExpectRefusal(what, s.expected,
+                    [&](void* p) { return fill(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format); });
+    };
+    for (const auto& f : kFills) refuses(f.fill, kBgra);
+    for (const F format : {F::YUV_420_MPEG2_FRAME, kBiplanar10})
+      if (s.rowBytes == 64) refuses(VX_FillWithOpaqueBlack, format);
+    ExpectRefusal(what, s.expected, [&](void* p) {
+      return VX_FillWithColor(s.null ? nullptr : p, s.rowBytes, s.width, s.height, kBgra, &pixel, kBgra);
+    });
+  }
 }
 
-// A DV frame as its blocks say: every section where it belongs, video that decodes to black by its mean values.
+// Every block of a DV frame is where it says; what is in them is for a decoder to tell (tests/tool/fill.sh).
 TEST(Fills, DvFramesAreWhole) {
   for (const F format : {F::NTSCDV25, F::PALDV25}) {
     const bool is625 = format == F::PALDV25;
@@ -247,35 +220,15 @@ TEST(Fills, DvFramesAreWhole) {
     ASSERT_EQ(VX_FillWithOpaqueBlack(again.data(), 1, 1, 1, format), VX_Success);
     EXPECT_EQ(frame[size], 0x77);
     EXPECT_TRUE(std::equal(frame.begin(), frame.end() - 1, again.begin()));
-    int videoSources = 0, audioSources = 0;
+    EXPECT_EQ(frame[3] >> 7, is625);
     for (size_t i = 0; i < size / 80; ++i) {
-      const uint8_t* block = &frame[80 * i];
-      const size_t inSequence = i % 150, inGroup = inSequence < 6 ? 0 : (inSequence - 6) % 16;
-      const int section = inSequence == 0 ? 0 : inSequence < 3 ? 1 : inSequence < 6 ? 2 : inGroup == 0 ? 3 : 4;
-      const size_t number = section < 2    ? inSequence - section
-                            : section == 2 ? inSequence - 3
-                            : section == 3 ? (inSequence - 6) / 16
-                                           : (inSequence - 6) / 16 * 15 + inGroup - 1;
-      ASSERT_EQ(block[0] >> 5, section);
-      ASSERT_EQ(block[1] >> 4, static_cast<int>(i / 150));
-      ASSERT_EQ(block[2], number);
-      ASSERT_TRUE(section != 0 || block[3] >> 7 == is625);
-      if (section == 2)
-        for (const uint8_t* pack = block + 3; pack < block + 78; pack += 5)
-          videoSources += pack[0] == 0x60 && (pack[3] >> 5 & 1) == is625;
-      if (section == 3) {
-        audioSources += block[3] == 0x50;
-        for (int k = 8; k < 80; ++k) ASSERT_EQ(block[k], 0);
-      }
-      for (size_t k = 0; section == 4 && k < 6; ++k) {
-        const uint8_t* dct = block + 4 + (k < 4 ? 14 * k : 56 + 10 * (k - 4));
-        const int mean = static_cast<int8_t>(dct[0]) * 2 + (dct[1] >> 7);
-        ASSERT_EQ(mean / 2 + 128, k < 4 ? 16 : 128);
-        ASSERT_EQ(dct[1] & 0x7F, 0x06);
-      }
+      const size_t place = i % 150, group = (place - 6) / 16, inGroup = (place - 6) % 16;
+      const size_t section = place == 0 ? 0 : place < 3 ? 1 : place < 6 ? 2 : inGroup == 0 ? 3 : 4;
+      const size_t number[] = {0, place - 1, place - 3, group, group * 15 + inGroup - 1};
+      ASSERT_EQ(frame[80 * i] >> 5, section);
+      ASSERT_EQ(frame[80 * i + 1] >> 4, i / 150);
+      ASSERT_EQ(frame[80 * i + 2], number[section]);
     }
-    EXPECT_EQ(videoSources, is625 ? 12 : 10);
-    EXPECT_EQ(audioSources, is625 ? 12 : 10);
   }
 }
 
@@ -294,15 +247,6 @@ TEST(Fills, LongRows) {
                   VX_Success);
         ASSERT_TRUE(picture == expected) << FormatName(format) << " " << width << " at " << offset << " gap " << gap;
       }
-}
-
-TEST(Fills, GiantStrides) {
-  for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
-    const ArenaFrame giant = GiantStrideFrame(F::ARGB_4444_8u, 37, 7, rowBytes);
-    ASSERT_EQ(VX_FillWithOpaqueBlack(giant.base, rowBytes, 37, 7, giant.format), VX_Success);
-    for (int row = 0; row < 7; ++row)
-      for (int i = 0; i < 37 * 4; ++i) ASSERT_EQ(giant.Row(row)[i], i % 4 == 0 ? 255 : 0);
-  }
 }
 
 }  // namespace
