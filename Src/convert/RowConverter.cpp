@@ -61,6 +61,17 @@ void RowConverter::RunSteps(const uint8_t* src, uint8_t* dst, size_t count) cons
   }
 }
 
+void RowConverter::StreamInBlocks(const uint8_t* src, uint8_t* dst) const noexcept {
+  for (size_t done = 0; done < mWidth; done += kStreamBlock) {
+    const size_t first = done - std::min(done, kReach), end = std::min(mWidth, done + kStreamBlock + kReach);
+    mSteps[0](src + first / kBlockMultiple * mSrcBytesPerSixPixels, mScratch, end - first);
+    const auto count = static_cast<int64_t>(std::min(kStreamBlock, mWidth - done));
+    StreamCopy(dst + done / kBlockMultiple * mDstBytesPerSixPixels,
+               mScratch + (done - first) / kBlockMultiple * mDstBytesPerSixPixels,
+               static_cast<size_t>(UnpaddedRowBytes(mDstFormat, count)), mVariant);
+  }
+}
+
 void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
   const uint8_t* src = static_cast<const uint8_t*>(srcRow);
   uint8_t* dst = static_cast<uint8_t*>(dstRow);
@@ -68,6 +79,7 @@ void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
     StreamCopy(dst, src, static_cast<size_t>(UnpaddedRowBytes(mDstFormat, static_cast<int64_t>(mWidth))), mVariant);
     return;
   }
+  if (StreamsInBlocks()) return StreamInBlocks(src, dst);
   if (mStepCount == 1 && !mStream) {
     mSteps[0](src, dst, mWidth);
     return;

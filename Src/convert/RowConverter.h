@@ -15,6 +15,10 @@ namespace vexel {
 inline constexpr size_t kChainBlock = 384;
 static_assert(kChainBlock % kBlockMultiple == 0);
 
+// Pixels per block of a kernel that needs its neighbours, and how far it may look to either side.
+inline constexpr size_t kStreamBlock = 1920, kReach = 12;
+static_assert(kStreamBlock % kBlockMultiple == 0 && kReach % kBlockMultiple == 0);
+
 // Use: Prepare, then give it ScratchBytes() bytes with UseScratch (none needed when 0), then Convert any number of
 // rows. A prepared converter is read-only but for its scratch memory: copies with scratch of their own may run in
 // parallel.
@@ -26,8 +30,7 @@ class RowConverter {
 
   // For destinations too large for the cache: the last step's output goes past the cache. Before ScratchBytes. Call
   // StreamFence (frame/StreamCopy.h) after the last row.
-  // A single kernel that needs whole rows writes them itself: staging rows that leave the first-level cache costs more.
-  void StreamOutput() noexcept { mStream = !(mWholeRow && mStepCount == 1); }
+  void StreamOutput() noexcept { mStream = true; }
 
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }
@@ -48,7 +51,12 @@ class RowConverter {
  private:
   // Runs the chain on `count` pixels; the last step writes to dst.
   void RunSteps(const uint8_t* src, uint8_t* dst, size_t count) const noexcept;
-  size_t UnitPixels() const noexcept { return mWholeRow ? mWidth : kChainBlock; }
+  // A single kernel that needs its neighbours, in overlapping blocks that are staged in the first-level cache.
+  void StreamInBlocks(const uint8_t* src, uint8_t* dst) const noexcept;
+  bool StreamsInBlocks() const noexcept { return mStream && mWholeRow && mStepCount == 1 && !mIsCopy; }
+  size_t UnitPixels() const noexcept {
+    return StreamsInBlocks() ? kStreamBlock + 2 * kReach : mWholeRow ? mWidth : kChainBlock;
+  }
   size_t ScratchRowBytes() const noexcept;
 
   RowKernel mSteps[kMaxSteps] = {};

@@ -5,7 +5,10 @@
 #include <cstring>
 #include <vector>
 
+#include "convert/RowConverter.h"
+#include "formats/FormatBits.h"
 #include "frame/KernelVariant.h"
+#include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/Random.h"
 
@@ -140,6 +143,29 @@ TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
       ASSERT_EQ(std::memcmp(&large[static_cast<size_t>(dstRow) * y], small.data(), small.size()), 0)
           << FormatName(src) << " to " << FormatName(dst) << " row " << y;
   }
+}
+
+// Past the cache rows are made in blocks: no kernel looks farther than the blocks overlap, and none sees where they
+// end.
+TEST(Convert, EveryPairStreamsTheSameBytes) {
+  constexpr int32_t kWidth = 2 * static_cast<int32_t>(kStreamBlock) + 7;
+  for (const F src : testing::RasterFormats())
+    for (const F dst : testing::RasterFormats()) {
+      std::vector<uint8_t> source(static_cast<size_t>(UnpaddedRowBytes(src, kWidth)));
+      testing::Random random(11);
+      testing::FillSamples(source.data(), source.size(), src, testing::Contents::Random, random);
+      const auto convert = [&](bool streams) {
+        RowConverter converter;
+        EXPECT_EQ(converter.Prepare(src, dst, 2, kWidth), VX_Success);
+        if (streams) converter.StreamOutput();
+        std::vector<uint8_t> scratch(converter.ScratchBytes() + 64),
+            row(static_cast<size_t>(UnpaddedRowBytes(dst, kWidth)));
+        converter.UseScratch(scratch.data() + (64 - reinterpret_cast<uintptr_t>(scratch.data()) % 64));
+        converter.Convert(source.data(), row.data());
+        return row;
+      };
+      ASSERT_EQ(convert(true), convert(false)) << FormatName(src) << " to " << FormatName(dst);
+    }
 }
 
 // A caller's rounding mode reaches every kernel alike and comes back.
