@@ -1,4 +1,5 @@
 // vexel pack and vexel unpack: frames to and from the layouts that codecs and cameras use.
+#include <filesystem>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -35,6 +36,14 @@ void Report(const PackOptions& options, int64_t frames, const std::string& what)
             << (frames == 1 ? " frame, " : " frames, ") << what << '\n';
 }
 
+// A file that nothing is known about is likely to be raw.
+std::unique_ptr<FrameSource> OpenUnpacked(const std::string& path, const SourceOptions& options) try {
+  return OpenSource(path, options);
+} catch (const ToolError& error) {
+  if (options.rawFormat || !std::filesystem::is_regular_file(path)) throw;
+  throw ToolError(error.what() + std::string("; raw frames need --size WIDTHxHEIGHT"));
+}
+
 // Raw frames with a size alone are in the unpacked layout already; everything else is converted to it.
 void RunPack(const PackOptions& options) {
   options.run.Apply();
@@ -45,7 +54,7 @@ void RunPack(const PackOptions& options) {
     sourceOptions.rawFormat = packing.unpackedAs;
   else if (!options.rawFormat.empty())
     sourceOptions.rawFormat = ParseFormat(options.rawFormat);
-  const auto source = OpenSource(options.in, sourceOptions);
+  const auto source = OpenUnpacked(options.in, sourceOptions);
   const auto sink = OpenStreamSink(options.out, Container::Raw, source->FrameRate());
   const ConvertOptions convert{3, options.run.ThreadCount()};
   int64_t frames = 0;

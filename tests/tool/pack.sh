@@ -46,6 +46,7 @@ refuses() {  # WORD ARGUMENTS...
 refuses 'v210, dnxhd16u' pack "$clip422" x.raw --to v211
 refuses '--size' unpack p.v210 x.raw --from v210
 refuses '--size' pack p.v210 x.raw --to v210 --raw-format V210_422_10u
+refuses 'raw frames need --size' pack be16.raw x.raw --to be16
 refuses 'no frame' unpack /dev/null x.raw --from v210 --size 4x4
 refuses 'middle of a frame' unpack "$0" x.raw --from be16 --size 999x999
 refuses 'container' unpack p.v210 x.v211 --from v210 --size 480x270
