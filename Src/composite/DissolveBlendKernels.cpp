@@ -13,6 +13,7 @@
 #include <hwy/highway.h>
 
 #include "composite/BlendVectors-inl.h"
+#include "composite/TwoRows-inl.h"
 #include "frame/KernelTable.h"
 
 #ifndef VEXEL_COMPOSITE_DISSOLVEBLENDKERNELS_STEPS
@@ -112,19 +113,11 @@ HWY_ATTR void DissolveRow(const uint8_t* src, const uint8_t* background, uint8_t
   const Body body{SetFloat(opacity), reversed};
   auto states = Draw<Body::kTransposed>(sequence.State());
   sequence.Skip(count);
-  size_t i = 0;
-  for (; i + kBlock <= count; i += kBlock) {
-    body(src + i * kBytes, background + i * kBytes, dst + i * kBytes, states);
+  const auto block = [&](const uint8_t* s, const uint8_t* b, uint8_t* out) HWY_ATTR {
+    body(s, b, out, states);
     states = hn::Add(hn::Mul(states, hn::Set(d, kFactor)), hn::Set(d, kAddend));
-  }
-  if (const size_t rest = count - i) {
-    alignas(64) uint8_t in[2][kBlock * kBytes] = {};
-    alignas(64) uint8_t out[kBlock * kBytes];
-    std::memcpy(in[0], src + i * kBytes, rest * kBytes);
-    std::memcpy(in[1], background + i * kBytes, rest * kBytes);
-    body(in[0], in[1], out, states);
-    std::memcpy(dst + i * kBytes, out, rest * kBytes);
-  }
+  };
+  TwoRowLoop<kBlock * kBytes>(src, background, dst, count * kBytes, block);
 }
 
 HWY_ATTR void DissolveByPlace4(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
