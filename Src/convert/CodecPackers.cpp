@@ -74,7 +74,7 @@ VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBy
   ConvertStaged(from, to, groups, height, variant, kUyvy10ToV210[variant]);
 
   const auto neededBytes = static_cast<int64_t>((groups + 1) * kV210GroupBytes);
-  if (rest == 0 || neededBytes > dstRowBytes) return VX_Success;
+  if (rest == 0 || neededBytes > std::abs(int64_t{dstRowBytes})) return VX_Success;
   for (int32_t row = 0; row < height; ++row) {
     uint16_t group[] = {512, 64, 512, 64, 512, 64, 512, 64, 512, 64, 512, 64};
     std::memcpy(group, from.base + row * from.rowBytes + groups * kUyvy16GroupBytes, rest * 4);

@@ -162,7 +162,7 @@ TEST(Packers, V210OfUyvyWithItsTail) {
     for (const int room : {0, 16}) {
       const int groups = width / 6, height = 3;
       const size_t dstBytes = static_cast<size_t>(groups) * 16 + static_cast<size_t>(room);
-      Rows src(static_cast<size_t>(width) * 4, height, 6, true, 1), dst(dstBytes, height, 3, false, 2);
+      Rows src(static_cast<size_t>(width) * 4, height, 6, true, 1), dst(dstBytes, height, 3, width % 2 != 0, 2);
       Rows expected = dst;
       VX_ConvertUYVY_422_10uToV210_422_10u(src.base(), src.rowBytes, dst.base(), dst.rowBytes, width, height);
       const int words = 4 * (width % 6 != 0 && room ? groups + 1 : groups);
