@@ -70,11 +70,13 @@ struct Operation {
 
 double Rounded(double value) { return double{static_cast<float>(value)}; }
 
+VX_Result Gain(const ArenaFrame& s, const ArenaFrame& d, float gain, int hint) {
+  return VX_AlphaGain(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, gain, hint);
+}
+
 Operation GainOperation(float gain) {
   return {"VX_AlphaGain", HasGainKernel, false,
-          [=](const ArenaFrame& s, const ArenaFrame& d) {
-            return VX_AlphaGain(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, gain, 0);
-          },
+          [=](const ArenaFrame& s, const ArenaFrame& d) { return Gain(s, d, gain, 0); },
           [=](F f, const double* in, double* out) {
             const bool isFloat = Depth(f) == kDepth32f, all = AlphaKind(f) == kAlphaPremultiplied;
             const double vuyBlack[] = {128, 128, 16, 0};
@@ -102,6 +104,23 @@ Operation SetOperation(float alpha, double code8, double code15) {
             std::copy_n(in, 4, out);
             out[AlphaAt(f)] = Depth(f) == kDepth8u ? code8 : Depth(f) == kDepth15u ? code15 : double{alpha};
           }};
+}
+
+// In place; the source is not looked at.
+Operation SetInPlaceOperation(bool opaque) {
+  return {"VX_SetAlphaChannel",
+          [](F f) {
+            constexpr F kSettable[] = {F::BGRA_4444_8u,  F::VUYA_4444_8u,         F::BGRA_4444_15u,
+                                       F::BGRA_4444_32f, F::BGRA_4444_32f_Linear, F::VUYA_4444_32f,
+                                       F::ARGB_4444_32f, F::ARGB_4444_32f_Linear};
+            return std::find(std::begin(kSettable), std::end(kSettable), f) != std::end(kSettable);
+          },
+          true,
+          [=](const ArenaFrame&, const ArenaFrame& d) {
+            return VX_SetAlphaChannel(static_cast<uint32_t>(d.width), static_cast<uint32_t>(d.height), d.base,
+                                      d.rowBytes, d.format, opaque);
+          },
+          [=](F f, const double*, double* out) { out[AlphaAt(f)] = opaque ? FullScale(f) : 0; }};
 }
 
 // The matte is a pixel of the buffer's own format; in 15u it may hold more than full scale, which counts as that.
@@ -143,6 +162,7 @@ std::vector<Operation> Operations() {
   for (const float gain : {0.25f, 0.5f, 1.0f / 3, 1.0f, 1.7f, 1e30f}) operations.push_back(GainOperation(gain));
   operations.push_back(SetOperation(0.3f, 77, 9830));  // 76.5000003 and 9830.4
   operations.push_back(SetOperation(0.5f, 128, 16384));
+  for (const bool opaque : {false, true}) operations.push_back(SetInPlaceOperation(opaque));
   operations.push_back(MatteOperation(0.16, 0.5, 1, 0.7));
   operations.push_back(MatteOperation(0.01, 1.5, 0.999, 0.3));
   return operations;
@@ -225,29 +245,6 @@ TEST(AlphaUtilities, Arena) {
   }
 }
 
-TEST(AlphaUtilities, SetAlphaChannel) {
-  for (const F f : RasterFormats())
-    for (const bool opaque : {false, true}) {
-      const bool named = f == F::BGRA_4444_8u || f == F::VUYA_4444_8u || f == F::BGRA_4444_15u ||
-                         f == F::BGRA_4444_32f || f == F::BGRA_4444_32f_Linear || f == F::VUYA_4444_32f ||
-                         f == F::ARGB_4444_32f || f == F::ARGB_4444_32f_Linear;
-      ArenaCase arenaCase;
-      arenaCase.name = "VX_SetAlphaChannel";
-      arenaCase.destination = f;
-      arenaCase.destinationIsInput = true;
-      arenaCase.expected = named ? VX_Success : VX_ErrFormatNotHandled;
-      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) {
-        const VX_Result result = VX_SetAlphaChannel(static_cast<uint32_t>(d.width), static_cast<uint32_t>(d.height),
-                                                    d.base, d.rowBytes, d.format, opaque);
-        for (int row = 0; named && row < d.height; ++row)
-          for (int x = 0; x < d.width; ++x)
-            EXPECT_EQ(Get(d.Row(row), static_cast<size_t>(4 * x) + AlphaAt(f), f), opaque ? FullScale(f) : 0);
-        return result;
-      };
-      EXPECT_TRUE(RunArena(arenaCase));
-    }
-}
-
 // ---- Gain through working formats ----
 
 F ExpectedWorking(F dst, int hint) {
@@ -269,11 +266,9 @@ TEST(AlphaUtilities, GainConvertsInAndOut) {
           return VX_Convert(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, hint);
         };
         ASSERT_EQ(convert(src.frame, between.frame), VX_Success);
-        ASSERT_EQ(GainOperation(0.4f).run(between.frame, between.frame), VX_Success);
+        ASSERT_EQ(Gain(between.frame, between.frame, 0.4f, 0), VX_Success);
         ASSERT_EQ(convert(between.frame, want.frame), VX_Success);
-        ASSERT_EQ(
-            VX_AlphaGain(src.frame.base, src.rowBytes, from, got.frame.base, got.rowBytes, to, 390, 3, 0.4f, hint),
-            VX_Success);
+        ASSERT_EQ(Gain(src.frame, got.frame, 0.4f, hint), VX_Success);
         ASSERT_EQ(got.bytes, want.bytes) << FormatName(from) << " to " << FormatName(to) << ", hint " << hint;
       }
 }
@@ -282,9 +277,8 @@ TEST(AlphaUtilities, GainOfNothingFills) {
   for (const F f : RasterFormats())
     for (const float gain : {0.0f, 7.9e-6f, -1.0f, NAN}) {
       Picture src(F::BGRA_4444_8u, 7, 3), want(f, 7, 3), got(f, 7, 3);
-      EXPECT_EQ(
-          VX_AlphaGain(src.frame.base, src.rowBytes, F::BGRA_4444_8u, got.frame.base, got.rowBytes, f, 7, 3, gain, 0),
-          VX_FillWithTransparentBlack(want.frame.base, want.rowBytes, 7, 3, f));
+      EXPECT_EQ(Gain(src.frame, got.frame, gain, 0),
+                VX_FillWithTransparentBlack(want.frame.base, want.rowBytes, 7, 3, f));
       EXPECT_EQ(got.bytes, want.bytes) << FormatName(f) << " by " << gain;
     }
 }
@@ -302,16 +296,12 @@ TEST(AlphaUtilities, GainArena) {
       arenaCase.destination = to;
       arenaCase.seed = count;
       arenaCase.widths = {1, 2, 5, 6, 7, 31, 64, 129, 385};
-      arenaCase.run = [&](const ArenaFrame* s, const ArenaFrame& d) {
-        return VX_AlphaGain(s->base, s->rowBytes, from, d.base, d.rowBytes, to, d.width, d.height, gain, hint);
-      };
+      arenaCase.run = [&](const ArenaFrame* s, const ArenaFrame& d) { return Gain(s[0], d, gain, hint); };
       EXPECT_TRUE(RunArena(arenaCase));
       if (from != to) continue;
       arenaCase.sources.clear();
       arenaCase.destinationIsInput = true;
-      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) {
-        return VX_AlphaGain(d.base, d.rowBytes, to, d.base, d.rowBytes, to, d.width, d.height, gain, hint);
-      };
+      arenaCase.run = [&](const ArenaFrame*, const ArenaFrame& d) { return Gain(d, d, gain, hint); };
       EXPECT_TRUE(RunArena(arenaCase)) << "in place";
     }
 }
@@ -482,6 +472,8 @@ TEST(AlphaUtilities, Refusals) {
       {VX_ErrFormatNotHandled, [&](void* p) { return matted(p, p, kRgba10, 5, 5, p, kRgba10); }},
       {VX_ErrNullSource, [&](void* p) { return matted(p, p, kBgra, 5, 5, nullptr, F::VUYA_4444_8u); }},
       {VX_ErrUnsupportedFormat, [&](void* p) { return matted(p, p, kBgra, 5, 5, p, kDv); }},
+      {VX_ErrFormatNotHandled, [&](void* p) { return VX_SetAlphaChannel(5, 5, p, 64, F::ARGB_4444_15u, true); }},
+      {VX_ErrFormatNotHandled, [&](void* p) { return VX_SetAlphaChannel(0, 5, p, 64, F::VUYA_4444_8u_709, true); }},
       {VX_Success, [&](void* p) { return setAll(p, 0, 5, 64); }},
       {VX_Success, [&](void* p) { return setAll(p, 5, 0, 64); }},
       {VX_ErrFailed, [&](void* p) { return setAll(p, 0x20000000, 1, 64); }},
@@ -499,11 +491,8 @@ TEST(AlphaUtilities, FailingAllocations) {
   constexpr int kWidth = 20000;
   Picture pairs(F::UYVY_422_8u, kWidth, 2), pixels(F::BGRA_4444_32f, kWidth, 2);
   const std::vector<uint8_t> mask(kWidth / 8);
-  const auto gain = [&] {
-    return VX_AlphaGain(pairs.bytes.data(), pairs.rowBytes, F::UYVY_422_8u, pixels.bytes.data(), pixels.rowBytes,
-                        F::BGRA_4444_32f, kWidth, 2, 0.5f, 0);
-  };
-  EXPECT_GE(ExpectSurvivesFailingAllocations("VX_AlphaGain", gain), 1);
+  EXPECT_GE(ExpectSurvivesFailingAllocations("VX_AlphaGain", [&] { return Gain(pairs.frame, pixels.frame, 0.5f, 0); }),
+            1);
   const auto choose = [&] {
     return VX_OneBitMaskComposite(pairs.bytes.data(), pairs.rowBytes, F::UYVY_422_8u, pixels.bytes.data(),
                                   pixels.rowBytes, F::BGRA_4444_32f, mask.data(), 0, 0, pixels.bytes.data(),
