@@ -180,7 +180,13 @@ BenchCase& BenchCase::AddThreaded(const std::string& contender, std::function<vo
 }
 
 BenchCase& BenchCase::AddFloor(size_t srcBytes, size_t dstBytes) {
-  auto src = std::make_shared<Memory>(srcBytes), dst = std::make_shared<Memory>(dstBytes);
+  // All floors share two areas.
+  static std::unique_ptr<Memory> src, dst;
+  const auto grow = [](std::unique_ptr<Memory>& area, size_t bytes) {
+    if (!area || area->size() < bytes) area = std::make_unique<Memory>(bytes);
+  };
+  grow(src, srcBytes);
+  grow(dst, dstBytes);
   Add("floor cached", [=] { FloorCached(src->data(), srcBytes, dst->data(), dstBytes); });
   return Add("floor streamed", [=] { FloorStreamed(src->data(), srcBytes, dst->data(), dstBytes); });
 }
