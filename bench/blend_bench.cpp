@@ -1,7 +1,11 @@
 // Blend modes beside pixman's operators: 8-bit pictures and float pictures, source and background with alpha.
 // pixman's alpha is premultiplied; it computes the blending operators in floats whatever the pictures hold.
+#include <xmmintrin.h>
+
+#include <map>
 #include <memory>
 #include <string>
+#include <utility>
 
 #include "frame/KernelVariant.h"
 #include "support/Bench.h"
@@ -15,6 +19,8 @@
 namespace {
 
 using vexel::bench::BenchCase;
+using vexel::bench::FloorCached;
+using vexel::bench::FloorStreamed;
 using vexel::bench::Memory;
 using F = VX_PixelFormat;
 using M = VX_BlendMode;
@@ -45,70 +51,80 @@ constexpr Mode kModes[] = {
 };
 #undef VX_BENCH_MODE
 
+#ifdef VEXEL_PEER_PIXMAN
+constexpr unsigned kFlushDenormals = 0x8040;
+#endif
+
 struct Size {
   const char* name;
   int width, height;
 };
 
+// One set for all cases of a size and format: what they are called with does not depend on the mode.
 struct Pictures {
   Pictures(Size size, int pixelBytes)
-      : width(size.width),
-        height(size.height),
-        rowBytes(size.width * pixelBytes),
-        src(Bytes()),
-        background(Bytes()),
-        dst(Bytes()) {
-    for (Memory* memory : {&src, &background}) {
-      const uint64_t seed = memory == &src ? 1 : 2;
-      pixelBytes == 4 ? memory->FillBytes(seed) : memory->FillFloats(seed);
-    }
+      : width(size.width), height(size.height), rowBytes(size.width * pixelBytes), sources(2 * Bytes()), dst(Bytes()) {
+    pixelBytes == 4 ? sources.FillBytes() : sources.FillFloats();
   }
   size_t Bytes() const { return static_cast<size_t>(rowBytes) * static_cast<size_t>(height); }
   size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
+  uint8_t* Src() const { return sources.data(); }
+  uint8_t* Background() const { return sources.data() + Bytes(); }
 
   int width, height, rowBytes;
-  Memory src, background, dst;
+  Memory sources, dst;
 };
 
+std::shared_ptr<Pictures> PicturesOf(Size size, F format) {
+  static std::map<std::pair<int, F>, std::shared_ptr<Pictures>> made;
+  auto& pictures = made[{size.width, format}];
+  if (!pictures) pictures = std::make_shared<Pictures>(size, format == F::BGRA_4444_8u ? 4 : 16);
+  return pictures;
+}
+
 void Blend(Pictures& p, M mode, F format) {
-  VX_CompositeWithBlendMode(p.src.data(), p.rowBytes, format, p.background.data(), p.rowBytes, format, p.dst.data(),
-                            p.rowBytes, format, p.width, p.height, 1.0f, static_cast<int32_t>(mode), 3, false);
+  VX_CompositeWithBlendMode(p.Src(), p.rowBytes, format, p.Background(), p.rowBytes, format, p.dst.data(), p.rowBytes,
+                            format, p.width, p.height, 1.0f, static_cast<int32_t>(mode), 3, false);
 }
 
 #ifdef VEXEL_PEER_PIXMAN
-// pixman composes in place; the picture it works on need not be the background of every call anew.
+// pixman composes in place, again and again, so values end as denormals; those must not slow it down.
 void AddPixman(BenchCase& report, const std::shared_ptr<Pictures>& p, const Mode& mode, pixman_format_code_t format) {
   if (mode.pixmanOperator < 0) return;
-  const auto image = [&](Memory& memory) {
+  const auto image = [&](uint8_t* pixels) {
     return std::shared_ptr<pixman_image_t>(
-        pixman_image_create_bits(format, p->width, p->height, reinterpret_cast<uint32_t*>(memory.data()), p->rowBytes),
+        pixman_image_create_bits(format, p->width, p->height, reinterpret_cast<uint32_t*>(pixels), p->rowBytes),
         pixman_image_unref);
   };
-  const auto src = image(p->src), dst = image(p->background);
+  const auto src = image(p->Src()), dst = image(p->dst.data());
   report.Add("pixman", [=] {
+    const unsigned before = _mm_getcsr();
+    _mm_setcsr(before | kFlushDenormals);
     pixman_image_composite32(static_cast<pixman_op_t>(mode.pixmanOperator), src.get(), nullptr, dst.get(), 0, 0, 0, 0,
                              0, 0, p->width, p->height);
+    _mm_setcsr(before);
   });
 }
 #endif
 
 void ModeCase(const Mode& mode, Size size, F format) {
   const bool inBytes = format == F::BGRA_4444_8u;
-  auto p = std::make_shared<Pictures>(size, inBytes ? 4 : 16);
+  const auto p = PicturesOf(size, format);
   BenchCase report(std::string(mode.name) + (inBytes ? " 8u " : " 32f ") + size.name, p->Pixels());
   report.Add("vexel", [=] {
     vexel_host::SetThreadLimit(1);
     Blend(*p, mode.mode, format);
     vexel_host::SetThreadLimit(0);
   });
-  report.AddFloor(2 * p->Bytes(), p->Bytes());
+  report.Add("floor cached", [=] { FloorCached(p->Src(), 2 * p->Bytes(), p->dst.data(), p->Bytes()); });
+  report.Add("floor streamed", [=] { FloorStreamed(p->Src(), 2 * p->Bytes(), p->dst.data(), p->Bytes()); });
 #ifdef VEXEL_PEER_PIXMAN
   AddPixman(report, p, mode, inBytes ? PIXMAN_a8r8g8b8 : PIXMAN_rgba_float);
 #endif
 }
 
 void TwoThreadsCase(const Mode& mode, Size size, F format) {
-  auto p = std::make_shared<Pictures>(size, format == F::BGRA_4444_8u ? 4 : 16);
+  const auto p = PicturesOf(size, format);
   BenchCase report(std::string(mode.name) + (format == F::BGRA_4444_8u ? " 8u " : " 32f ") + size.name + ", threads",
                    p->Pixels());
   for (const int threads : {1, 2})
