@@ -29,6 +29,26 @@ class DefaultFpMode {
   uint32_t mSaved;
 };
 
+// The light of each 8u code in the three colour channels, and what it is as alpha: the entry of a code holds it at the
+// place of each channel. Made by the first caller; others wait for it.
+struct LinearCodes {
+  static const LinearCodes& Get() noexcept {
+    static const LinearCodes codes;
+    return codes;
+  }
+  alignas(64) float entries[256][4];
+
+ private:
+  LinearCodes() noexcept {
+    const DefaultFpMode mode;
+    for (int c = 0; c < 256; ++c) {
+      const float light = SignedPower(c * k8uTo32f, kToLinear);
+      entries[c][0] = entries[c][1] = entries[c][2] = light;
+      entries[c][3] = c * k8uTo32f;
+    }
+  }
+};
+
 // NarrowLightTo8 as a look-up that gives exactly its results. The function rises from 0 to 255 between 2^-23 and 1,
 // at 255 thresholds, and falls back to 0 where its argument leaves the range of int32. A bucket is 1/128 of an octave
 // and holds one threshold at most, so with x the low bits of a float, the code is (entry + x) >> kLowBits for entry =

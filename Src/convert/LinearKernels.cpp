@@ -7,8 +7,10 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 
 #include "convert/LightCodes.h"
+#include "convert/LightLookup512.h"
 #include "convert/PlainPixels.h"
 #include "convert/RgbKernels.h"
 
@@ -23,6 +25,7 @@
 
 namespace vexel::plain {
 namespace {
+void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count);
 void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count);
 }  // namespace
 }  // namespace vexel::plain
@@ -121,6 +124,26 @@ class LinearToBgra8Body {
   const int32_t mOverflow;
 };
 
+#if HWY_TARGET <= HWY_SSE4
+// A pixel is put together from the entries of its four codes, 16 bytes each.
+HWY_ATTR void Bgra8ToLinear(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasLightLookup512()) return LightLookup512(src, dst, count);
+  const float* const entries = LinearCodes::Get().entries[0];
+  const auto entry = [entries](uint64_t offset)
+                         HWY_ATTR { return _mm_load_ps(entries + (offset & 0xFF0) / sizeof(float)); };
+  for (size_t i = 0; i < count; ++i) {
+    uint32_t bits;
+    std::memcpy(&bits, src + 4 * i, 4);
+    const uint64_t pixel = bits;
+    const __m128 blueGreen = _mm_blend_ps(entry(pixel << 4), entry(pixel >> 4), 2);
+    const __m128 redAlpha = _mm_blend_ps(entry(pixel >> 12), entry(pixel >> 20), 8);
+    _mm_storeu_ps(reinterpret_cast<float*>(dst + 16 * i), _mm_blend_ps(blueGreen, redAlpha, 12));
+  }
+}
+#else
+HWY_ATTR void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) { plain::Bgra8ToLinear(src, dst, count); }
+#endif
+
 template <const PowerExponent& kExponent, AlphaWrite kAlpha>
 HWY_ATTR void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
   RowLoop<kLanes<float>, 16, 16>(src, dst, count, CurveBody<kExponent, kAlpha>());
@@ -167,20 +190,10 @@ void Delinearize(const uint8_t* src, uint8_t* dst, size_t count) {
   Curve<kFromLinear, kAlpha>(src, dst, count);
 }
 
-// The curve of all 256 codes. Made by the first caller; others wait for it.
-struct LinearCodes {
-  LinearCodes() noexcept {
-    const DefaultFpMode mode;
-    for (int c = 0; c < 256; ++c) light[c] = SignedPower(c * k8uTo32f, kToLinear);
-  }
-  float light[256];
-};
-
 void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) {
-  static const LinearCodes codes;
-  MapPixels<uint8_t, float>(src, dst, count, [](const uint8_t* in, float* out) {
-    ForChannels<3>([&](size_t k) { out[k] = codes.light[in[k]]; });
-    out[3] = in[3] * k8uTo32f;
+  const LinearCodes& codes = LinearCodes::Get();
+  MapPixels<uint8_t, float>(src, dst, count, [&](const uint8_t* in, float* out) {
+    ForChannels([&](size_t k) { out[k] = codes.entries[in[k]][k]; });
   });
 }
 
@@ -198,7 +211,7 @@ const RowKernelSet kBgra32fToLinear = VX_KERNEL_VARIANTS(Linearize<AlphaWrite::K
 const RowKernelSet kBgrx32fToLinear = VX_KERNEL_VARIANTS(Linearize<AlphaWrite::OpaqueLast>);
 const RowKernelSet kLinearToBgra32f = VX_KERNEL_VARIANTS(Delinearize<AlphaWrite::Keep>);
 const RowKernelSet kLinearToBgrx32f = VX_KERNEL_VARIANTS(Delinearize<AlphaWrite::OpaqueLast>);
-const RowKernelSet kBgra8ToLinear = {&plain::Bgra8ToLinear, nullptr, nullptr, nullptr, nullptr};
+const RowKernelSet kBgra8ToLinear = VX_KERNEL_VARIANTS(Bgra8ToLinear);
 const RowKernelSet kLinearToBgra8 = VX_KERNEL_VARIANTS(LinearToBgra8);
 
 }  // namespace vexel
