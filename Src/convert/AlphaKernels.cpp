@@ -62,7 +62,8 @@ struct UnlessOpaque {
     const hn::ScalableTag<T> d;
     auto v0 = Op::Load(in, 0), v1 = Op::Load(in, 1), v2 = Op::Load(in, 2), v3 = Op::Load(in, 3);
     const auto opaque = OpaqueVector<kLayout.alpha, T>();
-    const auto all = hn::And(hn::And(v0, v1), hn::And(v2, v3));
+    // One after the other, so that compilers load in this order: prefetchers follow ascending addresses.
+    const auto all = hn::And(hn::And(hn::And(v0, v1), v2), v3);
     if (!hn::AllTrue(d, hn::Eq(hn::And(all, opaque), opaque))) {
       Op::Map(v0, v1);
       Op::Map(v2, v3);
