@@ -178,7 +178,9 @@ void AddColorCommand(CLI::App& app) {
   command->add_option("--tone", options->tone,
                       "Compress bright tones into standard range by the curve A,B,C (for instance 1,1.2,0.6)");
   command->add_option("--matrix", options->matrix, "Treat YUV input as BT.601, 709 or 2020, whatever the file says");
-  command->add_option("--raw-format", options->rawFormat, "IN is raw frames of this pixel format (P010 among them)");
+  command->add_option("--raw-format", options->rawFormat,
+                      "IN is raw frames of this pixel format (P010 with HDR is "
+                      "YUV_420_MPEG4_FRAME_PICTURE_BIPLANAR_10u_as16u_2020_HDR)");
   command->add_option("--size", options->size, "WIDTHxHEIGHT of raw frames");
   command->add_option(
       "--plot", options->plot,

@@ -206,7 +206,7 @@ VX_API VX_Result VX_Convert_Uint32_BigEndian_InPlace(void* base, int32_t rowByte
 
 /* 16-bit samples U Y V Y holding 10 bits at the right, 4 bytes per pixel, to V210 groups of 6 pixels in 16 bytes.
  * Samples are not masked: one above 1023 runs into its neighbour. Where width is not a multiple of 6, the last group is
- * filled up with black if dstRowBytes, a signed number, has room for it; otherwise its pixels are left out. */
+ * filled up with black if |dstRowBytes| has room for it; otherwise its pixels are left out. */
 VX_API VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBytes, void* dst,
                                                       int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
 
@@ -284,5 +284,8 @@ VX_API VX_Result VX_RotateImageAndFlip(const void* src, int32_t srcRowBytes, voi
 #ifdef __cplusplus
 } /* extern "C" */
 #endif
+
+/* Compositing, blend modes, alpha, fills and dissolves. */
+#include "vexel/compositing.h"
 
 #endif
