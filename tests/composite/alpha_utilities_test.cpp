@@ -450,16 +450,21 @@ TEST(AlphaUtilities, Refusals) {
        {F::Invalid, kDv, k420, F::UYVY_422_8u, F::V210_422_10u, F::UYVY_422_32f},
        [&](auto s, auto d, F f, int w, int h) { return mask(s, kBgra, kBgra, s, 0, d, f, w, h); }},
   };
-  for (const auto& [badFormat, refused, call] : calls) {
-    const std::string name = "call " + std::to_string(&call - &calls[0].call);
-    for (const F f : refused) ExpectRefusal(name, badFormat, [&](void* p) { return call(p, p, f, -1, 5); });
-    for (const auto& [w, h, expected] : {std::tuple(0, 5, VX_Success),
-                                         {5, 0, VX_Success},
-                                         {-1, 5, VX_ErrArgumentOutOfRange},
-                                         {5, INT_MIN, VX_ErrArgumentOutOfRange},
-                                         {INT_MAX, 1, VX_ErrArgumentOutOfRange},
-                                         {1 << 29, 2, VX_ErrArgumentOutOfRange}})
-      ExpectRefusal(name, expected, [&](void* p) { return call(p, p, kBgra, w, h); });
+  const struct {
+    int w, h;
+    VX_Result expected;
+  } sizes[] = {{0, 5, VX_Success},
+               {5, 0, VX_Success},
+               {-1, 5, VX_ErrArgumentOutOfRange},
+               {5, INT_MIN, VX_ErrArgumentOutOfRange},
+               {INT_MAX, 1, VX_ErrArgumentOutOfRange},
+               {1 << 29, 2, VX_ErrArgumentOutOfRange}};
+  for (const auto& c : calls) {
+    const std::string name = "call " + std::to_string(&c - calls);
+    const Call& call = c.call;
+    for (const F f : c.refused) ExpectRefusal(name, c.badFormat, [&](void* p) { return call(p, p, f, -1, 5); });
+    for (const auto& size : sizes)
+      ExpectRefusal(name, size.expected, [&](void* p) { return call(p, p, kBgra, size.w, size.h); });
     ExpectRefusal(name, VX_ErrNullSource, [&](void* p) { return call(nullptr, p, kBgra, 5, 5); });
     ExpectRefusal(name, VX_ErrNullDestination, [&](void* p) { return call(p, nullptr, kBgra, 5, 5); });
   }
@@ -482,8 +487,7 @@ TEST(AlphaUtilities, Refusals) {
       {VX_ErrFailed, [&](void* p) { return setAll(p, 5, 2, 19); }},
       {VX_ErrFailed, [&](void*) { return setAll(nullptr, 5, 2, 20); }},
   };
-  for (const auto& [expected, call] : others)
-    ExpectRefusal("case " + std::to_string(&call - &others[0].second), expected, call);
+  for (const auto& other : others) ExpectRefusal("case " + std::to_string(&other - others), other.first, other.second);
 }
 
 // Rows that need memory: 4:2:2 is converted row by row.
