@@ -36,15 +36,14 @@ struct BlendKernels {
 };
 
 // Every mode but Normal, and Dissolve, whose kernels are of another kind.
-#define VX_KERNEL_BLEND_MODES(X)                                                                                    \
-  X(Color)                                                                                                          \
-  X(ColorBurn)                                                                                                      \
-  X(ColorDodge)                                                                                                     \
-  X(Darken)                                                                                                         \
-  X(DarkerColor)                                                                                                    \
-  X(Difference) X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten) X(LighterColor) X(LinearBurn) X(LinearDodge) \
-      X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) X(PinLight) X(Saturation) X(Screen) X(SoftLight)          \
-          X(VividLight) X(Subtract) X(Divide)
+// clang-format off
+#define VX_KERNEL_BLEND_MODES(X) \
+  X(Color) X(ColorBurn) X(ColorDodge) X(Darken) X(DarkerColor) X(Difference) \
+  X(Exclusion) X(HardLight) X(HardMix) X(Hue) X(Lighten) X(LighterColor) \
+  X(LinearBurn) X(LinearDodge) X(LinearLight) X(Luminosity) X(Multiply) X(Overlay) \
+  X(PinLight) X(Saturation) X(Screen) X(SoftLight) X(VividLight) X(Subtract) \
+  X(Divide)
+// clang-format on
 
 #define VX_DECLARE_BLEND(mode) extern const BlendKernels kBlend##mode;
 VX_KERNEL_BLEND_MODES(VX_DECLARE_BLEND)

@@ -23,14 +23,14 @@ extern "C" {
 /* ---- Compositing and blend modes --------------------------------------------------------------------------------- */
 
 /* The order is the contract; it is alphabetical but for the last two. */
-#define VX_BLEND_MODES(X)                                                                                      \
-  X(Color, 0)                                                                                                  \
-  X(ColorBurn, 1)                                                                                              \
-  X(ColorDodge, 2)                                                                                             \
-  X(Darken, 3) X(DarkerColor, 4) X(Difference, 5) X(Dissolve, 6) X(Exclusion, 7) X(HardLight, 8) X(HardMix, 9) \
-      X(Hue, 10) X(Lighten, 11) X(LighterColor, 12) X(LinearBurn, 13) X(LinearDodge, 14) X(LinearLight, 15)    \
-          X(Luminosity, 16) X(Multiply, 17) X(Normal, 18) X(Overlay, 19) X(PinLight, 20) X(Saturation, 21)     \
-              X(Screen, 22) X(SoftLight, 23) X(VividLight, 24) X(Subtract, 25) X(Divide, 26)
+/* clang-format off */
+#define VX_BLEND_MODES(X) \
+  X(Color, 0) X(ColorBurn, 1) X(ColorDodge, 2) X(Darken, 3) X(DarkerColor, 4) X(Difference, 5) \
+  X(Dissolve, 6) X(Exclusion, 7) X(HardLight, 8) X(HardMix, 9) X(Hue, 10) X(Lighten, 11) \
+  X(LighterColor, 12) X(LinearBurn, 13) X(LinearDodge, 14) X(LinearLight, 15) X(Luminosity, 16) X(Multiply, 17) \
+  X(Normal, 18) X(Overlay, 19) X(PinLight, 20) X(Saturation, 21) X(Screen, 22) X(SoftLight, 23) \
+  X(VividLight, 24) X(Subtract, 25) X(Divide, 26)
+/* clang-format on */
 #ifdef __cplusplus
 enum class VX_BlendMode : int32_t {
 #define VX_BLEND_MODE_ENUMERATOR(name, value) name = value,
@@ -114,9 +114,9 @@ VX_API VX_Result VX_CompositeToBlack(const void* src, int32_t srcRowBytes, VX_Pi
                                      int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
                                      float opacity, int32_t precisionHint) VX_NOEXCEPT;
 /* The same at full opacity, row by row: rows whose alpha as worked on is opaque throughout (255, 1.0) are converted
- * straight from the source format to the destination's, those with alpha 0 throughout are filled with opaque black. *alphaState
- * receives 0 if every row was opaque (also if there are none), 1 if every row was clear, 2 otherwise; it may be null,
- * and stays as it is on failure. In place, opaque rows are not touched. */
+ * straight from the source format to the destination's, those with alpha 0 throughout are filled with opaque black.
+ * *alphaState receives 0 if every row was opaque (also if there are none), 1 if every row was clear, 2 otherwise; it
+ * may be null, and stays as it is on failure. In place, opaque rows are not touched. */
 VX_API VX_Result VX_CompositeToBlackAndTestSourceAlpha(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat,
                                                        void* dst, int32_t dstRowBytes, VX_PixelFormat dstFormat,
                                                        int32_t width, int32_t height, int32_t* alphaState,
