@@ -25,20 +25,6 @@ const struct {
               {VX_FillWithOpaqueWhite, "opaque white", true, true},
               {VX_FillWithTransparentWhite, "transparent white", true, false}};
 
-std::vector<F> Formats420() {
-  std::vector<F> formats;
-  const auto add = [&](F format) {
-    if (Is420(format)) formats.push_back(format);
-  };
-#define ADD_NAMED(name, value, hostName, mapping) add(F::name);
-#define ADD_UNNAMED(value, hostName, mapping) add(FromBits(value));
-  VX_PIXEL_FORMATS(ADD_NAMED)
-  VX_UNNAMED_PIXEL_FORMATS(ADD_UNNAMED)
-#undef ADD_NAMED
-#undef ADD_UNNAMED
-  return formats;
-}
-
 template <class T>
 void Append(Bytes& bytes, double value) {
   const T sample = static_cast<T>(value);

@@ -90,22 +90,23 @@ TEST(DepthKernels, WidenedAndPremultiplied) {
   EXPECT_EQ(RunKernel<float>(kBgra8ToBgrp32f, source, 65536, source.size()), chained);
 }
 
+template <class To, class From>
+void ExpectOpaque(const RowKernelSet& kept, const RowKernelSet& last, const RowKernelSet& first, To opaque) {
+  for (size_t alphaAt : {0, 3}) {
+    const auto source = Codes<From>(4);
+    auto expected = RunKernel<To>(kept, source, 1, 4);
+    expected[alphaAt] = opaque;
+    EXPECT_EQ(RunKernel<To>(alphaAt ? last : first, source, 1, 4), expected);
+  }
+}
+
 TEST(DepthKernels, OpaqueVariantsWriteAlpha) {
-  const std::vector<uint8_t> bytes = {1, 2, 3, 4};
-  const std::vector<uint16_t> words = {1, 2, 3, 4};
-  const std::vector<float> floats = {0.0f, 0.0f, 0.0f, 0.0f};
-  EXPECT_EQ(RunKernel<float>(kWiden8uTo32fOpaqueLast, bytes, 1, 4)[3], 1.0f);
-  EXPECT_EQ(RunKernel<float>(kWiden8uTo32fOpaqueFirst, bytes, 1, 4)[0], 1.0f);
-  EXPECT_EQ(RunKernel<float>(kWiden15uTo32fOpaqueLast, words, 1, 4)[3], 1.0f);
-  EXPECT_EQ(RunKernel<float>(kWiden15uTo32fOpaqueFirst, words, 1, 4)[0], 1.0f);
-  EXPECT_EQ(RunKernel<uint16_t>(kWiden8uTo15uOpaqueLast, bytes, 1, 4), (std::vector<uint16_t>{129, 257, 386, 32768}));
-  EXPECT_EQ(RunKernel<uint16_t>(kWiden8uTo15uOpaqueFirst, bytes, 1, 4), (std::vector<uint16_t>{32768, 257, 386, 514}));
-  EXPECT_EQ(RunKernel<uint8_t>(kNarrow32fTo8uOpaqueLast, floats, 1, 4), (std::vector<uint8_t>{0, 0, 0, 255}));
-  EXPECT_EQ(RunKernel<uint8_t>(kNarrow32fTo8uOpaqueFirst, floats, 1, 4), (std::vector<uint8_t>{255, 0, 0, 0}));
-  EXPECT_EQ(RunKernel<uint16_t>(kNarrow32fTo15uOpaqueLast, floats, 1, 4), (std::vector<uint16_t>{0, 0, 0, 32768}));
-  EXPECT_EQ(RunKernel<uint16_t>(kNarrow32fTo15uOpaqueFirst, floats, 1, 4), (std::vector<uint16_t>{32768, 0, 0, 0}));
-  EXPECT_EQ(RunKernel<uint8_t>(kNarrow15uTo8uOpaqueLast, words, 1, 4), (std::vector<uint8_t>{0, 0, 0, 255}));
-  EXPECT_EQ(RunKernel<uint8_t>(kNarrow15uTo8uOpaqueFirst, words, 1, 4), (std::vector<uint8_t>{255, 0, 0, 0}));
+  ExpectOpaque<float, uint8_t>(kWiden8uTo32f, kWiden8uTo32fOpaqueLast, kWiden8uTo32fOpaqueFirst, 1);
+  ExpectOpaque<float, uint16_t>(kWiden15uTo32f, kWiden15uTo32fOpaqueLast, kWiden15uTo32fOpaqueFirst, 1);
+  ExpectOpaque<uint16_t, uint8_t>(kWiden8uTo15u, kWiden8uTo15uOpaqueLast, kWiden8uTo15uOpaqueFirst, 32768);
+  ExpectOpaque<uint8_t, float>(kNarrow32fTo8u, kNarrow32fTo8uOpaqueLast, kNarrow32fTo8uOpaqueFirst, 255);
+  ExpectOpaque<uint16_t, float>(kNarrow32fTo15u, kNarrow32fTo15uOpaqueLast, kNarrow32fTo15uOpaqueFirst, 32768);
+  ExpectOpaque<uint8_t, uint16_t>(kNarrow15uTo8u, kNarrow15uTo8uOpaqueLast, kNarrow15uTo8uOpaqueFirst, 255);
 }
 
 uint32_t Word(uint32_t red, uint32_t green, uint32_t blue) { return red << 2 | green << 12 | blue << 22; }

@@ -150,21 +150,6 @@ TEST(Encode420, EveryRasterFormat) {
     }
 }
 
-TEST(Encode420, StaysInsideItsMemory) {
-  for (const F format : Destinations())
-    for (const F source : {InputOf(format), F::UYVY_422_8u_709}) {
-      ArenaCase arenaCase;
-      arenaCase.name = "encode 4:2:0";
-      arenaCase.sources = {source};
-      arenaCase.destination = format;
-      arenaCase.seed = Bits(format);
-      arenaCase.run = [=](const ArenaFrame* sources, const ArenaFrame& dst) {
-        return Encode420(sources->base, sources->rowBytes, source, dst.base, format, dst.width, dst.height);
-      };
-      EXPECT_TRUE(RunArena(arenaCase));
-    }
-}
-
 TEST(Encode420, Refuses) {
   const struct {
     F src, dst;

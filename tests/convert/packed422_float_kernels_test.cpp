@@ -12,23 +12,6 @@
 namespace vexel::testing {
 namespace {
 
-const KernelCase kCases[] = {
-    {"Swap422_32f", &kSwap422_32f, kPairs32f, kPairs32f},
-    {"Uyvy8To32f", &kUyvy8To32f, kPairs8, kPairs32f},
-    {"Yuyv8To32f", &kYuyv8To32f, kPairs8, kPairs32f},
-    {"Uyvy32fTo8", &kUyvy32fTo8, kPairs32f, kPairs8},
-    {"Yuyv32fTo8", &kYuyv32fTo8, kPairs32f, kPairs8},
-    {"Uyvy32fToVuyx32f", &kUyvy32fToVuyx32f, kPairs32f, kPixels32f},
-    {"Uyvy32fToVuyx32fNearest", &kUyvy32fToVuyx32fNearest, kPairs32f, kPixels32f},
-    {"Vuyx32fToUyvy32f", &kVuyx32fToUyvy32f, kPixels32f, kPairs32f},
-};
-
-// With rows of several runs that stay in the cache, and all their ends.
-TEST(Packed422FloatKernels, VariantsAgreeAndStayInTheRow) {
-  for (const KernelCase& kernelCase : kCases)
-    ExpectVariantsAgree(kernelCase, 90, {127, 128, 129, 130, 131, 132, 133, 255, 256, 257, 258, 640});
-}
-
 std::vector<float> RandomFloats(size_t count, uint64_t seed) {
   Random random(seed);
   std::vector<float> values(count);

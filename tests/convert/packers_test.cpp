@@ -6,7 +6,6 @@
 #include <climits>
 #include <cmath>
 #include <cstring>
-#include <functional>
 #include <limits>
 #include <numeric>
 #include <vector>
@@ -55,105 +54,117 @@ constexpr uint32_t Top(uint32_t sample) { return sample / 64; }
 uint32_t Word(uint32_t r, uint32_t g, uint32_t b) { return r * 4 + g * 4096 + b * 4194304; }
 uint32_t Component(uint32_t word, int k) { return word / (4u << 10 * k) % 1024; }
 
-// A packer and what it writes to pixel x of a row.
+// The sides without row bytes.
+enum class Tight : uint8_t { None, Source, Destination, Both };
+
+// A packer, the bytes of its rows for each so many pixels begun (none: it works in place), and what it writes to pixel
+// x of a row (nothing: a test of its own knows).
 struct Packer {
   const char* name;
-  size_t srcBytes, dstBytes;  // per pixel
-  bool tightSource, tightDestination;
-  std::function<void(Rows& src, Rows& dst, int width, int height)> run;
-  std::function<void(const Rows& src, Rows& dst, int row, size_t x)> expected;
+  int srcBytes, srcPixels, dstBytes, dstPixels;
+  Tight tight;
+  void (*run)(const void* src, int srcRow, void* dst, int dstRow, int width, int height);
+  void (*expected)(const Rows& src, Rows& dst, int row, size_t x) = nullptr;
+
+  int SourceRow(int width) const { return (width + srcPixels - 1) / srcPixels * srcBytes; }
+  int DestinationRow(int width) const { return (width + dstPixels - 1) / dstPixels * dstBytes; }
 };
 
-const std::vector<Packer>& Packers() {
-  static const std::vector<Packer> packers = {
-      {"RGB10 to DNxHD", 4, 8, false, true,
-       [](Rows& s, Rows& d, int w, int h) { VX_Convert_RGB_444_10u_To_DNxHD16u(s.base(), s.rowBytes, d.base(), w, h); },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         for (int k = 0; k < 3; ++k)
-           d.Put(row, 4 * x + k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k) * 64));
-       }},
-      {"DNxHD to RGB10", 8, 4, true, false,
-       [](Rows& s, Rows& d, int w, int h) { VX_Convert_DNxHD16u_To_RGB_444_10u(s.base(), d.base(), d.rowBytes, w, h); },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 4 * x + k)); };
-         d.Put(row, x, Word(at(0), at(1), at(2)));
-       }},
-      {"BGR16 to RGB10", 6, 4, false, false,
-       [](Rows& s, Rows& d, int w, int h) {
-         VX_Convert_j2k_BGR16u_To_RGB_444_10u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
-       },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 3 * x + k)); };
-         d.Put(row, x, Word(at(2), at(1), at(0)));
-       }},
-      {"RGB10 to BGR16", 4, 6, false, false,
-       [](Rows& s, Rows& d, int w, int h) {
-         VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
-       },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         for (int k = 0; k < 3; ++k)
-           d.Put(row, 3 * x + 2 - k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k)));
-       }},
-      {"RGB8 to BGRA8", 3, 4, false, false,
-       [](Rows& s, Rows& d, int w, int h) {
-         VX_ConvertRGB_444_8uToBGRA_4444_8u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
-       },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         for (int k = 0; k < 4; ++k) d.Put(row, 4 * x + k, k == 3 ? uint8_t{255} : s.Get<uint8_t>(row, 3 * x + 2 - k));
-       }},
-      {"RGB16 to XRGB15", 6, 8, false, false,
-       [](Rows& s, Rows& d, int w, int h) {
-         VX_ConvertRGB_444_16u_To_XRGB_4444_15u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
-       },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         d.Put(row, 4 * x, uint16_t{32768});
-         for (int k = 0; k < 3; ++k)
-           d.Put(row, 4 * x + 1 + k,
-                 static_cast<uint16_t>(std::lround(s.Get<uint16_t>(row, 3 * x + k) * 32768.0 / 65535)));
-       }},
-      {"V210 to UYVY16", 16, 4, false, false,  // 16 bytes are more than any pixel's share
-       [](Rows& s, Rows& d, int w, int h) {
-         VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(s.base(), s.rowBytes, d.base(), d.rowBytes, w, h);
-       },
-       [](const Rows& s, Rows& d, int row, size_t x) {
-         for (size_t i = 2 * x; i < 2 * x + 2; ++i)
-           d.Put(row, i, static_cast<uint16_t>(s.Get<uint32_t>(row, i / 3) / (1u << 10 * (i % 3)) % 1024));
-       }},
-  };
-  return packers;
-}
+constexpr Packer kPackers[] = {
+    {"RGB10 to DNxHD", 4, 1, 8, 1, Tight::Destination,
+     [](auto s, int n, auto d, int, int w, int h) { VX_Convert_RGB_444_10u_To_DNxHD16u(s, n, d, w, h); },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       for (int k = 0; k < 3; ++k)
+         d.Put(row, 4 * x + k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k) * 64));
+     }},
+    {"DNxHD to RGB10", 8, 1, 4, 1, Tight::Source,
+     [](auto s, int, auto d, int m, int w, int h) { VX_Convert_DNxHD16u_To_RGB_444_10u(s, d, m, w, h); },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 4 * x + k)); };
+       d.Put(row, x, Word(at(0), at(1), at(2)));
+     }},
+    {"BGR16 to RGB10", 6, 1, 4, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_Convert_j2k_BGR16u_To_RGB_444_10u(s, n, d, m, w, h); },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       const auto at = [&](int k) { return Top(s.Get<uint16_t>(row, 3 * x + k)); };
+       d.Put(row, x, Word(at(2), at(1), at(0)));
+     }},
+    {"RGB10 to BGR16", 4, 1, 6, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(s, n, d, m, w, h);
+     },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       for (int k = 0; k < 3; ++k)
+         d.Put(row, 3 * x + 2 - k, static_cast<uint16_t>(Component(s.Get<uint32_t>(row, x), k)));
+     }},
+    {"RGB8 to BGRA8", 3, 1, 4, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_8uToBGRA_4444_8u(s, n, d, m, w, h); },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       for (int k = 0; k < 4; ++k) d.Put(row, 4 * x + k, k == 3 ? uint8_t{255} : s.Get<uint8_t>(row, 3 * x + 2 - k));
+     }},
+    {"RGB16 to XRGB15", 6, 1, 8, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_16u_To_XRGB_4444_15u(s, n, d, m, w, h); },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       d.Put(row, 4 * x, uint16_t{32768});
+       for (int k = 0; k < 3; ++k)
+         d.Put(row, 4 * x + 1 + k,
+               static_cast<uint16_t>(std::lround(s.Get<uint16_t>(row, 3 * x + k) * 32768.0 / 65535)));
+     }},
+    {"V210 to UYVY10", 16, 6, 4, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(s, n, d, m, w, h);
+     },
+     [](const Rows& s, Rows& d, int row, size_t x) {
+       for (size_t i = 2 * x; i < 2 * x + 2; ++i)
+         d.Put(row, i, static_cast<uint16_t>(s.Get<uint32_t>(row, i / 3) / (1u << 10 * (i % 3)) % 1024));
+     }},
+    {"UYVY10 to V210", 4, 1, 16, 6, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertUYVY_422_10uToV210_422_10u(s, n, d, m, w, h); }},
+    {"Canon Log 3", 8, 1, 16, 1, Tight::None,
+     [](auto s, int n, auto d, int m, int w, int h) {
+       VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(s, n, d, m, w, h, w & 1);
+     }},
+    {"15u to 16u", 0, 1, 8, 1, Tight::None,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_InPlace(d, m, w, h); }},
+    {"15u to big-endian", 0, 1, 8, 1, Tight::None,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_BigEndian_InPlace(d, m, w, h); }},
+    {"byte swap", 0, 1, 4, 1, Tight::Both,
+     [](auto, int, auto d, int m, int w, int) {
+       VX_Convert_Uint32_BigEndian_InPlace(d, m < 0 ? -4 * w : 4 * w, w, 1);
+     }},
+    {"S-Gamut3", 0, 1, 8, 1, Tight::None,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_SGamut3_16u_To_SGamut3Cine_16u(d, m, w, h); }},
+    {"X'Y'Z'", 0, 1, 16, 1, Tight::None,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_ZYXx_32f_To_BGRX_32f_In_Place(d, m, w, h); }},
+    {"chroma offset", 0, 1, 16, 2, Tight::None,
+     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(d, m, w, h, 0.5f); }},
+};
 
-TEST(Packers, EachPixelAtAnySizeAndStrideAndNothingElse) {
-  for (const Packer& packer : Packers())
-    for (const int width : kSizes)
-      for (const bool upsideDown : {false, true}) {
-        const int height = 1 + width % 4;
-        const auto bytes = [&](size_t perPixel) { return perPixel * static_cast<size_t>(width); };
-        Rows src(bytes(packer.srcBytes), height, packer.tightSource ? 0 : 5, upsideDown && !packer.tightSource, 1);
-        Rows dst(bytes(packer.dstBytes), height, packer.tightDestination ? 0 : 9,
-                 !upsideDown && !packer.tightDestination, 2);
-        Rows expected = dst;
-        packer.run(src, dst, width, height);
-        for (int row = 0; row < height; ++row)
-          for (int x = 0; x < width; ++x) packer.expected(src, expected, row, static_cast<size_t>(x));
-        ASSERT_EQ(dst.memory, expected.memory) << packer.name << ", " << width << " pixels";
-        packer.run(src, dst, 0, height);
-        packer.run(src, dst, width, -1);
-        ASSERT_EQ(dst.memory, expected.memory) << packer.name << " of nothing";
-      }
+// Every pixel, and nothing else.
+void ExpectPacked(const Packer& packer, int width, int height, int padding, bool upsideDown) {
+  const bool tightSource = packer.tight == Tight::Source, tightDestination = packer.tight == Tight::Destination;
+  Rows src(static_cast<size_t>(packer.SourceRow(width)), height, tightSource ? 0 : padding, upsideDown && !tightSource,
+           1);
+  Rows dst(static_cast<size_t>(packer.DestinationRow(width)), height, tightDestination ? 0 : 3 * padding,
+           !upsideDown && !tightDestination, 2);
+  Rows expected = dst;
+  const auto run = [&](int w, int h) { packer.run(src.base(), src.rowBytes, dst.base(), dst.rowBytes, w, h); };
+  run(width, height);
+  for (int row = 0; row < height; ++row)
+    for (int x = 0; x < width; ++x) packer.expected(src, expected, row, static_cast<size_t>(x));
+  ASSERT_TRUE(dst.memory == expected.memory) << packer.name << ", " << width << " pixels";
+  run(0, height), run(width, -1);
+  ASSERT_TRUE(dst.memory == expected.memory) << packer.name << " of nothing";
 }
 
 // Past the cache, rows are staged in pieces.
-TEST(Packers, LargePicturesAreTheSame) {
-  const auto width = static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37);
-  for (const Packer& packer : Packers()) {
-    Rows src(packer.srcBytes * static_cast<size_t>(width), 8, 0, false, 3);
-    Rows dst(packer.dstBytes * static_cast<size_t>(width), 8, packer.tightDestination ? 0 : 2, false, 4);
-    Rows expected = dst;
-    packer.run(src, dst, width, 8);
-    for (int row = 0; row < 8; ++row)
-      for (int x = 0; x < width; ++x) packer.expected(src, expected, row, static_cast<size_t>(x));
-    ASSERT_TRUE(dst.memory == expected.memory) << packer.name;
+TEST(Packers, EachPixelAtAnySizeAndStrideAndNothingElse) {
+  for (const Packer& packer : kPackers) {
+    if (packer.expected == nullptr) continue;
+    for (const int width : kSizes)
+      for (const bool upsideDown : {false, true}) ExpectPacked(packer, width, 1 + width % 4, 3, upsideDown);
+    ExpectPacked(packer, static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37), 8, 0, true);
+    ExpectPacked(packer, static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37), 8, 1, false);
   }
 }
 
@@ -270,24 +281,9 @@ TEST(Packers, SGamut3WrapsAround) {
 
 TEST(Packers, FloatsToScaledIntegers) {
   using Limits = std::numeric_limits<float>;
-  std::vector<float> values = {0.5f,
-                               1.5f,
-                               2.5f,
-                               -0.5f,
-                               -1.5f,
-                               32767.4f,
-                               32767.5f,
-                               -32768.5f,
-                               -32769.0f,
-                               2147483520.0f,
-                               2147483648.0f,
-                               -2147483648.0f,
-                               -3e9f,
-                               Limits::max(),
-                               Limits::lowest(),
-                               Limits::infinity(),
-                               -Limits::infinity(),
-                               -0.0f};
+  constexpr float kTies[] = {0.5f, 1.5f, 2.5f, 32767.4f, 32767.5f, 32768.5f, 32769, 0x1.fffffep30f, 0x1p31f, 3e9f, 0};
+  std::vector<float> values = {Limits::max(), Limits::lowest(), Limits::infinity(), -Limits::infinity()};
+  for (const float tie : kTies) values.push_back(tie), values.push_back(-tie);
   testing::Random random(9);
   while (values.size() < 301) values.push_back(random.Float(-40000, 40000));
   for (const int scale : {0, 1, -1, 7, -16, 30, -40, 127, 140, -140, INT_MAX, INT_MIN}) {
@@ -371,112 +367,12 @@ TEST(Packers, ChromaOffsetLeavesLuma) {
   }
 }
 
-// ---- Arena ----
-
-// Bytes of a side's rows: `bytes` for each `pixels` begun. No bytes: the packer works in place.
-struct RowUnit {
-  int bytes, pixels;
-  int RowBytes(int width) const { return (width + pixels - 1) / pixels * bytes; }
-};
-struct ArmedPacker {
-  const char* name;
-  RowUnit src, dst;
-  bool oneRow;  // a side that has no row bytes
-  void (*run)(const void* src, int srcRow, void* dst, int dstRow, int w, int h);
-};
-
-constexpr ArmedPacker kArmedPackers[] = {
-    {"RGB10 to DNxHD",
-     {4, 1},
-     {8, 1},
-     true,
-     [](auto s, int n, auto d, int, int w, int h) { VX_Convert_RGB_444_10u_To_DNxHD16u(s, n, d, w, h); }},
-    {"DNxHD to RGB10",
-     {8, 1},
-     {4, 1},
-     true,
-     [](auto s, int, auto d, int m, int w, int h) { VX_Convert_DNxHD16u_To_RGB_444_10u(s, d, m, w, h); }},
-    {"BGR16 to RGB10",
-     {6, 1},
-     {4, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) { VX_Convert_j2k_BGR16u_To_RGB_444_10u(s, n, d, m, w, h); }},
-    {"RGB10 to BGR16",
-     {4, 1},
-     {6, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) {
-       VX_Convert_j2k_RGB_444_10u_To_10_Bits_Within_BGR16u(s, n, d, m, w, h);
-     }},
-    {"RGB8 to BGRA8",
-     {3, 1},
-     {4, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_8uToBGRA_4444_8u(s, n, d, m, w, h); }},
-    {"RGB16 to XRGB15",
-     {6, 1},
-     {8, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertRGB_444_16u_To_XRGB_4444_15u(s, n, d, m, w, h); }},
-    {"UYVY10 to V210",
-     {4, 1},
-     {16, 6},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) { VX_ConvertUYVY_422_10uToV210_422_10u(s, n, d, m, w, h); }},
-    {"V210 to UYVY10",
-     {16, 6},
-     {4, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) {
-       VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(s, n, d, m, w, h);
-     }},
-    {"Canon Log 3",
-     {8, 1},
-     {16, 1},
-     false,
-     [](auto s, int n, auto d, int m, int w, int h) {
-       VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(s, n, d, m, w, h, w & 1);
-     }},
-    {"15u to 16u",
-     {},
-     {8, 1},
-     false,
-     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_InPlace(d, m, w, h); }},
-    {"15u to big-endian",
-     {},
-     {8, 1},
-     false,
-     [](auto, int, auto d, int m, int w, int h) { VX_Convert_15u_To_16u_BigEndian_InPlace(d, m, w, h); }},
-    {"byte swap",
-     {},
-     {4, 1},
-     true,
-     [](auto, int, auto d, int m, int w, int) {
-       VX_Convert_Uint32_BigEndian_InPlace(d, m < 0 ? -4 * w : 4 * w, w, 1);
-     }},
-    {"S-Gamut3",
-     {},
-     {8, 1},
-     false,
-     [](auto, int, auto d, int m, int w, int h) { VX_Convert_SGamut3_16u_To_SGamut3Cine_16u(d, m, w, h); }},
-    {"X'Y'Z'",
-     {},
-     {16, 1},
-     false,
-     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_ZYXx_32f_To_BGRX_32f_In_Place(d, m, w, h); }},
-    {"chroma offset",
-     {},
-     {16, 2},
-     false,
-     [](auto, int, auto d, int m, int w, int h) { VX_Convert_j2k_UYVY_422_32f_Offset_In_Place(d, m, w, h, 0.5f); }},
-};
-
 // The last byte of a side's row is the last one of the arena's, whose pixels are words here.
 TEST(Packers, Arena) {
-  for (const ArmedPacker& packer : kArmedPackers) {
+  for (const Packer& packer : kPackers) {
     const auto widthOf = [&](int words) {
-      const int pixels = words * 4 / packer.dst.bytes * packer.dst.pixels;
-      return std::max(pixels - words % packer.dst.pixels, 0);
+      const int pixels = words * 4 / packer.dstBytes * packer.dstPixels;
+      return std::max(pixels - words % packer.dstPixels, 0);
     };
     const auto words = [](int bytes) { return std::max((bytes + 3) / 4, 1); };
     testing::ArenaCase arenaCase;
@@ -484,21 +380,21 @@ TEST(Packers, Arena) {
     arenaCase.destination = VX_PixelFormat::BGRA_4444_8u;
     arenaCase.destinationIsInput = true;
     arenaCase.everyContents = true;
-    if (packer.oneRow) arenaCase.heights = {1};
-    if (packer.src.bytes != 0) {
+    if (packer.tight != Tight::None) arenaCase.heights = {1};
+    if (packer.srcBytes != 0) {
       arenaCase.sources = {VX_PixelFormat::BGRA_4444_8u};
       arenaCase.sourceSize = [&](int, testing::ArenaSize size) {
-        return testing::ArenaSize{words(packer.src.RowBytes(widthOf(size.width))), size.height};
+        return testing::ArenaSize{words(packer.SourceRow(widthOf(size.width))), size.height};
       };
     }
     arenaCase.run = [&](const testing::ArenaFrame* src, const testing::ArenaFrame& dst) {
       const int width = widthOf(dst.width);
-      const auto flush = [&](const testing::ArenaFrame& frame, const RowUnit& unit) {
-        return frame.Row(0) + 4 * frame.width - unit.RowBytes(width);
+      const auto flush = [&](const testing::ArenaFrame& frame, int rowBytes) {
+        return frame.Row(0) + 4 * frame.width - rowBytes;
       };
-      const bool isInPlace = packer.src.bytes == 0;
-      packer.run(isInPlace ? nullptr : flush(*src, packer.src), isInPlace ? 0 : src->rowBytes, flush(dst, packer.dst),
-                 dst.rowBytes, width, dst.height);
+      const bool isInPlace = packer.srcBytes == 0;
+      packer.run(isInPlace ? nullptr : flush(*src, packer.SourceRow(width)), isInPlace ? 0 : src->rowBytes,
+                 flush(dst, packer.DestinationRow(width)), dst.rowBytes, width, dst.height);
       return VX_Success;
     };
     EXPECT_TRUE(testing::RunArena(arenaCase));

@@ -14,23 +14,6 @@
 namespace vexel::testing {
 namespace {
 
-const KernelCase kCases[] = {
-    {"Uyvy8ToV210", &kUyvy8ToV210, kPairs8, kGroups10},
-    {"V210ToUyvy8", &kV210ToUyvy8, kGroups10, kPairs8},
-    {"Uyvy32fToV210", &kUyvy32fToV210, kPairs32f, kGroups10},
-    {"V210ToUyvy32f", &kV210ToUyvy32f, kGroups10, kPairs32f},
-    {"V210ToBgrx8_601", &kV210ToBgrx8_601, kGroups10, kPixels8},
-    {"V210ToBgrx8_709", &kV210ToBgrx8_709, kGroups10, kPixels8},
-    {"V210ToVuyx8", &kV210ToVuyx8, kGroups10, kPixels8},
-    {"V210_709ToVuyx8_601", &kV210_709ToVuyx8_601, kGroups10, kPixels8},
-};
-
-// With rows of several runs that stay in the cache, and both kinds of ends.
-TEST(V210Kernels, VariantsAgreeAndStayInTheRow) {
-  for (const KernelCase& kernelCase : kCases)
-    ExpectVariantsAgree(kernelCase, 80, {191, 192, 193, 197, 198, 383, 384, 389, 720});
-}
-
 std::vector<uint32_t> PackCodes(const std::vector<int>& codes) {
   std::vector<uint32_t> words((codes.size() + 11) / 12 * 4);
   for (size_t i = 0; i < codes.size(); ++i) words[i / 3] |= static_cast<uint32_t>(codes[i]) << (i % 3 * 10);

@@ -28,13 +28,6 @@ const Matrix kMatrices[] = {
      [](const Triple& p) { return BgrToVuy(k601, VuyToBgr(k709, p)); }},
 };
 
-TEST(YuvMatrix8, VariantsAgreeAndStayInTheRow) {
-  for (const Matrix& matrix : kMatrices) {
-    ExpectVariantsAgree({matrix.name, matrix.kept, kPixels8, kPixels8}, 130);
-    ExpectVariantsAgree({matrix.name, matrix.opaque, kPixels8, kPixels8}, 130);
-  }
-}
-
 // All 2^24 colours against the equations. Every matrix is affine, so it is known by where it takes four colours.
 TEST(YuvMatrix8, EveryColourIsRoundedRight) {
   constexpr size_t kRow = 65536;

@@ -21,6 +21,19 @@ inline std::vector<VX_PixelFormat> RasterFormats() {
   return formats;
 }
 
+// All 4:2:0 formats: 16 planar ones and 22 biplanar ones.
+inline std::vector<VX_PixelFormat> Formats420() {
+  std::vector<VX_PixelFormat> formats;
+#define VX_PUSH_420(name, value, hostName, mapping) FromBits(value),
+#define VX_PUSH_UNNAMED_420(value, hostName, mapping) FromBits(value),
+  for (const VX_PixelFormat format :
+       {VX_PIXEL_FORMATS(VX_PUSH_420) VX_UNNAMED_PIXEL_FORMATS(VX_PUSH_UNNAMED_420) VX_PixelFormat::Invalid})
+    if (Bits(format) >> 24 >= 9) formats.push_back(format);
+#undef VX_PUSH_420
+#undef VX_PUSH_UNNAMED_420
+  return formats;
+}
+
 inline const char* FormatName(VX_PixelFormat format) {
   return format == kRgb10Format ? "RGB_444_10u" : VX_PixelFormatName(format);
 }

@@ -8,25 +8,11 @@
 #include <cstdint>
 #include <vector>
 
-#include "formats/FormatBits.h"
+#include "support/Formats.h"
 #include "support/Random.h"
 #include "vexel/vexel.h"
 
 namespace vexel::testing {
-
-// All 4:2:0 formats: 16 planar ones and 22 biplanar ones.
-inline std::vector<VX_PixelFormat> Formats420() {
-  std::vector<VX_PixelFormat> formats;
-#define VX_PUSH_420(name, value, hostName, mapping) \
-  if (((value) >> 24) >= 9) formats.push_back(VX_PixelFormat::name);
-  VX_PIXEL_FORMATS(VX_PUSH_420)
-#undef VX_PUSH_420
-#define VX_PUSH_420(value, hostName, mapping) \
-  if (((value) >> 24) >= 9) formats.push_back(FromBits(value));
-  VX_UNNAMED_PIXEL_FORMATS(VX_PUSH_420)
-#undef VX_PUSH_420
-  return formats;
-}
 
 // A picture in a block of exactly its size.
 struct Block420 {
