@@ -63,6 +63,14 @@ std::function<Rgb(Rgb, Noise&)> Powers(double decode, double encode, Matrix m, b
   };
 }
 
+using Run = std::function<void(const float*, float*, int)>;
+Run FromRec709(const ColorSpace& space, bool compress) {
+  return [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsFromRec709(s, d, n, compress); };
+}
+Run ToRec709(const ColorSpace& space, bool compress) {
+  return [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsToRec709(s, d, n, compress); };
+}
+
 std::vector<Operation> TransferOperations() {
   static const VX::SRGBColorSpace srgb;
   static const VX::Rec2020ColorSpace rec2020;
@@ -72,14 +80,8 @@ std::vector<Operation> TransferOperations() {
   const auto both = [&](const std::string& name, const ColorSpace& space, const auto& from, const auto& to) {
     for (const bool compress : {false, true}) {
       const std::string suffix = compress ? " compressed" : "";
-      list.push_back(
-          {"from Rec.709 to " + name + suffix,
-           [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsFromRec709(s, d, n, compress); },
-           from(compress)});
-      list.push_back(
-          {"to Rec.709 from " + name + suffix,
-           [&space, compress](const float* s, float* d, int n) { space.ConvertPixelsToRec709(s, d, n, compress); },
-           to(compress)});
+      list.push_back({"from Rec.709 to " + name + suffix, FromRec709(space, compress), from(compress)});
+      list.push_back({"to Rec.709 from " + name + suffix, ToRec709(space, compress), to(compress)});
     }
   };
   both(
@@ -131,53 +133,49 @@ std::vector<Operation> HdrOperations() {
   for (const auto* space : {&pq, &pqWhite, &pqP3}) {
     const double white = space == &pqWhite ? kWhite : 1;
     const std::string name = space == &pqP3 ? "PQ P3" : space == &pqWhite ? "PQ with white" : "PQ";
-    list.push_back({"from Rec.709 to " + name,
-                    [space](const float* s, float* d, int n) { space->ConvertPixelsFromRec709(s, d, n, true); },
-                    [m = Conversion(rec709, *space), white](Rgb c, Noise& noise) {
-                      c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
-                      c = Times(m, c, noise);
-                      return Each(c, noise,
-                                  [&](double v) { return std::copysign(PqCurve::Encode(v, noise) / white, v); });
-                    },
-                    -0.4f, 3.0f});
+    const Matrix m = Conversion(rec709, *space), back = Conversion(*space, rec709);
+    const auto toSignal = [=](Rgb c, Noise& noise) {
+      c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
+      c = Times(m, c, noise);
+      return Each(c, noise, [&](double v) { return std::copysign(PqCurve::Encode(v, noise) / white, v); });
+    };
+    list.push_back({"from Rec.709 to " + name, FromRec709(*space, true), toSignal, -0.4f, 3.0f});
     for (const bool compress : {false, true}) {
       const bool table = white == 1 && !compress;
-      list.push_back(
-          {"to Rec.709 from " + name + (compress ? " compressed" : ""),
-           [space, compress](const float* s, float* d, int n) { space->ConvertPixelsToRec709(s, d, n, compress); },
-           [=, m = Conversion(*space, rec709)](Rgb c, Noise& noise) {
-             c = Each(c, noise, [&](double v) {
-               if (table) v = std::floor(std::clamp(v, 0.0, 1.0) * 4095) / 4095;
-               return std::copysign(PqCurve::Decode(v * white, noise), v);
-             });
-             c = Each(Times(m, c, noise), noise, encode);
-             return compress ? CompressGamut(c, kLuma709, noise) : c;
-           },
-           -0.4f, 1.2f, table ? 4096 : 0});
+      const auto fromSignal = [=](Rgb c, Noise& noise) {
+        c = Each(c, noise, [&](double v) {
+          if (table) v = std::floor(std::clamp(v, 0.0, 1.0) * 4095) / 4095;
+          return std::copysign(PqCurve::Decode(v * white, noise), v);
+        });
+        c = Each(Times(back, c, noise), noise, encode);
+        return compress ? CompressGamut(c, kLuma709, noise) : c;
+      };
+      list.push_back({"to Rec.709 from " + name + (compress ? " compressed" : ""), ToRec709(*space, compress),
+                      fromSignal, -0.4f, 1.2f, table ? 4096 : 0});
     }
   }
-  list.push_back(
-      {"from Rec.709 to HLG", [](const float* s, float* d, int n) { hlg.ConvertPixelsFromRec709(s, d, n, true); },
-       [](Rgb c, Noise& noise) {
-         c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
-         c = Times(kTo2020, c, noise);
-         const double luma = noise(HlgCurve::Luma(Each(c, noise, [](double v) { return std::abs(v) * 0.1; })));
-         const double gain = noise(1 / std::max(0.0001, std::pow(luma, 1.0f / 6)));
-         return Each(c, noise, [&](double v) {
-           return std::copysign(HlgCurve::Encode(noise(std::abs(v) * 0.1 * gain), noise), v);
-         });
-       },
-       -0.4f, 2.5f});
-  list.push_back(
-      {"to Rec.709 from HLG", [](const float* s, float* d, int n) { hlg.ConvertPixelsToRec709(s, d, n, true); },
-       [=](Rgb c, Noise& noise) {
-         c = Each(c, noise,
-                  [](double v) { return HlgCurve::Decode(std::floor(std::clamp(v, 0.0, 1.0) * 2047) / 2047); });
-         const double gain = noise(10 * std::pow(noise(HlgCurve::Luma(c)), 0.2f));
-         c = Each(c, noise, [=](double v) { return v * gain; });
-         return Each(Times(kFrom2020, c, noise), noise, encode);
-       },
-       -0.4f, 1.2f, 2048});
+  list.push_back({"from Rec.709 to HLG", FromRec709(hlg, true),
+                  [](Rgb c, Noise& noise) {
+                    c = Each(c, noise, [](double v) { return SignedPow(v, 2.4f); });
+                    c = Times(kTo2020, c, noise);
+                    const double luma =
+                        noise(HlgCurve::Luma(Each(c, noise, [](double v) { return std::abs(v) * 0.1; })));
+                    const double gain = noise(1 / std::max(0.0001, std::pow(luma, 1.0f / 6)));
+                    return Each(c, noise, [&](double v) {
+                      return std::copysign(HlgCurve::Encode(noise(std::abs(v) * 0.1 * gain), noise), v);
+                    });
+                  },
+                  -0.4f, 2.5f});
+  list.push_back({"to Rec.709 from HLG", ToRec709(hlg, true),
+                  [=](Rgb c, Noise& noise) {
+                    c = Each(c, noise, [](double v) {
+                      return HlgCurve::Decode(std::floor(std::clamp(v, 0.0, 1.0) * 2047) / 2047);
+                    });
+                    const double gain = noise(10 * std::pow(noise(HlgCurve::Luma(c)), 0.2f));
+                    c = Each(c, noise, [=](double v) { return v * gain; });
+                    return Each(Times(kFrom2020, c, noise), noise, encode);
+                  },
+                  -0.4f, 1.2f, 2048});
   return list;
 }
 
@@ -187,36 +185,27 @@ std::vector<Operation> LinearOperations() {
   static const VX::Rec2020ColorSpace rec2020;
   static const VX::DCIP3ColorSpace p3(VX_IlluminantDCI);
   std::vector<Operation> list;
-  struct Tone {
+  const auto pure = [](double gamma) { return ToneReference{0, 1, 0, gamma, 1, 0, 1, 0, 1 / gamma, 1, {}, {}, 0, 0}; };
+  const struct {
     const char* name;
-    const ColorSpace* space;
-    double threshold, scale, offset, exponent, slope, encodeThreshold, encodeScale, encodeSlope;
-  };
-  for (const Tone& tone :
-       {Tone{"sRGB", &srgb, 0.04045, 1 / 1.055, 0.055, 2.4, 1 / 12.92, 0.0031308, 1.055, 12.92},
-        Tone{"Rec.709", &rec709, 0, 1, 0, 2.4f, 1, 0, 1, 1}, Tone{"Rec.2020", &rec2020, 0, 1, 0, 2.4f, 1, 0, 1, 1},
-        Tone{"P3", &p3, 0, 1, 0, 2.6f, 1, 0, 1, 1}})
-    for (const auto& [a, b, c] : {std::array{1.0f, 1.2f, 0.6f}, {4.0f, 1.05f, 0.9f}, {0.3f, 2.0f, 0.25f}}) {
-      const ToneReference reference{tone.threshold,
-                                    tone.scale,
-                                    tone.offset,
-                                    tone.exponent,
-                                    tone.slope,
-                                    tone.encodeThreshold,
-                                    tone.encodeScale,
-                                    -tone.offset,
-                                    1 / tone.exponent,
-                                    tone.encodeSlope,
-                                    Elements(tone.space->RGBtoXYZ()),
-                                    Elements(tone.space->XYZtoRGB()),
-                                    tone.space->WhitePoint()[0],
-                                    tone.space->WhitePoint()[1]};
-      list.push_back({std::string("tones of ") + tone.name,
-                      [space = tone.space, a = a, b = b, c = c](const float* s, float* d, int n) {
-                        space->CompressPixelsToSDR(s, d, n, a, b, c);
-                      },
-                      [reference, a = a, b = b, c = c](Rgb v, Noise& noise) { return reference(v, a, b, c, noise); }, 0,
-                      2.5f});
+    const ColorSpace& space;
+    ToneReference curve;
+  } tones[] = {{"sRGB",
+                srgb,
+                {0.04045, 1 / 1.055, 0.055, 2.4, 1 / 12.92, 0.0031308, 1.055, -0.055, 1 / 2.4, 12.92, {}, {}, 0, 0}},
+               {"Rec.709", rec709, pure(2.4f)},
+               {"Rec.2020", rec2020, pure(2.4f)},
+               {"P3", p3, pure(2.6f)}};
+  for (const auto& tone : tones)
+    for (const auto& p : {std::array{1.0f, 1.2f, 0.6f}, {4.0f, 1.05f, 0.9f}, {0.3f, 2.0f, 0.25f}}) {
+      ToneReference curve = tone.curve;
+      curve.toXyz = Elements(tone.space.RGBtoXYZ()), curve.fromXyz = Elements(tone.space.XYZtoRGB());
+      curve.whiteX = tone.space.WhitePoint()[0], curve.whiteY = tone.space.WhitePoint()[1];
+      const auto run = [&space = tone.space, p](const float* s, float* d, int n) {
+        space.CompressPixelsToSDR(s, d, n, p[0], p[1], p[2]);
+      };
+      const auto reference = [curve, p](Rgb v, Noise& noise) { return curve(v, p[0], p[1], p[2], noise); };
+      list.push_back({std::string("tones of ") + tone.name, run, reference, 0, 2.5f});
     }
   list.push_back({"Y'CbCr to RGB", [](const float* s, float* d, int n) { rec2020.ConvertPixelsFromYUVtoRGB(s, d, n); },
                   [](Rgb c, Noise& noise) {  // Y', Cb, Cr where R, G, B stands

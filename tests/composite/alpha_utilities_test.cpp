@@ -15,6 +15,7 @@
 #include <utility>
 #include <vector>
 
+#include "composite/composite_image.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
 #include "support/Formats.h"
@@ -168,17 +169,6 @@ std::vector<Operation> Operations() {
   return operations;
 }
 
-struct Picture {
-  Picture(F f, int w, int h)
-      : rowBytes(static_cast<int>(UnpaddedRowBytes(f, w))), bytes(static_cast<size_t>(rowBytes) * h) {
-    frame = {bytes.data(), rowBytes, f, w, h};
-  }
-  Picture(const Picture&) = delete;
-  int rowBytes;
-  std::vector<uint8_t> bytes;
-  ArenaFrame frame;
-};
-
 // Every 8u channel under every alpha; every 16-bit alpha; floats around 0..1.
 double DomainSample(F f, size_t pixel, size_t channel) {
   const bool isAlpha = channel == AlphaAt(f);
@@ -190,14 +180,14 @@ double DomainSample(F f, size_t pixel, size_t channel) {
 TEST(AlphaUtilities, WholeDomains) {
   for (const Operation& operation : Operations())
     for (const F f : FormatsThat(operation.takes)) {
-      Picture src(f, 256, 256), dst(f, 256, 256);
+      Image src(f, 256, 256), dst(f, 256, 256);
       for (size_t i = 0; i < 65536; ++i)
         for (size_t k = 0; k < 4; ++k) {
           Put(src.bytes.data(), 4 * i + k, f, DomainSample(f, i, k));
           Put(dst.bytes.data(), 4 * i + k, f, DomainSample(f, i + 7, k));
         }
       const std::vector<uint8_t> before = dst.bytes;
-      ASSERT_EQ(operation.run(src.frame, dst.frame), VX_Success) << operation.name;
+      ASSERT_EQ(operation.run(src.Frame(), dst.Frame()), VX_Success) << operation.name;
       for (size_t i = 0; i < 65536; ++i) {
         double in[4], out[4];
         for (size_t k = 0; k < 4; ++k) {
@@ -210,7 +200,7 @@ TEST(AlphaUtilities, WholeDomains) {
               << operation.name << " of " << FormatName(f) << ", channel " << k << " of " << in[0] << " " << in[1]
               << " " << in[2] << " " << in[3];
       }
-      ASSERT_EQ(operation.run(src.frame, src.frame), VX_Success);
+      ASSERT_EQ(operation.run(src.Frame(), src.Frame()), VX_Success);
       if (operation.readsDestination) continue;
       ASSERT_EQ(src.bytes, dst.bytes) << operation.name << " in place";
     }
@@ -258,17 +248,12 @@ TEST(AlphaUtilities, GainConvertsInAndOut) {
     for (const F to : RasterFormats())
       for (const int hint : {2, 3}) {
         const F working = ExpectedWorking(to, hint);
-        Picture src(from, 390, 3), between(working, 390, 3), want(to, 390, 3), got(to, 390, 3);
-        Random random(Bits(from) * 31 + Bits(to));
-        for (int row = 0; row < 3; ++row)
-          FillSamples(src.frame.Row(row), static_cast<size_t>(src.rowBytes), from, Contents::Random, random);
-        const auto convert = [&](const ArenaFrame& s, const ArenaFrame& d) {
-          return VX_Convert(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, d.width, d.height, hint);
-        };
-        ASSERT_EQ(convert(src.frame, between.frame), VX_Success);
-        ASSERT_EQ(Gain(between.frame, between.frame, 0.4f, 0), VX_Success);
-        ASSERT_EQ(convert(between.frame, want.frame), VX_Success);
-        ASSERT_EQ(Gain(src.frame, got.frame, 0.4f, hint), VX_Success);
+        Image src(from, 390, 3, Contents::Random, Bits(from) * 31 + Bits(to)), between(working, 390, 3),
+            want(to, 390, 3), got(to, 390, 3);
+        ASSERT_EQ(Convert(src, between, hint), VX_Success);
+        ASSERT_EQ(Gain(between.Frame(), between.Frame(), 0.4f, 0), VX_Success);
+        ASSERT_EQ(Convert(between, want, hint), VX_Success);
+        ASSERT_EQ(Gain(src.Frame(), got.Frame(), 0.4f, hint), VX_Success);
         ASSERT_EQ(got.bytes, want.bytes) << FormatName(from) << " to " << FormatName(to) << ", hint " << hint;
       }
 }
@@ -276,9 +261,9 @@ TEST(AlphaUtilities, GainConvertsInAndOut) {
 TEST(AlphaUtilities, GainOfNothingFills) {
   for (const F f : RasterFormats())
     for (const float gain : {0.0f, 7.9e-6f, -1.0f, NAN}) {
-      Picture src(F::BGRA_4444_8u, 7, 3), want(f, 7, 3), got(f, 7, 3);
-      EXPECT_EQ(Gain(src.frame, got.frame, gain, 0),
-                VX_FillWithTransparentBlack(want.frame.base, want.rowBytes, 7, 3, f));
+      Image src(F::BGRA_4444_8u, 7, 3), want(f, 7, 3), got(f, 7, 3);
+      EXPECT_EQ(Gain(src.Frame(), got.Frame(), gain, 0),
+                VX_FillWithTransparentBlack(want.Frame().base, want.rowBytes, 7, 3, f));
       EXPECT_EQ(got.bytes, want.bytes) << FormatName(f) << " by " << gain;
     }
 }
@@ -313,17 +298,15 @@ VX_Result ChooseAndCheck(const ArenaFrame& a, const ArenaFrame& b, const ArenaFr
                          int offset) {
   const F to = d.format;
   const int maskBytes = (offset + d.width + 7) / 8, pixel = static_cast<int>(UnpaddedRowBytes(to, 1));
-  Picture fromA(to, d.width, d.height), fromB(to, d.width, d.height);
-  for (const auto& [image, copy] : {std::pair(&a, &fromA), std::pair(&b, &fromB)})
-    VX_Convert(image->base, image->rowBytes, image->format, copy->frame.base, copy->rowBytes, to, d.width, d.height, 2);
+  Image fromA(to, d.width, d.height), fromB(to, d.width, d.height);
+  Convert(a, fromA, 2), Convert(b, fromB, 2);
   const uint8_t* bits = mask.Row(0) + 4 * mask.width - maskBytes;
   const VX_Result result = VX_OneBitMaskComposite(a.base, a.rowBytes, a.format, b.base, b.rowBytes, to, bits,
                                                   mask.rowBytes, offset, d.base, d.rowBytes, to, d.width, d.height, 2);
   for (int y = 0; y < d.height; ++y)
     for (int x = 0; x < d.width; ++x) {
       const bool takesA = (bits[y * ptrdiff_t{mask.rowBytes} + (offset + x) / 8] & 0x80 >> (offset + x) % 8) != 0;
-      if (std::memcmp(d.Row(y) + pixel * x, (takesA ? fromA : fromB).frame.Row(y) + pixel * x, pixel))
-        return VX_ErrReserved1;
+      if (std::memcmp(d.Row(y) + pixel * x, (takesA ? fromA : fromB).Row(y) + pixel * x, pixel)) return VX_ErrReserved1;
     }
   return result;
 }
@@ -493,10 +476,11 @@ TEST(AlphaUtilities, Refusals) {
 // Rows that need memory: 4:2:2 is converted row by row.
 TEST(AlphaUtilities, FailingAllocations) {
   constexpr int kWidth = 20000;
-  Picture pairs(F::UYVY_422_8u, kWidth, 2), pixels(F::BGRA_4444_32f, kWidth, 2);
+  Image pairs(F::UYVY_422_8u, kWidth, 2), pixels(F::BGRA_4444_32f, kWidth, 2);
   const std::vector<uint8_t> mask(kWidth / 8);
-  EXPECT_GE(ExpectSurvivesFailingAllocations("VX_AlphaGain", [&] { return Gain(pairs.frame, pixels.frame, 0.5f, 0); }),
-            1);
+  EXPECT_GE(
+      ExpectSurvivesFailingAllocations("VX_AlphaGain", [&] { return Gain(pairs.Frame(), pixels.Frame(), 0.5f, 0); }),
+      1);
   const auto choose = [&] {
     return VX_OneBitMaskComposite(pairs.bytes.data(), pairs.rowBytes, F::UYVY_422_8u, pixels.bytes.data(),
                                   pixels.rowBytes, F::BGRA_4444_32f, mask.data(), 0, 0, pixels.bytes.data(),

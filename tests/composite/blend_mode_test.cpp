@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "composite/BlendReference.h"
-#include "formats/FormatBits.h"
+#include "composite/composite_image.h"
 #include "frame/RuntimeRandom.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
@@ -45,32 +45,24 @@ std::vector<M> Modes(bool withDissolve = false) {
   return modes;
 }
 
-struct Image {
-  const void* base;
-  int32_t rowBytes;
-  F format;
-};
-
-VX_Result Blend(M mode, const Image& src, const Image& background, const Image& dst, int32_t width, int32_t height,
+VX_Result Blend(M mode, const View& src, const View& background, const View& dst, int32_t width, int32_t height,
                 float opacity = 1, int32_t quality = 3) {
   return VX_CompositeWithBlendMode(src.base, src.rowBytes, src.format, background.base, background.rowBytes,
-                                   background.format, const_cast<void*>(dst.base), dst.rowBytes, dst.format, width,
-                                   height, opacity, static_cast<int32_t>(mode), quality, false);
+                                   background.format, dst.Target(), dst.rowBytes, dst.format, width, height, opacity,
+                                   static_cast<int32_t>(mode), quality, false);
 }
 
+template <class T>
+std::vector<T> BlendPixels(F format, M mode, const std::vector<T>& src, const std::vector<T>& background, int32_t width,
+                           int32_t height, float opacity) {
+  std::vector<T> out(src.size());
+  const auto view = [&](const std::vector<T>& p) { return View(p.data(), width * 4 * int{sizeof(T)}, format); };
+  EXPECT_EQ(Blend(mode, view(src), view(background), view(out), width, height, opacity), VX_Success);
+  return out;
+}
 Floats BlendFloats(M mode, const Floats& src, const Floats& background, int32_t width, int32_t height,
                    float opacity = 1) {
-  Floats out(src.size());
-  const auto image = [&](const Floats& pixels) { return Image{pixels.data(), width * 16, kFloats}; };
-  EXPECT_EQ(Blend(mode, image(src), image(background), image(out), width, height, opacity), VX_Success);
-  return out;
-}
-
-Bytes BlendBytes(M mode, const Bytes& src, const Bytes& background, int32_t width, int32_t height, float opacity) {
-  Bytes out(src.size());
-  const auto image = [&](const Bytes& pixels) { return Image{pixels.data(), width * 4, kBytes}; };
-  EXPECT_EQ(Blend(mode, image(src), image(background), image(out), width, height, opacity), VX_Success);
-  return out;
+  return BlendPixels(kFloats, mode, src, background, width, height, opacity);
 }
 
 // The same by way of a float picture.
@@ -78,7 +70,7 @@ Bytes BlendBytesInFloats(M mode, const Bytes& src, const Bytes& background, int3
                          float opacity) {
   Floats wide(src.size());
   Bytes out(src.size());
-  const Image floats{wide.data(), width * 16, kFloats};
+  const View floats{wide.data(), width * 16, kFloats};
   EXPECT_EQ(Blend(mode, {src.data(), width * 4, kBytes}, {background.data(), width * 4, kBytes}, floats, width, height,
                   opacity),
             VX_Success);
@@ -187,7 +179,7 @@ class ByteBlend : public ::testing::Test {
  protected:
   void Expect(M mode, const Bytes& src, const Bytes& background, int32_t width, float opacity) {
     const auto height = static_cast<int32_t>(src.size() / 4) / width;
-    const Bytes out = BlendBytes(mode, src, background, width, height, opacity);
+    const Bytes out = BlendPixels(kBytes, mode, src, background, width, height, opacity);
     ASSERT_EQ(out, BlendBytesInFloats(mode, src, background, width, height, opacity)) << ModeName(mode);
     for (size_t i = 0; i < out.size(); i += 4) {
       const auto pixel = [i](const Bytes& p) {
@@ -334,8 +326,7 @@ ArenaCase BlendCase(M mode, F src, F background, F dst, float opacity) {
   arenaCase.destination = dst;
   arenaCase.run = [=](const ArenaFrame* in, const ArenaFrame& to) {
     SeedRuntimeRandom(5);  // one row goes on with the thread's generator
-    return Blend(mode, {in[0].base, in[0].rowBytes, src}, {in[1].base, in[1].rowBytes, background},
-                 {to.base, to.rowBytes, dst}, to.width, to.height, opacity);
+    return Blend(mode, in[0], in[1], to, to.width, to.height, opacity);
   };
   return arenaCase;
 }
@@ -375,11 +366,11 @@ TEST(BlendArena, InPlace) {
         arenaCase.widths = {1, 4, 17, 63, 130, 385, 801};
         arenaCase.heights = {1, 3, 66};
         arenaCase.run = [=](const ArenaFrame* in, const ArenaFrame& to) {
-          const Image other{in->base, in->rowBytes, format}, place{to.base, to.rowBytes, format};
+          const View other(*in), place(to);
           const auto row = static_cast<size_t>(UnpaddedRowBytes(format, to.width));
           Bytes apart(row * static_cast<size_t>(to.height)), copy(apart.size());
           for (int y = 0; y < to.height; ++y) std::memcpy(&copy[row * y], to.Row(y), row);
-          const Image held{copy.data(), static_cast<int32_t>(row), format},
+          const View held{copy.data(), static_cast<int32_t>(row), format},
               out{apart.data(), static_cast<int32_t>(row), format};
           SeedRuntimeRandom(5);
           VX_Result result =
@@ -468,7 +459,7 @@ TEST(BlendMode, RefusesInOrderBeforeItTouchesAPixel) {
                    c.width, c.height);
     });
   uint8_t pixel[4] = {};
-  const Image some{pixel, 4, kBytes}, none{nullptr, 4, kBytes};
+  const View some{pixel, 4, kBytes}, none{nullptr, 4, kBytes};
   EXPECT_EQ(Blend(M::Hue, none, some, some, 1, 1), VX_ErrNullSource);
   EXPECT_EQ(Blend(M::Hue, some, none, some, 1, 1), VX_ErrNullSource);
   EXPECT_EQ(Blend(M::Dissolve, some, some, none, 1, 1), VX_ErrNullDestination);

@@ -11,6 +11,17 @@
 
 namespace vexel::testing {
 
+// Pixels wherever they are.
+struct View {
+  View(const void* pixels, int32_t bytes, VX_PixelFormat f) : base(pixels), rowBytes(bytes), format(f) {}
+  View(const ArenaFrame& frame) : View(frame.base, frame.rowBytes, frame.format) {}
+  void* Target() const { return const_cast<void*>(base); }
+
+  const void* base;
+  int32_t rowBytes;
+  VX_PixelFormat format;
+};
+
 struct Image {
   Image(VX_PixelFormat f, int w, int h, Contents contents = Contents::Random, uint64_t seed = 1)
       : format(f), width(w), height(h), rowBytes(static_cast<int32_t>(UnpaddedRowBytes(f, w))) {
@@ -18,6 +29,9 @@ struct Image {
     Random random(seed);
     for (int row = 0; row < h; ++row) FillSamples(Row(row), static_cast<size_t>(rowBytes), f, contents, random);
   }
+  Image(VX_PixelFormat f, int w, int h, uint64_t seed) : Image(f, w, h, Contents::Random, seed) {}
+  operator View() const { return {bytes.data(), rowBytes, format}; }
+  ArenaFrame Frame() { return {bytes.data(), rowBytes, format, width, height}; }
   uint8_t* Row(int row) { return bytes.data() + ptrdiff_t{row} * rowBytes; }
   // A row counted from the picture's top.
   uint8_t* UprightRow(int row) { return Row(VX_IsOriginTopLeft(format) ? row : height - 1 - row); }
@@ -32,9 +46,9 @@ struct Image {
   std::vector<uint8_t> bytes;
 };
 
-inline VX_Result Convert(Image& from, Image& to, int32_t quality = 3) {
-  return VX_Convert(from.bytes.data(), from.rowBytes, from.format, to.bytes.data(), to.rowBytes, to.format, to.width,
-                    to.height, quality);
+inline VX_Result Convert(const View& from, Image& to, int32_t quality = 3) {
+  return VX_Convert(from.base, from.rowBytes, from.format, to.bytes.data(), to.rowBytes, to.format, to.width, to.height,
+                    quality);
 }
 
 // Whether a format has alpha to honour.

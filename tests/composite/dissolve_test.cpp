@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "formats/FormatBits.h"
+#include "composite/composite_image.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
 #include "support/Formats.h"
@@ -21,28 +21,6 @@ using F = VX_PixelFormat;
 using Bytes = std::vector<uint8_t>;
 
 constexpr float kMixes[] = {1.0f / 256, 0.25f, 0.3f, 0.5f, 0.7f, 0.999f};
-
-struct View {
-  const void* base;
-  int32_t rowBytes;
-  F format;
-  void* Target() const { return const_cast<void*>(base); }
-};
-
-struct Image {
-  Image(F f, int32_t w, int32_t h, uint64_t seed) : format(f), rowBytes(static_cast<int32_t>(UnpaddedRowBytes(f, w))) {
-    bytes.resize(static_cast<size_t>(rowBytes) * h);
-    Random random(seed);
-    for (size_t at = 0; at < bytes.size(); at += rowBytes)
-      FillSamples(&bytes[at], static_cast<size_t>(rowBytes), f, Contents::Random, random);
-  }
-  operator View() const { return {bytes.data(), rowBytes, format}; }
-  F format;
-  int32_t rowBytes;
-  Bytes bytes;
-};
-
-View ViewOf(const ArenaFrame& frame) { return {frame.base, frame.rowBytes, frame.format}; }
 
 VX_Result Dissolve(const View& a, const View& b, const View& dst, int32_t width, int32_t height, float mix,
                    int32_t hint = 3) {
@@ -63,9 +41,7 @@ VX_Result Accumulate(const std::vector<View>& sources, const View& dst, int32_t 
 
 Image Converted(const Image& image, F format, int32_t width, int32_t height, int32_t quality) {
   Image out(format, width, height, 0);
-  EXPECT_EQ(VX_Convert(image.bytes.data(), image.rowBytes, image.format, out.bytes.data(), out.rowBytes, format, width,
-                       height, quality),
-            VX_Success);
+  EXPECT_EQ(Convert(image, out, quality), VX_Success);
   return out;
 }
 
@@ -237,7 +213,7 @@ TEST(CrossDissolve, Arena) {
         const ArenaFrame& b = place == 0 || place == 3 ? sources[1] : place == 1 ? sources[0] : to;
         const float mix = place == 2 && to.width % 5 == 0 ? static_cast<float>(to.width / 5 % 2)
                                                           : 0.1f + static_cast<float>(to.width) / 200;
-        return Dissolve(ViewOf(a), ViewOf(b), ViewOf(to), to.width, to.height, mix, 3 - place);
+        return Dissolve(View(a), View(b), View(to), to.width, to.height, mix, 3 - place);
       };
       EXPECT_TRUE(RunArena(c));
     }
@@ -324,9 +300,9 @@ TEST(Accumulate, Arena) {
       c.destinationIsInput = inPlace;
       c.seed = i + 1;
       c.run = [inPlace](const ArenaFrame* sources, const ArenaFrame& to) {
-        std::vector<View> views = {ViewOf(sources[0]), ViewOf(sources[1]), ViewOf(sources[2])};
-        if (inPlace) views.push_back(ViewOf(to));
-        return Accumulate(views, ViewOf(to), to.width, to.height, {0.5f, 0.25f, 0.125f, 0.3f});
+        std::vector<View> views = {View(sources[0]), View(sources[1]), View(sources[2])};
+        if (inPlace) views.push_back(View(to));
+        return Accumulate(views, View(to), to.width, to.height, {0.5f, 0.25f, 0.125f, 0.3f});
       };
       EXPECT_TRUE(RunArena(c));
     }

@@ -57,6 +57,18 @@ Bytes UnitByName(const std::string& name, bool white, bool opaque) {
 
 bool HasAlpha(const std::string& name) { return name.substr(0, 4).find_first_of("AP") != std::string::npos; }
 
+// Gaps between the rows and what lies around them stay.
+void ExpectFilled(Fill fill, F format, const Bytes& unit, int width, int height, size_t offset, size_t gap, bool up) {
+  const size_t rowBytes = static_cast<size_t>(UnpaddedRowBytes(format, width)), pitch = rowBytes + gap;
+  Bytes picture(pitch * height + 128, 0x77), expected = picture;
+  for (int row = 0; row < height; ++row)
+    for (size_t i = 0; i < rowBytes; ++i) expected[offset + row * pitch + i] = unit[i % unit.size()];
+  const auto step = static_cast<int32_t>(pitch);
+  uint8_t* const base = &picture[offset + (up ? (height - 1) * pitch : 0)];
+  ASSERT_EQ(fill(base, up ? -step : step, width, height, format), VX_Success);
+  ASSERT_TRUE(picture == expected) << FormatName(format) << " " << width << " at " << offset << " gap " << gap;
+}
+
 TEST(Fills, EveryRasterByItsName) {
   for (const F format : RasterFormats())
     for (const auto& f : kFills) {
@@ -67,14 +79,14 @@ TEST(Fills, EveryRasterByItsName) {
                       [&](void* memory) { return f.fill(memory, 64, 4, 4, format); });
         continue;
       }
-      const Bytes unit = UnitByName(name, f.white, f.opaque);
-      const size_t rowBytes = static_cast<size_t>(UnpaddedRowBytes(format, 41)), pitch = rowBytes + 9;
-      Bytes picture(3 * pitch, 0x77), expected = picture;
-      for (size_t row = 0; row < 3; ++row)
-        for (size_t i = 0; i < rowBytes; ++i) expected[row * pitch + i] = unit[i % unit.size()];
-      ASSERT_EQ(f.fill(picture.data() + 2 * pitch, -static_cast<int32_t>(pitch), 41, 3, format), VX_Success);
-      ASSERT_EQ(picture, expected);
+      ExpectFilled(f.fill, format, UnitByName(name, f.white, f.opaque), 41, 3, 0, 9, true);
     }
+  // Long runs of bytes, with gaps between the rows and without, from every alignment.
+  for (const F format : {F::BGRA_4444_8u, F::YUYV_422_8u, F::ARGB_4444_15u, F::V210_422_10u, F::BGRA_4444_32f})
+    for (const size_t gap : {0, 36})
+      for (size_t offset = 0; offset < 64; offset += format == F::BGRA_4444_8u ? 1 : 9)
+        ExpectFilled(VX_FillWithOpaqueBlack, format, UnitByName(FormatName(format), false, true),
+                     4300 + static_cast<int>(offset), 5, offset, gap, false);
 }
 
 // Planar chroma is half the size, rounded down; interleaved chroma is filled whole.
@@ -216,23 +228,6 @@ TEST(Fills, DvFramesAreWhole) {
       ASSERT_EQ(frame[80 * i + 2], number[section]);
     }
   }
-}
-
-// Long runs of bytes, with gaps between the rows and without, from every alignment.
-TEST(Fills, LongRows) {
-  for (const F format : {F::BGRA_4444_8u, F::YUYV_422_8u, F::ARGB_4444_15u, F::V210_422_10u, F::BGRA_4444_32f})
-    for (const int gap : {0, 36})
-      for (size_t offset = 0; offset < 64; offset += format == F::BGRA_4444_8u ? 1 : 9) {
-        const int width = 4300 + static_cast<int>(offset), height = 5;
-        const Bytes unit = UnitByName(FormatName(format), false, true);
-        const size_t rowBytes = static_cast<size_t>(UnpaddedRowBytes(format, width)), pitch = rowBytes + gap;
-        Bytes picture(pitch * height + 128, 0x77), expected = picture;
-        for (size_t row = 0; row < height; ++row)
-          for (size_t i = 0; i < rowBytes; ++i) expected[offset + row * pitch + i] = unit[i % unit.size()];
-        ASSERT_EQ(VX_FillWithOpaqueBlack(&picture[offset], static_cast<int32_t>(pitch), width, height, format),
-                  VX_Success);
-        ASSERT_TRUE(picture == expected) << FormatName(format) << " " << width << " at " << offset << " gap " << gap;
-      }
 }
 
 }  // namespace

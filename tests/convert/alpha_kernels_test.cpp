@@ -71,18 +71,9 @@ TEST(AlphaKernels, FifteenBitQuotients) {
       int near = most;
       for (int c = most; c > 0 && c > most - 64; --c)
         if (std::abs(32768LL * c % most - most / 2) < std::abs(32768LL * near % most - most / 2)) near = c;
-      const int channels[] = {0,
-                              1,
-                              most / 2,
-                              most - 1,
-                              most,
-                              near,
-                              most + 1,
-                              32768,
-                              a == 0 ? 0 : static_cast<int>(random.Int(0, most)),
-                              static_cast<int>(random.Int(0, most)),
-                              static_cast<int>(random.Int(0, 65535)),
-                              16384};
+      const auto below = [&](int last) { return static_cast<int>(random.Int(0, last)); };
+      const int channels[] = {
+          0, 1, most / 2, most - 1, most, near, most + 1, 32768, a ? below(most) : 0, below(most), below(65535), 16384};
       for (size_t k = 0; k < std::size(channels); k += 3) {
         uint16_t pixel[4];
         for (size_t n = 0, m = k; n < 4; ++n) pixel[n] = static_cast<uint16_t>(n == test.alphaAt ? a : channels[m++]);

@@ -115,16 +115,6 @@ TEST(Planner, ExplainsSpecialEnds) {
   EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME, 2, formats, &count), VX_ErrFormatNotHandled);
 }
 
-TEST(Planner, InvalidAsAnEnd) {
-  int reached = 0;
-  for (F dst : RasterFormats()) reached += Chain(F::Invalid, dst) != "none";
-  EXPECT_EQ(reached, 13);
-  EXPECT_EQ(Chain(F::Invalid, F::Invalid), "none");
-  EXPECT_EQ(Chain(F::Invalid, F::ARGB_4444_8u), "none");
-  EXPECT_NE(Chain(F::Invalid, F::YUYV_422_8u_709), "none");
-  for (F src : RasterFormats()) EXPECT_NE(Chain(src, F::Invalid), "none") << FormatName(src);
-}
-
 TEST(Planner, RefusesSpecialAndUnknownFormats) {
   Plan plan;
   EXPECT_EQ(MakePlan(F::PALDV25, F::BGRA_4444_8u, 2, &plan), VX_ErrUnsupportedFormat);
