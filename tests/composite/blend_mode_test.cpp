@@ -469,14 +469,12 @@ TEST(BlendMode, RefusesInOrderBeforeItTouchesAPixel) {
 TEST(BlendMode, FailingAllocations) {
   constexpr int32_t kWidth = 20000;
   Bytes src(kWidth * 4), background(kWidth * 8), out(kWidth * 8);
-  for (const M mode : {M::Hue, M::Dissolve})
-    EXPECT_GT(ExpectSurvivesFailingAllocations(ModeName(mode),
-                                               [&] {
-                                                 return Blend(mode, {src.data(), kWidth * 4, kBytes},
-                                                              {background.data(), kWidth * 8, F::UYVY_422_32f},
-                                                              {out.data(), kWidth * 8, F::UYVY_422_32f}, kWidth, 1);
-                                               }),
-              0);
+  const View front(src.data(), kWidth * 4, kBytes), back(background.data(), kWidth * 8, F::UYVY_422_32f),
+      to(out.data(), kWidth * 8, F::UYVY_422_32f);
+  for (const M mode : {M::Hue, M::Dissolve}) {
+    const auto blend = [&] { return Blend(mode, front, back, to, kWidth, 1); };
+    EXPECT_GT(ExpectSurvivesFailingAllocations(ModeName(mode), blend), 0);
+  }
 }
 
 }  // namespace

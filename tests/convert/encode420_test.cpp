@@ -177,12 +177,10 @@ TEST(Encode420, SurvivesFailingAllocations) {
   const int width = 70000;
   Raster src(width, 1);
   Block420 dst(F::YUV_420_MPEG2_FRAME_709, width, 1);
-  EXPECT_GT(ExpectSurvivesFailingAllocations("encode 4:2:0",
-                                             [&] {
-                                               return Encode420(src.bytes.data(), 4 * width, F::BGRX_4444_8u,
-                                                                dst.bytes.data(), dst.format, width, 1);
-                                             }),
-            0);
+  const auto encode = [&] {
+    return Encode420(src.bytes.data(), 4 * width, F::BGRX_4444_8u, dst.bytes.data(), dst.format, width, 1);
+  };
+  EXPECT_GT(ExpectSurvivesFailingAllocations("encode 4:2:0", encode), 0);
 }
 
 }  // namespace

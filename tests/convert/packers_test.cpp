@@ -12,43 +12,15 @@
 
 #include "frame/KernelVariant.h"
 #include "support/Arena.h"
-#include "support/Random.h"
+#include "support/PaddedRows.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
 namespace {
 
+using Rows = testing::PaddedRows;
 using Samples = std::vector<uint16_t>;
 constexpr int kSizes[] = {1, 2, 3, 5, 6, 7, 8, 11, 13, 16, 17, 31, 33, 64, 67, 131};
-
-// Rows of any bytes inside a larger block whose rest must stay as it was.
-struct Rows {
-  Rows(size_t bytes, int height, int padding, bool upsideDown, uint64_t seed)
-      : memory((bytes + static_cast<size_t>(padding)) * static_cast<size_t>(height) + 7) {
-    testing::Random(seed).Fill(memory.data(), memory.size());
-    rowBytes = static_cast<int>(bytes) + padding;
-    first = 3;
-    if (!upsideDown) return;
-    first += static_cast<size_t>(rowBytes * (height - 1));
-    rowBytes = -rowBytes;
-  }
-  uint8_t* base() { return memory.data() + first; }
-  template <class T>
-  T Get(int row, size_t index) const {
-    T v;
-    std::memcpy(&v, memory.data() + At(row) + index * sizeof(T), sizeof(T));
-    return v;
-  }
-  template <class T>
-  void Put(int row, size_t index, T v) {
-    std::memcpy(memory.data() + At(row) + index * sizeof(T), &v, sizeof(T));
-  }
-  size_t At(int row) const { return static_cast<size_t>(static_cast<ptrdiff_t>(first) + ptrdiff_t{row} * rowBytes); }
-
-  std::vector<uint8_t> memory;
-  size_t first;
-  int rowBytes;
-};
 
 constexpr uint32_t Top(uint32_t sample) { return sample / 64; }
 uint32_t Word(uint32_t r, uint32_t g, uint32_t b) { return r * 4 + g * 4096 + b * 4194304; }

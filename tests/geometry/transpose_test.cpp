@@ -8,30 +8,19 @@
 #include "formats/FormatBits.h"
 #include "geometry/Transpose.h"
 #include "support/Arena.h"
-#include "support/Random.h"
+#include "support/PaddedRows.h"
 
 namespace vexel {
 namespace {
 
 using F = VX_PixelFormat;
 
-// A picture of elements inside a larger block, with row bytes of either sign and any offset.
-struct Picture {
-  Picture(int width, int height, int size, int padding, int offset, bool upsideDown, uint64_t seed)
-      : elementSize(size),
-        memory(static_cast<size_t>(offset) + static_cast<size_t>(width * size + padding) * height + 64) {
-    testing::Random(seed).Fill(memory.data(), memory.size());
-    rowBytes = width * size + padding;
-    base = memory.data() + offset;
-    if (!upsideDown) return;
-    base += static_cast<ptrdiff_t>(rowBytes) * (height - 1);
-    rowBytes = -rowBytes;
-  }
-  uint8_t* At(int row, int column) { return base + static_cast<ptrdiff_t>(row) * rowBytes + column * elementSize; }
+// Pictures of elements.
+struct Picture : testing::PaddedRows {
+  Picture(int width, int height, int size, int padding, size_t offset, bool upsideDown, uint64_t seed)
+      : PaddedRows(static_cast<size_t>(width * size), height, padding, upsideDown, seed, offset), elementSize(size) {}
+  uint8_t* Element(int row, int column) { return memory.data() + At(row) + column * elementSize; }
   int elementSize;
-  std::vector<uint8_t> memory;
-  uint8_t* base;
-  int rowBytes;
 };
 
 // Moves each element by the definition into a copy of the destination and compares the whole memory, padding included.
@@ -39,8 +28,7 @@ template <class Source>
 void ExpectMoved(Picture dst, Picture& result, int rows, int columns, Source&& source) {
   for (int i = 0; i < rows; ++i)
     for (int j = 0; j < columns; ++j)
-      std::memcpy(dst.memory.data() + (result.At(i, j) - result.memory.data()), source(i, j),
-                  static_cast<size_t>(result.elementSize));
+      std::memcpy(dst.Element(i, j), source(i, j), static_cast<size_t>(dst.elementSize));
   ASSERT_EQ(dst.memory, result.memory);
 }
 
@@ -53,17 +41,17 @@ TEST(Transpose, EverySizeShapeAndStride) {
         Picture src(width, height, size, 3 * size, 5, upsideDown, 1),
             dst(height, width, size, 2 * size, 3, !upsideDown, 2);
         Picture result(height, width, size, 2 * size, 3, !upsideDown, 2);
-        ASSERT_EQ(VX_Transpose(src.base, src.rowBytes, result.base, result.rowBytes, width, height,
+        ASSERT_EQ(VX_Transpose(src.base(), src.rowBytes, result.base(), result.rowBytes, width, height,
                                static_cast<uint8_t>(size)),
                   VX_Success);
-        ExpectMoved(dst, result, width, height, [&](int i, int j) { return src.At(j, i); });
+        ExpectMoved(dst, result, width, height, [&](int i, int j) { return src.Element(j, i); });
       }
 }
 
 TEST(Transpose, StridesCountWholeElements) {
   Picture src(5, 4, 3, 3, 0, false, 1), dst(4, 5, 3, 0, 0, false, 2), result(4, 5, 3, 0, 0, false, 2);
-  ASSERT_EQ(VX_Transpose(src.base, src.rowBytes + 2, result.base, result.rowBytes + 1, 5, 4, 3), VX_Success);
-  ExpectMoved(dst, result, 5, 4, [&](int i, int j) { return src.At(j, i); });
+  ASSERT_EQ(VX_Transpose(src.base(), src.rowBytes + 2, result.base(), result.rowBytes + 1, 5, 4, 3), VX_Success);
+  ExpectMoved(dst, result, 5, 4, [&](int i, int j) { return src.Element(j, i); });
 }
 
 // Large enough for the path past the cache, at destination offsets that begin inside a cache line.
@@ -141,10 +129,10 @@ TEST(Rotate, EveryAngleFlipAndDepth) {
           const int rows = sideways ? w : h, columns = sideways ? h : w;
           Picture src(w, h, size, 8, 4, flip, 1), dst(columns, rows, size, 4, 7, !flip, 2),
               result(columns, rows, size, 4, 7, !flip, 2);
-          ASSERT_EQ(
-              VX_RotateImageAndFlip(src.base, src.rowBytes, result.base, result.rowBytes, w, h, format, angle, flip),
-              VX_Success);
-          const auto at = [&, h = h](int r, int c) { return src.At(flip ? h - 1 - r : r, c); };
+          ASSERT_EQ(VX_RotateImageAndFlip(src.base(), src.rowBytes, result.base(), result.rowBytes, w, h, format, angle,
+                                          flip),
+                    VX_Success);
+          const auto at = [&, h = h](int r, int c) { return src.Element(flip ? h - 1 - r : r, c); };
           ExpectMoved(dst, result, rows, columns, [&, w = w, h = h](int i, int j) {
             switch (angle) {
               case 0:
