@@ -2,16 +2,7 @@
 # vexel color: known colours, round trips, P010 and the refusals.
 . "$(dirname "$0")/common.sh"
 
-color() {
-  "$vexel" color "$@" >log 2>&1 || fail "color $*: $(cat log)"
-}
-
-refused() {  # WORDS ARGUMENTS...
-  local words=$1
-  shift
-  "$vexel" color "$@" >log 2>&1 && fail "color $* was not refused"
-  grep -q -- "$words" log || fail "color $*: \"$(cat log)\" does not say \"$words\""
-}
+color() { run color "$@"; }
 
 # The first pixel of a picture in full floats: blue green red alpha.
 first_pixel() {
@@ -62,15 +53,15 @@ near p010.png 0.99998 0.99998 0.99998 1 0.0005
 color p010.raw p010.png "${p010[@]}" --from pq --to srgb --tone 1,1.2,0.6
 near p010.png 1 1 1 1 0.001
 
-"$vexel" color --plot . >log 2>&1 || fail "plot: $(cat log)"
+color --plot .
 for plot in transfer primaries tone; do grep -q '</svg>' $plot.svg || fail "$plot.svg is not complete"; done
 
-refused 'did you mean srgb' two.png x.png --from sgrb --to pq
-refused 'standard range' two.png x.png --from srgb --to pq --tone 1,1.2,0.6
-refused 'no tone curve' two.png x.png --from srgb --to srgb --tone 1,0.5,0.6
-refused 'no tone curve' two.png x.png --from srgb --to srgb --tone 1,1.2
-refused 'needs IN' two.png x.png --from srgb
-refused 'cannot write' --plot nowhere
-refused 'size' p010.raw x.png --raw-format BGRA_4444_8u --size 2 --from srgb --to pq
+refuses 1 'did you mean srgb' color two.png x.png --from sgrb --to pq
+refuses 1 'standard range' color two.png x.png --from srgb --to pq --tone 1,1.2,0.6
+refuses 1 'no tone curve' color two.png x.png --from srgb --to srgb --tone 1,0.5,0.6
+refuses 1 'no tone curve' color two.png x.png --from srgb --to srgb --tone 1,1.2
+refuses 1 'needs IN' color two.png x.png --from srgb
+refuses 1 'cannot write' color --plot nowhere
+refuses 1 'size' color p010.raw x.png --raw-format BGRA_4444_8u --size 2 --from srgb --to pq
 [ ! -e x.png ] || fail "a refused command wrote a file"
 exit $failed

@@ -22,3 +22,17 @@ convert() {
 hash_of() {
   "$vexel" convert "$@" --hash 2>log | sed -n 's/^md5 //p' | grep . || echo "none: $(cat log)"
 }
+
+run() {  # COMMAND ARGUMENTS...
+  "$vexel" "$@" >log 2>&1 || fail "$*: $(cat log)"
+}
+
+refuses() {  # STATUS PATTERN ARGUMENTS...
+  local status=$1 pattern=$2 got
+  shift 2
+  "$vexel" "$@" >out 2>err </dev/null
+  got=$?
+  [ "$got" = "$status" ] || fail "vexel $*: status $got, not $status"
+  grep -qE -- "$pattern" err || fail "vexel $*: said $(cat err)"
+  [ ! -s out ] || fail "vexel $*: wrote to standard output"
+}

@@ -2,16 +2,6 @@
 # Every refusal: its exit status, what it says, and that it says so on standard error only.
 . "$(dirname "$0")/common.sh"
 
-refuses() {  # STATUS PATTERN ARGUMENTS...
-  local status=$1 pattern=$2 got
-  shift 2
-  "$vexel" "$@" >out 2>err
-  got=$?
-  [ "$got" = "$status" ] || fail "vexel $*: status $got, not $status"
-  grep -qE -- "$pattern" err || fail "vexel $*: said $(cat err)"
-  [ ! -s out ] || fail "vexel $*: wrote to standard output"
-}
-
 head -c 12288 "$clip420" >noise.raw  # 64 x 48 pixels of 4 bytes
 convert noise.raw picture.png --raw-format BGRA_4444_8u --size 64x48 --format BGRA_4444_8u
 head -c 600 picture.png >torn.png

@@ -2,26 +2,12 @@
 # vexel fill and vexel dissolve: the bytes that come out, black DV as a decoder sees it, and refusals.
 . "$(dirname "$0")/common.sh"
 
-run() {  # COMMAND ARGUMENTS...
-  "$vexel" "$@" >log 2>&1 || fail "$*: $(cat log)"
-}
-
 # The file holds nothing but one run of bytes, COUNT times.
 holds() {  # FILE COUNT BYTES
   local width got
   width=$(wc -w <<<"$3")
   got=$(od -An -v -tx1 -w"$width" "$1" | sort | uniq -c | sed 's/^ *//; s/  */ /g')
   [ "$got" = "$2 $3" ] || fail "$1: $got, not $2 $3"
-}
-
-refuses() {  # STATUS PATTERN ARGUMENTS...
-  local status=$1 pattern=$2 got
-  shift 2
-  "$vexel" "$@" >out 2>err
-  got=$?
-  [ "$got" = "$status" ] || fail "vexel $*: status $got, not $status"
-  grep -qE -- "$pattern" err || fail "vexel $*: said $(cat err)"
-  [ ! -s out ] || fail "vexel $*: wrote to standard output"
 }
 
 fill() {  # FORMAT COLOUR COUNT BYTES

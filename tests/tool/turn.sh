@@ -2,10 +2,6 @@
 # vexel transpose and vexel rotate: where the corners go, as seen, and that turns add up.
 . "$(dirname "$0")/common.sh"
 
-turn() {  # COMMAND ARGUMENTS...
-  "$vexel" "$@" >log 2>&1 || fail "$*: $(cat log)"
-}
-
 # The pixels as bytes, from the top row on.
 pixels() {
   convert "$1" pixels.raw --format BGRA_4444_8u
@@ -22,10 +18,10 @@ looks() {  # FILE LETTERS
 # Grey pixels a b c above d e f, opaque.
 for c in a b c d e f; do printf '%s%s%s\377' $c $c $c; done >six.raw
 convert six.raw six.png --raw-format BGRA_4444_8u --size 3x2 --format BGRA_4444_8u
-turn transpose six.png transposed.png
-for angle in 0 90 180 270 -90; do turn rotate six.png "r$angle.png" --angle "$angle"; done
-turn rotate six.png flipped.png --angle 0 --flip
-turn rotate six.png flipped90.png --angle 90 --flip
+run transpose six.png transposed.png
+for angle in 0 90 180 270 -90; do run rotate six.png "r$angle.png" --angle "$angle"; done
+run rotate six.png flipped.png --angle 0 --flip
+run rotate six.png flipped90.png --angle 90 --flip
 looks six.png abcdef
 looks transposed.png adbecf
 looks r0.png abcdef
@@ -39,14 +35,14 @@ looks flipped90.png adbecf
 # A noisy picture, of odd size and with alpha, comes back bit for bit.
 head -c 6580 "$clip420" >noise.raw
 convert noise.raw noise.png --raw-format BGRA_4444_8u --size 47x35 --format BGRA_4444_8u
-turn transpose noise.png t.png
-turn transpose t.png back.png
+run transpose noise.png t.png
+run transpose t.png back.png
 [ "$(pixels back.png)" = "$(pixels noise.png)" ] || fail "transposing twice changes the picture"
 [ "$(pixels t.png)" != "$(pixels noise.png)" ] || fail "transposing does nothing"
 cp noise.png turned.png
-for _ in 1 2 3 4; do turn rotate turned.png next.png --angle 90 && mv next.png turned.png; done
+for _ in 1 2 3 4; do run rotate turned.png next.png --angle 90 && mv next.png turned.png; done
 [ "$(pixels turned.png)" = "$(pixels noise.png)" ] || fail "four quarter turns change the picture"
-"$vexel" rotate noise.png x.png --angle 45 >out 2>err && fail "45 degrees are accepted"
+refuses 2 'angle' rotate noise.png x.png --angle 45
 [ ! -e x.png ] || fail "a refused rotation writes a picture"
 
 exit $failed
