@@ -11,7 +11,9 @@
 #include "commands.h"
 #include "convert_picture.h"
 #include "picture_io.h"
+#include "run_options.h"
 #include "tool_error.h"
+#include "unit_range.h"
 
 namespace tool {
 namespace {
@@ -23,6 +25,7 @@ struct CompositeOptions {
   std::string back, front, out, mode = "Normal";
   std::vector<int> offset = {0, 0};
   BlendOptions blend;
+  RunOptions run;
 };
 
 // ---- The sheet
@@ -104,13 +107,15 @@ CLI::App* AddBlend(CLI::App& app, const char* name, const char* help, void (*run
   command->add_option("front", options->front, "The picture above, of any size")->required();
   command->add_option("out", options->out, "The picture to write, as large as the back")->required();
   command->add_option("--opacity", options->blend.opacity, "0 to 1, multiplies the alpha of the front (default 1)")
-      ->check(CLI::Range(0.0, 1.0));
+      ->check(FromZeroToOne());
   command->add_option("--offset", options->offset, "X,Y of the front's top left corner on the back (default 0,0)")
       ->delimiter(',')
       ->expected(2);
+  options->run.AddTo(*command);
   command->callback([options, run] {
     options->blend.x = options->offset[0];
     options->blend.y = options->offset[1];
+    options->run.Apply();
     run(*options);
   });
   return command;

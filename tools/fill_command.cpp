@@ -12,6 +12,7 @@
 #include "picture_io.h"
 #include "run_options.h"
 #include "tool_error.h"
+#include "unit_range.h"
 #include "vexel/compositing.h"
 
 namespace tool {
@@ -150,7 +151,7 @@ void AddDissolveCommand(CLI::App& app) {
   command->add_option("a", options->a, "A picture or video, of which the first frame is taken")->required();
   command->add_option("b", options->b, "The same")->required();
   command->add_option("out", options->out, "The picture to write")->required();
-  command->add_option("--mix", options->mix, "0 gives A, 1 gives B")->required()->check(CLI::Range(0.0, 1.0));
+  command->add_option("--mix", options->mix, "0 gives A, 1 gives B")->required()->check(FromZeroToOne());
   command->add_option("--format", options->format,
                       "Pixel format of the result (default: A's; 8-bit or float RGB for 4:2:0)");
   command->add_option("--quality", options->quality, "Render quality; 2 mixes in the depth of the result (default 3)");

@@ -33,10 +33,12 @@ for far in 3,0 -2,0 0,2 0,-1 2147483647,0 -2147483648,-2147483648; do
   gives "100 100 100 200 200 200" back.png front.png --offset=$far
 done
 gives "162 80 100 200 200 200" \
-  back.png front.png --mode Normal --opacity 0.4
+  back.png front.png --mode Normal --opacity 0.4 --threads 2 --isa plain
 
 refuses 1 'did you mean Multiply' composite back.png front.png no.png --mode Multiplay
-refuses 2 'opacity' composite back.png front.png no.png --opacity 1.5
+for opacity in 1.5 -0.1 nan half; do
+  refuses 2 'opacity' composite back.png front.png no.png --opacity=$opacity
+done
 refuses 2 'offset' composite back.png front.png no.png --offset 1
 [ ! -e no.png ] || fail "a refused composite writes a picture"
 

@@ -59,6 +59,7 @@ refuses 1 '--size is required' fill x.raw --format BGRA_4444_8u --color black
 refuses 2 '--color is required' fill x.raw --format BGRA_4444_8u --size 4x4
 refuses 1 'is 7x5 and .* is 7x4; a dissolve takes' dissolve a.png small.png x.png --mix 0.5
 refuses 2 '--mix' dissolve a.png b.png x.png --mix 1.5
+refuses 2 '--mix' dissolve a.png b.png x.png --mix nan
 refuses 1 'cannot mix .* into PALDV25' dissolve a.png b.png x.raw --mix 0.5 --format PALDV25
 ls x.* 2>/dev/null && fail "a refused command wrote a file"
 exit $failed
