@@ -136,7 +136,7 @@ VX_API bool VX_IsOpacityNOP(int32_t blendMode, float opacity) VX_NOEXCEPT;
  * precision hint above 2), VUYP_4444_8u (Y'CbCr), BGRA_4444_32f (32f RGB) or BGRA_4444_8u (any other, 15u too). The
  * precision hint is also the render quality of the row conversions.
  * VX_ErrUnsupportedFormat: the source is no raster format. VX_ErrUnsupportedDestinationFormat: likewise the
- * destination. */
+ * destination. VX_ErrFailed: no conversion. */
 VX_API VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst,
                               int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height, float gain,
                               int32_t precisionHint) VX_NOEXCEPT;
@@ -170,6 +170,7 @@ VX_API VX_Result VX_UnPremultiplyAgainstMatteColor(const void* src, int32_t srcR
  * destination's stored rows and may have any signed row bytes; no byte beyond a row's last bit is read.
  * `conversionOption` is the render quality with which a and b are converted to the destination's format.
  * VX_ErrUnsupportedDestinationFormat: not pixels of 4, 8 or 16 bytes (4:4:4:4, or 10-bit RGB).
+ * VX_ErrUnsupportedFormat: a or b is no raster format. VX_ErrFailed: no conversion.
  * VX_ErrArgumentOutOfRange: a bit offset outside 0..7 too. VX_ErrNullSource: no mask, too. */
 VX_API VX_Result VX_OneBitMaskComposite(const void* a, int32_t aRowBytes, VX_PixelFormat aFormat, const void* b,
                                         int32_t bRowBytes, VX_PixelFormat bFormat, const void* mask,
