@@ -336,6 +336,19 @@ TEST(AlphaUtilities, MaskChooses) {
       }
 }
 
+TEST(AlphaUtilities, MaskRowsFarApart) {
+  for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
+    const ArenaFrame mask = GiantStrideFrame(F::BGRA_4444_8u, 1, 7, rowBytes);
+    Image a(F::BGRA_4444_8u, 8, 7), b(F::BGRA_4444_8u, 8, 7, Contents::Random, 2), out(F::BGRA_4444_8u, 8, 7);
+    for (int row = 0; row < 7; ++row) *mask.Row(row) = static_cast<uint8_t>(1 << row);
+    ASSERT_EQ(VX_OneBitMaskComposite(a.bytes.data(), 32, a.format, b.bytes.data(), 32, b.format, mask.base, rowBytes, 0,
+                                     out.bytes.data(), 32, out.format, 8, 7, 2),
+              VX_Success);
+    for (int i = 0; i < 56; ++i)
+      ASSERT_EQ(std::memcmp(&out.bytes[4 * i], &(i % 8 == 7 - i / 8 ? a : b).bytes[4 * i], 4), 0) << i;
+  }
+}
+
 // ---- Edges ----
 
 TEST(AlphaUtilities, OpacityThatDoesNothing) {

@@ -283,6 +283,11 @@ TEST(Accumulate, WholeWeightsSaturateAndNoneGivesZero) {
   ASSERT_EQ(Accumulate({{a, 8, F::BGRA_4444_8u}, {b, 8, F::BGRA_4444_8u}}, {out.data(), 8, F::BGRA_4444_8u}, 2, 1),
             VX_Success);
   EXPECT_EQ(out, (Bytes{150, 255, 7, 255, 1, 32, 255, 255}));
+  const std::vector<float> unread(8, NAN);  // of weight 0
+  ASSERT_EQ(Accumulate({{unread.data(), 32, F::BGRA_4444_32f}, {b, 8, F::BGRA_4444_8u}},
+                       {out.data(), 8, F::BGRA_4444_8u}, 2, 1, {0, 1}),
+            VX_Success);
+  EXPECT_EQ(out, Bytes(b, b + 8));
   ASSERT_EQ(Accumulate({}, {out.data(), 8, F::BGRP_4444_8u}, 2, 1), VX_Success);
   EXPECT_EQ(out, Bytes(8, 0));
   ASSERT_EQ(Accumulate({}, {out.data(), 8, F::VUYX_4444_8u}, 2, 1), VX_Success);
