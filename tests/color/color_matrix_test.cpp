@@ -85,14 +85,10 @@ TEST(ColorSpaceMatrices, FollowThePrimaries) {
     }
   }
   const VX::SRGBColorSpace srgb;
-  const float* y = srgb.RGBtoXYZ()[1];
-  EXPECT_NEAR(y[0], 0.2126, 5e-5);
-  EXPECT_NEAR(y[1], 0.7152, 5e-5);
-  EXPECT_NEAR(y[2], 0.0722, 5e-5);
-  const float* y2020 = ColorSpace::WorkingSpace(VX_WorkingSpaceRec2020).RGBtoXYZ()[1];
-  EXPECT_NEAR(y2020[0], 0.2627, 5e-5);
-  EXPECT_NEAR(y2020[1], 0.6780, 5e-5);
-  EXPECT_NEAR(y2020[2], 0.0593, 5e-5);
+  const ColorSpace& rec2020 = ColorSpace::WorkingSpace(VX_WorkingSpaceRec2020);
+  for (const auto& [space, luma] :
+       {std::pair<const ColorSpace*, Rgb>{&srgb, {0.2126, 0.7152, 0.0722}}, {&rec2020, {0.2627, 0.6780, 0.0593}}})
+    for (size_t i = 0; i < 3; ++i) EXPECT_NEAR(space->RGBtoXYZ()[1][i], luma[i], 5e-5);
 }
 
 TEST(ColorSpaceMatrices, AdaptByBradford) {
@@ -128,12 +124,10 @@ TEST(ColorSpaces, WorkingSpacesAreSharedAndTyped) {
     EXPECT_EQ(&space, &ColorSpace::WorkingSpace(static_cast<VX_WorkingSpace>(value)));
     return typeid(space) == type;
   };
-  EXPECT_TRUE(is(0, typeid(VX::Rec709ColorSpace)));
-  EXPECT_TRUE(is(1, typeid(VX::Rec2020ColorSpace)));
-  EXPECT_TRUE(is(2, typeid(VX::DCIP3ColorSpace)));
-  EXPECT_TRUE(is(3, typeid(VX::DCIP3ColorSpace)));
-  EXPECT_TRUE(is(4, typeid(VX::PQColorSpace)));
-  EXPECT_TRUE(is(5, typeid(VX::PQColorSpace)));
+  const std::type_info* const types[] = {&typeid(VX::Rec709ColorSpace), &typeid(VX::Rec2020ColorSpace),
+                                         &typeid(VX::DCIP3ColorSpace),  &typeid(VX::DCIP3ColorSpace),
+                                         &typeid(VX::PQColorSpace),     &typeid(VX::PQColorSpace)};
+  for (int i = 0; i < 6; ++i) EXPECT_TRUE(is(i, *types[i])) << i;
   for (const int other : {6, 17, -1, 1 << 30}) EXPECT_TRUE(is(other, typeid(VX::SRGBColorSpace)));
   EXPECT_EQ(ColorSpace::WorkingSpace(VX_WorkingSpaceDCIP3D60).WhitePoint()[0], 0.32168f);
   EXPECT_NEAR(ColorSpace::WorkingSpace(VX_WorkingSpacePQRec2020).LinearToEOTF(1), 1, 1e-5);

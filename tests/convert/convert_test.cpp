@@ -66,12 +66,11 @@ TEST(Convert, OrientationFollowsTheFormats) {
 }
 
 TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
-  struct Case {
+  const struct {
     F src, dst;
     int32_t width, height;
     VX_Result expected;
-  };
-  const Case cases[] = {
+  } cases[] = {
       {F::Invalid, F::Invalid, 4, 4, VX_ErrFailed},
       {F::Invalid, F::Invalid, 4, 0, VX_ErrFailed},
       {F::Invalid, F::ARGB_4444_8u, 4, 4, VX_ErrFailed},
@@ -113,7 +112,7 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
       {F::BGRA_4444_8u, FromBits(0x7F000020), 64, 64, VX_ErrFormatNotHandled},
       {F::YUV_420_MPEG2_FRAME_709, F::YUV_420_MPEG2_FRAME_709, 64, 64, VX_ErrFormatNotHandled},
   };
-  for (const Case& c : cases)
+  for (const auto& c : cases)
     testing::ExpectRefusal("case " + std::to_string(&c - cases), c.expected, [&](void* memory) {
       return VX_Convert(memory, 64, c.src, memory, -64, c.dst, c.width, c.height, 2);
     });
@@ -125,12 +124,11 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
 // Blocks, whole rows and streamed rows give the same bytes: a wide picture equals the same picture converted in the
 // other ways.
 TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
-  struct Pair {
+  const struct {
     F src, dst;
-  };
-  const Pair pairs[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u},     {F::BGRA_4444_8u, F::ARGB_4444_32f},
-                        {F::UYVY_422_8u, F::BGRA_4444_32f},     {F::BGRA_4444_8u, F::V210_422_10u},
-                        {F::ARGB_4444_32f, F::UYVY_422_8u_709}, {F::V210_422_10u, F::XRGB_4444_15u}};
+  } pairs[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u},     {F::BGRA_4444_8u, F::ARGB_4444_32f},
+               {F::UYVY_422_8u, F::BGRA_4444_32f},     {F::BGRA_4444_8u, F::V210_422_10u},
+               {F::ARGB_4444_32f, F::UYVY_422_8u_709}, {F::V210_422_10u, F::XRGB_4444_15u}};
   constexpr int kWidth = 1001;
   for (const auto& [src, dst] : pairs) {
     const auto srcRow = static_cast<int32_t>(UnpaddedRowBytes(src, kWidth));

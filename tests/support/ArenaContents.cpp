@@ -56,26 +56,11 @@ struct Values<float> {
   }
   static float Extreme(Random& random) {
     using Limits = std::numeric_limits<float>;
-    static constexpr float kValues[] = {0.0f,
-                                        -0.0f,
-                                        1.0f,
-                                        -1.0f,
-                                        Limits::quiet_NaN(),
-                                        Limits::infinity(),
-                                        -Limits::infinity(),
-                                        Limits::denorm_min(),
-                                        -Limits::denorm_min(),
-                                        0x1p-127f,
-                                        Limits::min(),
-                                        Limits::max(),
-                                        Limits::lowest(),
-                                        2147483648.0f,
-                                        1e9f,
-                                        -3e9f,
-                                        127.5f / 255,
-                                        254.5f / 255,
-                                        255.5f / 255,
-                                        32767.5f / 32768};
+    static constexpr float kNan = Limits::quiet_NaN(), kInf = Limits::infinity(), kMost = Limits::max(),
+                           kLeast = Limits::denorm_min();
+    static constexpr float kValues[] = {0.0f,   -0.0f,   1.0f,      -1.0f,        kNan,         kInf,        -kInf,
+                                        kLeast, -kLeast, 0x1p-127f, 0x1p-126f,    kMost,        -kMost,      0x1p31f,
+                                        1e9f,   -3e9f,   0.5f,      254.5f / 255, 255.5f / 255, 0x1.fffep-1f};
     const uint64_t bits = random.Next();
     if (bits & 1) return kValues[(bits >> 1) % std::size(kValues)];
     // Any finite number; its sign and exponent are random.

@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <vector>
 
+#include "convert/YuvReference.h"
 #include "support/Formats.h"
 #include "support/Random.h"
 #include "vexel/vexel.h"
@@ -91,32 +92,24 @@ inline Ycc FullSizeYcc(const Block420& src, int x, int line, bool interpolates) 
   return pixel;
 }
 
-struct Luma {
-  double r, b;  // weights of R and B
-};
 inline Luma LumaOf(VX_PixelFormat f) {
-  if (Colorimetry(f) == 0) return {0.299, 0.114};
-  return Colorimetry(f) == kColorimetry709 ? Luma{0.2126, 0.0722} : Luma{0.2627, 0.0593};
+  return Colorimetry(f) == 0 ? k601 : Colorimetry(f) == kColorimetry709 ? k709 : Luma{0.2627, 0.0593};
 }
 
 // Codes of a 4:2:0 format to the codes of an 8-bit BGRX or VUYX format, in memory order, unrounded.
-inline std::array<double, 3> ToCodes(const Ycc& codes, VX_PixelFormat src, VX_PixelFormat dst) {
-  const bool video = IsVideoRange(src);
-  const double y = video ? (codes[0] - 16) / 219 : codes[0] / 255;
-  const double cb = (codes[1] - 128) / (video ? 224 : 255), cr = (codes[2] - 128) / (video ? 224 : 255);
-  const Luma from = LumaOf(src);
-  const double r = y + 2 * (1 - from.r) * cr, b = y + 2 * (1 - from.b) * cb;
-  const double g = (y - from.r * r - from.b * b) / (1 - from.r - from.b);
-  if (!IsYuv(dst)) return {255 * b, 255 * g, 255 * r};
-  const Luma to = LumaOf(dst);
-  const double luma = to.r * r + to.b * b + (1 - to.r - to.b) * g;
-  return {128 + 224 * (r - luma) / (2 * (1 - to.r)), 128 + 224 * (b - luma) / (2 * (1 - to.b)), 16 + 219 * luma};
+inline Ycc ToCodes(const Ycc& codes, VX_PixelFormat src, VX_PixelFormat dst) {
+  const double chroma = IsVideoRange(src) ? 1 : 224 / 255.0;
+  Triple pixel{{128 + (codes[2] - 128) * chroma, 128 + (codes[1] - 128) * chroma,
+                IsVideoRange(src) ? codes[0] : 16 + codes[0] * 219 / 255}};
+  pixel = VuyToBgr(LumaOf(src), pixel);
+  if (IsYuv(dst)) pixel = BgrToVuy(LumaOf(dst), pixel);
+  return {pixel.c[0], pixel.c[1], pixel.c[2]};
 }
 
 // The same from full-range R'G'B' codes to codes of a 4:2:0 format.
 inline Ycc FromBgr(const std::array<double, 3>& bgr, VX_PixelFormat dst) {
   const Luma to = LumaOf(dst);
-  const double luma = to.r * bgr[2] + to.b * bgr[0] + (1 - to.r - to.b) * bgr[1];
+  const double luma = to.r * bgr[2] + to.b * bgr[0] + to.g() * bgr[1];
   return {luma, 128 + (bgr[0] - luma) / (2 * (1 - to.b)), 128 + (bgr[2] - luma) / (2 * (1 - to.r))};
 }
 
