@@ -1,7 +1,11 @@
 // Pictures in memory of their own, for tests of operations on several of them.
 #pragma once
 
+#include <gtest/gtest.h>
+#include <xmmintrin.h>
+
 #include <cstdint>
+#include <string>
 #include <vector>
 
 #include "formats/FormatBits.h"
@@ -49,6 +53,18 @@ struct Image {
 inline VX_Result Convert(const View& from, Image& to, int32_t quality = 3) {
   return VX_Convert(from.base, from.rowBytes, from.format, to.bytes.data(), to.rowBytes, to.format, to.width, to.height,
                     quality);
+}
+
+// Calls under a control word of the caller's, which must be what it was afterwards.
+template <class Call>
+VX_Result UnderControlWord(unsigned word, const Call& call) {
+  const unsigned callers = _mm_getcsr();
+  _mm_setcsr(word);
+  const VX_Result result = call();
+  const unsigned after = _mm_getcsr();
+  _mm_setcsr(callers);
+  EXPECT_EQ(after, word);
+  return result;
 }
 
 // Whether a format has alpha to honour.

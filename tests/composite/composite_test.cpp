@@ -1,7 +1,6 @@
 // VX_Composite against the formula in double precision and against its own rules.
 #include <gtest/gtest.h>
 #include <vexel_host/host.h>
-#include <xmmintrin.h>
 
 #include <cmath>
 #include <cstring>
@@ -320,26 +319,15 @@ TEST(Composite, RefusesAlikeAtEveryOpacityAndRestoresTheControlWord) {
     for (const float opacity : {0.0f, 0.5f, 1.0f})
       ExpectRefusal("composite at " + std::to_string(opacity), c.expected, [&](void* memory) {
         const auto at = [&](Null which) { return c.null == which ? nullptr : memory; };
-        const unsigned callers = _mm_getcsr();
-        _mm_setcsr(0x7F95);
-        const VX_Result result = VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background,
-                                              at(kDestination), 64, c.dst, c.width, c.height, opacity, 3, false);
-        const unsigned after = _mm_getcsr();
-        _mm_setcsr(callers);
-        EXPECT_EQ(after, 0x7F95u);
-        return result;
+        return UnderControlWord(0x7F95, [&] {
+          return VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background, at(kDestination), 64, c.dst,
+                              c.width, c.height, opacity, 3, false);
+        });
       });
   // Calls that do something.
   Image s(F::BGRA_4444_32f, 65, 65), d(F::BGRA_4444_8u, 65, 65), out = d;
-  for (const float opacity : {0.0f, 0.5f, 1.0f}) {
-    const unsigned callers = _mm_getcsr();
-    _mm_setcsr(0x3FBF);
-    const VX_Result result = Composite(s, d, out, opacity);
-    const unsigned after = _mm_getcsr();
-    _mm_setcsr(callers);
-    EXPECT_EQ(result, VX_Success);
-    EXPECT_EQ(after, 0x3FBFu);
-  }
+  for (const float opacity : {0.0f, 0.5f, 1.0f})
+    EXPECT_EQ(UnderControlWord(0x3FBF, [&] { return Composite(s, d, out, opacity); }), VX_Success);
 }
 
 TEST(Composite, GiantStrides) {

@@ -1,7 +1,6 @@
 // Compositing over black: the integer rules code by code, the table of working formats, rows tested for their alpha.
 #include <gtest/gtest.h>
 #include <vexel_host/host.h>
-#include <xmmintrin.h>
 
 #include <cmath>
 #include <cstring>
@@ -217,20 +216,16 @@ TEST(CompositeToBlack, RefusalsAndTheControlWord) {
                {kRaster, kRaster, 0, 4, 1, VX_Success},
                {kRaster, kRaster, 4, 4, 1, VX_ErrNullSource},
                {kRaster, kRaster, 4, 4, 2, VX_ErrNullDestination}};
-  const unsigned callers = _mm_getcsr();
   for (const auto& c : cases)
     for (const float opacity : {0.0f, 0.5f, 1.0f, -1.0f})
       ExpectRefusal("to black", c.expected, [&](void* memory) {
         void *const from = c.null == 1 ? nullptr : memory, *const to = c.null == 2 ? nullptr : memory;
         int32_t state = 77;
-        _mm_setcsr(0x7F95);
-        const VX_Result result =
-            opacity < 0
-                ? VX_CompositeToBlackAndTestSourceAlpha(from, 64, c.src, to, -64, c.dst, c.width, c.height, &state, 0)
-                : VX_CompositeToBlack(from, 64, c.src, to, -64, c.dst, c.width, c.height, opacity, 0);
-        const unsigned after = _mm_getcsr();
-        _mm_setcsr(callers);
-        EXPECT_EQ(after, 0x7F95u);
+        const VX_Result result = UnderControlWord(0x7F95, [&] {
+          return opacity < 0 ? VX_CompositeToBlackAndTestSourceAlpha(from, 64, c.src, to, -64, c.dst, c.width, c.height,
+                                                                     &state, 0)
+                             : VX_CompositeToBlack(from, 64, c.src, to, -64, c.dst, c.width, c.height, opacity, 0);
+        });
         EXPECT_EQ(state, opacity < 0 && result == VX_Success ? 0 : 77);
         return result;
       });
