@@ -35,6 +35,7 @@ struct Image {
   }
   Image(VX_PixelFormat f, int w, int h, uint64_t seed) : Image(f, w, h, Contents::Random, seed) {}
   operator View() const { return {bytes.data(), rowBytes, format}; }
+  operator ArenaFrame() { return Frame(); }
   ArenaFrame Frame() { return {bytes.data(), rowBytes, format, width, height}; }
   uint8_t* Row(int row) { return bytes.data() + ptrdiff_t{row} * rowBytes; }
   // A row counted from the picture's top.

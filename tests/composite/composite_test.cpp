@@ -20,9 +20,9 @@ namespace {
 
 using F = VX_PixelFormat;
 
-VX_Result Composite(Image& s, Image& d, Image& out, float opacity, int32_t quality = 3) {
-  return VX_Composite(s.bytes.data(), s.rowBytes, s.format, d.bytes.data(), d.rowBytes, d.format, out.bytes.data(),
-                      out.rowBytes, out.format, out.width, out.height, opacity, quality, false);
+VX_Result Composite(const View& s, const View& d, const ArenaFrame& out, float opacity, int32_t quality = 3) {
+  return VX_Composite(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, out.base, out.rowBytes, out.format,
+                      out.width, out.height, opacity, quality, false);
 }
 
 // Source-over by the definition; codes and alphas in 0..1. The two pictures' parts of a channel are premultiplied and
@@ -215,8 +215,7 @@ ArenaCase OverCase(F src, F background, F dst, float opacity) {
   arenaCase.sources = {src, background};
   arenaCase.destination = dst;
   arenaCase.run = [opacity](const ArenaFrame* from, const ArenaFrame& to) {
-    return VX_Composite(from[0].base, from[0].rowBytes, from[0].format, from[1].base, from[1].rowBytes, from[1].format,
-                        to.base, to.rowBytes, to.format, to.width, to.height, opacity, 3, false);
+    return Composite(from[0], from[1], to, opacity);
   };
   return arenaCase;
 }
@@ -273,8 +272,7 @@ TEST(Composite, ThreadsAndStreamsChangeNothing) {
     Image s(c.src, c.width, c.height), d(c.background, c.width, c.height, Contents::Random, 2);
     Image expected(c.dst, c.width, c.height), row(c.dst, c.width, 1);
     for (int i = 0; i < c.height; ++i) {
-      ASSERT_EQ(VX_Composite(s.UprightRow(i), s.rowBytes, s.format, d.UprightRow(i), d.rowBytes, d.format,
-                             row.bytes.data(), row.rowBytes, row.format, c.width, 1, 0.6f, 3, false),
+      ASSERT_EQ(Composite({s.UprightRow(i), s.rowBytes, s.format}, {d.UprightRow(i), d.rowBytes, d.format}, row, 0.6f),
                 VX_Success);
       std::memcpy(expected.UprightRow(i), row.bytes.data(), row.bytes.size());
     }
@@ -336,16 +334,14 @@ TEST(Composite, GiantStrides) {
     Image s(F::BGRA_4444_8u, 37, 7), d(F::BGRA_4444_8u, 37, 7, Contents::Random, 2), out(F::BGRA_4444_8u, 37, 7);
     ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
     for (int row = 0; row < 7; ++row) std::memcpy(giant.Row(row), d.Row(row), 37 * 4);
-    ASSERT_EQ(VX_Composite(s.bytes.data(), s.rowBytes, s.format, giant.base, rowBytes, giant.format, giant.base,
-                           rowBytes, giant.format, 37, 7, 0.6f, 3, false),
-              VX_Success);
+    ASSERT_EQ(Composite(s, giant, giant, 0.6f), VX_Success);
     for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
-    ASSERT_EQ(VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, out.bytes.data(), out.rowBytes,
-                                                    out.format, 37, 7, nullptr, 0),
-              VX_Success);
-    ASSERT_EQ(VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, giant.base, rowBytes,
-                                                    giant.format, 37, 7, nullptr, 0),
-              VX_Success);
+    const auto toBlack = [&](const ArenaFrame& to) {
+      return VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, to.base, to.rowBytes, to.format,
+                                                   37, 7, nullptr, 0);
+    };
+    ASSERT_EQ(toBlack(out), VX_Success);
+    ASSERT_EQ(toBlack(giant), VX_Success);
     for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
   }
 }

@@ -19,13 +19,13 @@ namespace {
 
 using F = VX_PixelFormat;
 
-VX_Result ToBlack(Image& s, Image& out, float opacity, int32_t hint = 0) {
-  return VX_CompositeToBlack(s.bytes.data(), s.rowBytes, s.format, out.bytes.data(), out.rowBytes, out.format,
-                             out.width, out.height, opacity, hint);
+VX_Result ToBlack(const View& s, const ArenaFrame& out, float opacity, int32_t hint = 0) {
+  return VX_CompositeToBlack(s.base, s.rowBytes, s.format, out.base, out.rowBytes, out.format, out.width, out.height,
+                             opacity, hint);
 }
-VX_Result ToBlackTested(Image& s, Image& out, int32_t* state, int32_t hint = 0) {
-  return VX_CompositeToBlackAndTestSourceAlpha(s.bytes.data(), s.rowBytes, s.format, out.bytes.data(), out.rowBytes,
-                                               out.format, out.width, out.height, state, hint);
+VX_Result ToBlackTested(const View& s, const ArenaFrame& out, int32_t* state, int32_t hint = 0) {
+  return VX_CompositeToBlackAndTestSourceAlpha(s.base, s.rowBytes, s.format, out.base, out.rowBytes, out.format,
+                                               out.width, out.height, state, hint);
 }
 
 // Every code under every alpha. The quotients are rounded from double precision; 255 is odd, so no ties exist.
@@ -166,11 +166,7 @@ TEST(CompositeToBlack, Arena) {
         arenaCase.name = std::string(FormatName(src)) + " over black in " + FormatName(dst);
         arenaCase.run = [opacity](const ArenaFrame* from, const ArenaFrame& to) {
           int32_t state;
-          if (opacity < 0)
-            return VX_CompositeToBlackAndTestSourceAlpha(from->base, from->rowBytes, from->format, to.base, to.rowBytes,
-                                                         to.format, to.width, to.height, &state, 0);
-          return VX_CompositeToBlack(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format,
-                                     to.width, to.height, opacity, 3);
+          return opacity < 0 ? ToBlackTested(*from, to, &state) : ToBlack(*from, to, opacity, 3);
         };
         EXPECT_TRUE(RunArena(arenaCase));
       }
@@ -221,10 +217,10 @@ TEST(CompositeToBlack, RefusalsAndTheControlWord) {
       ExpectRefusal("to black", c.expected, [&](void* memory) {
         void *const from = c.null == 1 ? nullptr : memory, *const to = c.null == 2 ? nullptr : memory;
         int32_t state = 77;
+        const ArenaFrame out{to, -64, c.dst, c.width, c.height};
         const VX_Result result = UnderControlWord(0x7F95, [&] {
-          return opacity < 0 ? VX_CompositeToBlackAndTestSourceAlpha(from, 64, c.src, to, -64, c.dst, c.width, c.height,
-                                                                     &state, 0)
-                             : VX_CompositeToBlack(from, 64, c.src, to, -64, c.dst, c.width, c.height, opacity, 0);
+          const View in(from, 64, c.src);
+          return opacity < 0 ? ToBlackTested(in, out, &state) : ToBlack(in, out, opacity);
         });
         EXPECT_EQ(state, opacity < 0 && result == VX_Success ? 0 : 77);
         return result;
