@@ -104,31 +104,21 @@ double Difference(F format, const std::vector<uint8_t>& a, const uint8_t* b) {
   const auto consider = [&](double x, double y, double scale) {
     worst = std::max(worst, std::isfinite(y) ? std::abs(x - y) / scale : HUGE_VAL);
   };
-  for (size_t i = 0; i < a.size();) {
-    switch (Depth(format)) {
-      case kDepth32f: {
-        float x, y;
-        std::memcpy(&x, &a[i], 4), std::memcpy(&y, &b[i], 4), i += 4;
-        consider(x, y, 1);
-        break;
-      }
-      case kDepth15u: {
-        uint16_t x, y;
-        std::memcpy(&x, &a[i], 2), std::memcpy(&y, &b[i], 2), i += 2;
-        consider(x, y, 32768);
-        break;
-      }
-      case kDepth10u: {
-        uint32_t x, y;
-        std::memcpy(&x, &a[i], 4), std::memcpy(&y, &b[i], 4), i += 4;
-        for (int shift = IsYuv(format) ? 0 : 2; shift < 30; shift += 10)
-          consider(x >> shift & 1023, y >> shift & 1023, 1023);
-        break;
-      }
-      default:
-        consider(a[i], b[i], 255), ++i;
+  const auto each = [&](auto x, const auto& compare) {
+    for (size_t i = 0; i < a.size(); i += sizeof x) {
+      auto y = x;
+      std::memcpy(&x, &a[i], sizeof x), std::memcpy(&y, &b[i], sizeof y);
+      compare(x, y);
     }
-  }
+  };
+  if (Depth(format) == kDepth32f) each(0.0f, [&](float x, float y) { consider(x, y, 1); });
+  if (Depth(format) == kDepth15u) each(uint16_t{0}, [&](int x, int y) { consider(x, y, 32768); });
+  if (Depth(format) == kDepth8u) each(uint8_t{0}, [&](int x, int y) { consider(x, y, 255); });
+  if (Depth(format) == kDepth10u)
+    each(0u, [&](uint32_t x, uint32_t y) {
+      for (int shift = IsYuv(format) ? 0 : 2; shift < 30; shift += 10)
+        consider(x >> shift & 1023, y >> shift & 1023, 1023);
+    });
   return worst;
 }
 
