@@ -41,7 +41,8 @@ F StoredAs(F format) {
 
 // Rows around the runs that stay in the cache too, and none at all.
 void ExpectStaysInItsRows(const std::string& name, const RowKernelSet& kernel, F src, F dst) {
-  kernel[ActiveKernelVariant()](nullptr, nullptr, 0);
+  auto* const unreadable = static_cast<uint8_t*>(UnreadableMemory());
+  kernel[ActiveKernelVariant()](unreadable, unreadable, 0);
   ArenaCase arenaCase;
   arenaCase.name = name;
   arenaCase.sources = {src};
