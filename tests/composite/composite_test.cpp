@@ -1,6 +1,5 @@
 // VX_Composite against the formula in double precision and against its own rules.
 #include <gtest/gtest.h>
-#include <vexel_host/host.h>
 
 #include <cmath>
 #include <cstring>
@@ -8,22 +7,15 @@
 #include <string>
 #include <vector>
 
-#include "composite/composite_image.h"
 #include "formats/FormatBits.h"
 #include "support/Arena.h"
-#include "support/FailingAllocations.h"
 #include "support/Formats.h"
-#include "vexel/compositing.h"
+#include "support/Image.h"
 
 namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
-
-VX_Result Composite(const View& s, const View& d, const ArenaFrame& out, float opacity, int32_t quality = 3) {
-  return VX_Composite(s.base, s.rowBytes, s.format, d.base, d.rowBytes, d.format, out.base, out.rowBytes, out.format,
-                      out.width, out.height, opacity, quality, false);
-}
 
 // Source-over by the definition; codes and alphas in 0..1. The two pictures' parts of a channel are premultiplied and
 // count from black.
@@ -208,29 +200,8 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
     }
 }
 
-ArenaCase OverCase(F src, F background, F dst, float opacity) {
-  ArenaCase arenaCase;
-  arenaCase.name = std::string("composite ") + FormatName(src) + " over " + FormatName(background) + " in " +
-                   FormatName(dst) + " at " + std::to_string(opacity);
-  arenaCase.sources = {src, background};
-  arenaCase.destination = dst;
-  arenaCase.run = [opacity](const ArenaFrame* from, const ArenaFrame& to) {
-    return Composite(from[0], from[1], to, opacity);
-  };
-  return arenaCase;
-}
-
-TEST(Composite, Arena) {
-  const std::vector<F> formats = RasterFormats();
-  size_t turn = 0;
-  for (const F dst : formats)
-    for (const float opacity : {1.0f, 0.6f, 0.0f}) {
-      const F src = formats[(turn * 7 + 3) % formats.size()], background = formats[turn * 5 % formats.size()];
-      ArenaCase arenaCase = OverCase(src, background, dst, opacity);
-      arenaCase.seed = ++turn;
-      EXPECT_TRUE(RunArena(arenaCase));
-    }
-  // The kernels without any conversion around them.
+// The kernels without any conversion around them.
+TEST(Composite, KernelsInTheArena) {
   for (const F dst : {F::BGRA_4444_8u, F::BGRP_4444_8u, F::PRGB_4444_8u, F::VUYA_4444_8u, F::VUYP_4444_8u,
                       F::BGRA_4444_32f, F::ARGB_4444_32f, F::BGRP_4444_32f})
     for (const uint32_t kind : {kAlphaStraight, kAlphaPremultiplied})
@@ -239,111 +210,15 @@ TEST(Composite, Arena) {
           const auto input = [&](int bit) {
             return FromBits((Bits(dst) & ~kAlphaMask) | (usable & bit ? kind : kAlphaIgnored));
           };
-          ArenaCase arenaCase = OverCase(input(1), input(2), dst, opacity);
+          ArenaCase arenaCase;
+          arenaCase.name = "composite at " + std::to_string(opacity);
+          arenaCase.sources = {input(1), input(2)};
+          arenaCase.destination = dst;
           arenaCase.everyContents = true;
           arenaCase.widths = {1, 2, 3, 4, 5, 7, 8, 9, 15, 16, 17, 31, 32, 33, 63, 64, 65, 129};
+          arenaCase.run = [=](const ArenaFrame* s, const ArenaFrame& to) { return Composite(s[0], s[1], to, opacity); };
           EXPECT_TRUE(RunArena(arenaCase));
         }
-}
-
-// The destination as either input: the bytes of a call with three buffers.
-TEST(Composite, InPlace) {
-  for (const F format : RasterFormats())
-    for (const float opacity : {0.0f, 0.6f, 1.0f})
-      for (const bool onSource : {false, true}) {
-        SCOPED_TRACE(std::string(FormatName(format)) + (onSource ? " on source" : " on background"));
-        Image s(format, 515, 70), d(format, 515, 70, Contents::Random, 2), out(format, 515, 70);
-        ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
-        Image& target = onSource ? s : d;
-        ASSERT_EQ(Composite(s, d, target, opacity), VX_Success);
-        ASSERT_EQ(target.bytes, out.bytes);
-      }
-}
-
-TEST(Composite, ThreadsAndStreamsChangeNothing) {
-  const struct {
-    F src, background, dst;
-    int width, height;
-  } cases[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u, F::BGRA_4444_8u, 301, 65},
-               {F::BGRA_4444_8u, F::UYVY_422_8u, F::V210_422_10u_709, 301, 200},
-               {F::BGRP_4444_32f, F::V210_422_10u, F::BGRX_4444_8u, 1920, 1080},
-               {F::BGRA_4444_8u, F::BGRX_4444_8u, F::BGRA_4444_8u, 1920, 1080}};
-  for (const auto& c : cases) {
-    Image s(c.src, c.width, c.height), d(c.background, c.width, c.height, Contents::Random, 2);
-    Image expected(c.dst, c.width, c.height), row(c.dst, c.width, 1);
-    for (int i = 0; i < c.height; ++i) {
-      ASSERT_EQ(Composite({s.UprightRow(i), s.rowBytes, s.format}, {d.UprightRow(i), d.rowBytes, d.format}, row, 0.6f),
-                VX_Success);
-      std::memcpy(expected.UprightRow(i), row.bytes.data(), row.bytes.size());
-    }
-    for (const int limit : {1, 2, 3, 7, 16}) {
-      vexel_host::SetThreadLimit(limit);
-      Image out(c.dst, c.width, c.height);
-      ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
-      EXPECT_EQ(out.bytes, expected.bytes) << limit << " threads";
-    }
-    vexel_host::SetThreadLimit(0);
-  }
-}
-
-TEST(Composite, FailingAllocations) {
-  Image s(F::V210_422_10u, 80001, 2), d(F::BGRA_4444_15u, 80001, 2), out(F::UYVY_422_8u, 80001, 2);
-  EXPECT_GE(ExpectSurvivesFailingAllocations("wide rows", [&] { return Composite(s, d, out, 0.5f); }), 1);
-}
-
-TEST(Composite, RefusesAlikeAtEveryOpacityAndRestoresTheControlWord) {
-  constexpr F kSpecial = F::YUV_420_MPEG2_FRAME, kNone = FromBits(0xFFFF), kRaster = F::BGRA_4444_8u;
-  enum Null { kNothing, kSource, kBackground, kDestination };
-  const struct {
-    F src, background, dst;
-    int32_t width, height;
-    Null null;
-    VX_Result expected;
-  } cases[] = {{kSpecial, kRaster, kSpecial, -1, -1, kSource, VX_ErrUnsupportedFormat},
-               {kRaster, kSpecial, kSpecial, 4, 4, kNothing, VX_ErrUnsupportedFormat},
-               {kRaster, kNone, kSpecial, 4, 4, kNothing, VX_ErrUnsupportedDestinationFormat},
-               {kNone, kRaster, kRaster, -4, 4, kNothing, VX_ErrFormatNotHandled},
-               {kRaster, kNone, kRaster, 4, 4, kNothing, VX_ErrFormatNotHandled},
-               {kRaster, kRaster, kNone, 0, 0, kNothing, VX_ErrFormatNotHandled},
-               {kRaster, kRaster, F::V210_422_10u, -1, 4, kSource, VX_ErrArgumentOutOfRange},
-               {kRaster, kRaster, kRaster, 4, INT32_MIN, kNothing, VX_ErrArgumentOutOfRange},
-               {kRaster, kRaster, kRaster, INT32_MAX, 1, kNothing, VX_ErrArgumentOutOfRange},
-               {kRaster, kRaster, kRaster, 0, 4, kSource, VX_Success},
-               {kRaster, kRaster, kRaster, 4, 0, kDestination, VX_Success},
-               {kRaster, kRaster, kRaster, 4, 4, kSource, VX_ErrNullSource},
-               {F::BGRX_4444_8u, kRaster, kRaster, 4, 4, kBackground, VX_ErrNullSource},
-               {F::BGRX_4444_8u, kRaster, kRaster, 4, 4, kDestination, VX_ErrNullDestination}};
-  for (const auto& c : cases)
-    for (const float opacity : {0.0f, 0.5f, 1.0f})
-      ExpectRefusal("composite at " + std::to_string(opacity), c.expected, [&](void* memory) {
-        const auto at = [&](Null which) { return c.null == which ? nullptr : memory; };
-        return UnderControlWord(0x7F95, [&] {
-          return VX_Composite(at(kSource), 64, c.src, at(kBackground), -64, c.background, at(kDestination), 64, c.dst,
-                              c.width, c.height, opacity, 3, false);
-        });
-      });
-  // Calls that do something.
-  Image s(F::BGRA_4444_32f, 65, 65), d(F::BGRA_4444_8u, 65, 65), out = d;
-  for (const float opacity : {0.0f, 0.5f, 1.0f})
-    EXPECT_EQ(UnderControlWord(0x3FBF, [&] { return Composite(s, d, out, opacity); }), VX_Success);
-}
-
-TEST(Composite, GiantStrides) {
-  for (const int32_t rowBytes : {INT32_MAX - 63, INT32_MIN + 64}) {
-    const ArenaFrame giant = GiantStrideFrame(F::BGRA_4444_8u, 37, 7, rowBytes);
-    Image s(F::BGRA_4444_8u, 37, 7), d(F::BGRA_4444_8u, 37, 7, Contents::Random, 2), out(F::BGRA_4444_8u, 37, 7);
-    ASSERT_EQ(Composite(s, d, out, 0.6f), VX_Success);
-    for (int row = 0; row < 7; ++row) std::memcpy(giant.Row(row), d.Row(row), 37 * 4);
-    ASSERT_EQ(Composite(s, giant, giant, 0.6f), VX_Success);
-    for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
-    const auto toBlack = [&](const ArenaFrame& to) {
-      return VX_CompositeToBlackAndTestSourceAlpha(giant.base, rowBytes, giant.format, to.base, to.rowBytes, to.format,
-                                                   37, 7, nullptr, 0);
-    };
-    ASSERT_EQ(toBlack(out), VX_Success);
-    ASSERT_EQ(toBlack(giant), VX_Success);
-    for (int row = 0; row < 7; ++row) ASSERT_EQ(std::memcmp(giant.Row(row), out.Row(row), 37 * 4), 0);
-  }
 }
 
 }  // namespace

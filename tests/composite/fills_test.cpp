@@ -1,19 +1,21 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <functional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
-#include "vexel/compositing.h"
+#include "support/Image.h"
+#include "support/Operations.h"
 
 namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
-using Fill = VX_Result (*)(void*, int32_t, int32_t, int32_t, F);
 using Bytes = std::vector<uint8_t>;
 
 const struct {
@@ -130,82 +132,55 @@ TEST(Fills, ColorIsConvertedOnceForEveryPair) {
                       [&](void* memory) { return VX_FillWithColor(memory, 64, 4, 4, format, memory, color); });
         continue;
       }
-      Bytes pixel(static_cast<size_t>(UnpaddedRowBytes(format, 1))), picture(pixel.size() * 21), expected;
-      ASSERT_EQ(VX_Convert(bytes, 16, color, pixel.data(), 16, format, 1, 1, 3), VX_Success);
-      for (int i = 0; i < 21; ++i) expected.insert(expected.end(), pixel.begin(), pixel.end());
-      const auto rowBytes = static_cast<int32_t>(7 * pixel.size());
-      ASSERT_EQ(VX_FillWithColor(picture.data(), rowBytes, 7, 3, format, bytes, color), VX_Success);
-      ASSERT_EQ(picture, expected);
+      Image pixel(format, 1, 1), picture(format, 7, 3);
+      ASSERT_EQ(Convert({bytes, 16, color}, pixel), VX_Success);
+      ASSERT_EQ(VX_FillWithColor(picture.bytes.data(), picture.rowBytes, 7, 3, format, bytes, color), VX_Success);
+      for (size_t i = 0; i < picture.bytes.size(); ++i)
+        ASSERT_EQ(picture.bytes[i], pixel.bytes[i % pixel.bytes.size()]) << i;
     }
 }
 
-TEST(Fills, Arena) {
-  std::vector<F> formats = RasterFormats(), pictures = Formats420();
-  formats.insert(formats.end(), pictures.begin(), pictures.end());
-  for (const F format : formats)
-    for (const auto& f : kFills) {
-      ArenaCase arenaCase;
-      arenaCase.name = std::string("fill with ") + f.name;
-      arenaCase.destination = format;
-      if (!f.opaque && (Is420(format) || !HasAlpha(FormatName(format))))
-        arenaCase.expected = VX_ErrUnsupportedDestinationFormat;
-      if (Is420(format)) arenaCase.widths = {2, 4, 62, 64, 66, 130}, arenaCase.heights = {2, 4, 34};
-      arenaCase.run = [&f](const ArenaFrame*, const ArenaFrame& to) {
-        return f.fill(to.base, to.rowBytes, to.width, to.height, to.format);
-      };
-      EXPECT_TRUE(RunArena(arenaCase));
-    }
-}
-
+// What operations_test.cpp does not know.
 TEST(Fills, Refusals) {
   constexpr F kFrame = FromBits(0x7F000004), kPlanar10 = FromBits(0x0C000A71), kBiplanar10 = FromBits(0x0E000A71),
-              kBgra = F::BGRA_4444_8u;
-  const auto color = [](void* p, F format, F colorFormat) {
-    return VX_FillWithColor(p, 64, 4, 4, format, p, colorFormat);
+              kBgra = F::BGRA_4444_8u, kPlanar = F::YUV_420_MPEG2_FRAME;
+  static const uint32_t pixel = 0;
+  const auto color = [](void* p, F format, const void* value, F colorFormat, int32_t width = 4) {
+    return VX_FillWithColor(p, 64, width, 4, format, value, colorFormat);
   };
-  for (const F format :
-       {F::NTSCDV50, F::PALDV50, F::NTSC_DV100_720p, F::PAL_DV100_1080i, F::Invalid, kFrame, kPlanar10}) {
+  for (const F format : {F::NTSCDV50, F::PALDV50, F::NTSC_DV100_720p, F::PAL_DV100_1080i, F::Invalid, kPlanar10}) {
     for (const auto& f : kFills)
       for (const int32_t size : {4, 0, -1})
         ExpectRefusal(f.name, f.opaque ? VX_ErrFormatNotHandled : VX_ErrUnsupportedDestinationFormat,
                       [&](void* p) { return f.fill(p, 64, size, 4, format); });
-    ExpectRefusal("colour into", VX_ErrUnsupportedFormat, [&](void* p) { return color(p, format, kBgra); });
+    ExpectRefusal("colour into", VX_ErrUnsupportedFormat, [&](void* p) { return color(p, format, p, kBgra); });
   }
-  for (const F format : {F::NTSCDV25, F::PALDV25})
-    ExpectRefusal("white DV", VX_ErrFormatNotHandled,
-                  [&](void* p) { return VX_FillWithOpaqueWhite(p, 0, 720, 480, format); });
-  for (const F format : {F::NTSCDV25, F::YUV_420_MPEG2_FRAME, kFrame})
-    ExpectRefusal("colour of", VX_ErrUnsupportedFormat, [&](void* p) { return color(p, kBgra, format); });
-  ExpectRefusal("no chain", VX_ErrFailed, [&](void* p) { return color(p, F::BGRA_4444_32f, F::Invalid); });
-  ExpectRefusal("no colour", VX_ErrNullSource,
-                [&](void* p) { return VX_FillWithColor(p, 64, 4, 4, kBgra, nullptr, kBgra); });
-
-  const struct {
-    int32_t width, height, rowBytes;
-    bool null;
-    VX_Result expected;
-  } sizes[] = {{0, 4, 64, true, VX_Success},
-               {4, 0, 64, true, VX_Success},
-               {-1, 4, 64, false, VX_ErrArgumentOutOfRange},
-               {4, INT32_MIN, 64, false, VX_ErrArgumentOutOfRange},
-               {INT32_MAX, 4, 64, false, VX_ErrArgumentOutOfRange},
-               {4, 4, 15, false, VX_ErrArgumentOutOfRange},
-               {4, 4, -15, false, VX_ErrArgumentOutOfRange},
-               {4, 4, 64, true, VX_ErrNullDestination}};
-  const uint32_t pixel = 0;
-  for (const auto& s : sizes) {
-    const std::string what = std::to_string(s.width) + "x" + std::to_string(s.height);
-    const auto refuses = [&](Fill fill, F format) {
-      ExpectRefusal(what, s.expected,
-                    [&](void* p) { return fill(s.null ? nullptr : p, s.rowBytes, s.width, s.height, format); });
-    };
-    for (const auto& f : kFills) refuses(f.fill, kBgra);
-    for (const F format : {F::YUV_420_MPEG2_FRAME, kBiplanar10})
-      if (s.rowBytes == 64) refuses(VX_FillWithOpaqueBlack, format);
-    ExpectRefusal(what, s.expected, [&](void* p) {
-      return VX_FillWithColor(s.null ? nullptr : p, s.rowBytes, s.width, s.height, kBgra, &pixel, kBgra);
-    });
-  }
+  const std::pair<VX_Result, std::function<VX_Result(void*)>> cases[] = {
+      {VX_ErrFormatNotHandled, [](void* p) { return VX_FillWithOpaqueWhite(p, 0, 720, 480, F::NTSCDV25); }},
+      {VX_ErrFormatNotHandled, [](void* p) { return VX_FillWithOpaqueWhite(p, 0, 720, 480, F::PALDV25); }},
+      {VX_ErrUnsupportedFormat, [&](void* p) { return color(p, kBgra, p, F::NTSCDV25); }},
+      {VX_ErrUnsupportedFormat, [&](void* p) { return color(p, kBgra, p, kPlanar); }},
+      {VX_ErrUnsupportedFormat, [&](void* p) { return color(p, kBgra, p, kFrame); }},
+      {VX_ErrFailed, [&](void* p) { return color(p, F::BGRA_4444_32f, p, F::Invalid); }},
+      {VX_ErrNullSource, [&](void* p) { return color(p, kBgra, nullptr, kBgra); }},
+      {VX_Success, [&](void*) { return color(nullptr, kBgra, nullptr, kBgra, 0); }},
+      {VX_ErrArgumentOutOfRange, [&](void* p) { return color(p, kBgra, &pixel, kBgra, -1); }},
+      {VX_ErrArgumentOutOfRange, [&](void* p) { return color(p, kBgra, &pixel, kBgra, INT32_MAX); }},
+      {VX_ErrNullDestination, [&](void*) { return color(nullptr, kBgra, &pixel, kBgra); }},
+      {VX_ErrArgumentOutOfRange, [](void* p) { return VX_FillWithOpaqueBlack(p, 15, 4, 4, kBgra); }},
+      {VX_ErrArgumentOutOfRange, [](void* p) { return VX_FillWithOpaqueBlack(p, -15, 4, 4, kBgra); }}};
+  for (const auto& c : cases) ExpectRefusal("case " + std::to_string(&c - cases), c.first, c.second);
+  for (const F format : {kPlanar, kBiplanar10, F::PALDV25})
+    for (const auto& [width, height, null, expected] : {std::tuple{0, 4, true, VX_Success},
+                                                        {4, 0, true, VX_Success},
+                                                        {-1, 4, false, VX_ErrArgumentOutOfRange},
+                                                        {4, INT32_MIN, false, VX_ErrArgumentOutOfRange},
+                                                        {4, 4, true, VX_ErrNullDestination}})
+      ExpectRefusal("4:2:0 and DV", expected, [&, w = width, h = height, none = null](void* p) {
+        return VX_FillWithOpaqueBlack(none ? nullptr : p, 64, w, h, format);
+      });
+  ExpectRefusal("wide 4:2:0", VX_ErrArgumentOutOfRange,
+                [](void* p) { return VX_FillWithOpaqueBlack(p, 64, INT32_MAX, 4, kPlanar); });
 }
 
 // Every block of a DV frame is where it says; what is in them is for a decoder to tell (tests/tool/fill.sh).

@@ -1,6 +1,5 @@
 // Compositing over black: the integer rules code by code, the table of working formats, rows tested for their alpha.
 #include <gtest/gtest.h>
-#include <vexel_host/host.h>
 
 #include <cmath>
 #include <cstring>
@@ -8,25 +7,13 @@
 #include <string>
 #include <vector>
 
-#include "composite/composite_image.h"
-#include "support/Arena.h"
-#include "support/FailingAllocations.h"
 #include "support/Formats.h"
-#include "vexel/compositing.h"
+#include "support/Image.h"
 
 namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
-
-VX_Result ToBlack(const View& s, const ArenaFrame& out, float opacity, int32_t hint = 0) {
-  return VX_CompositeToBlack(s.base, s.rowBytes, s.format, out.base, out.rowBytes, out.format, out.width, out.height,
-                             opacity, hint);
-}
-VX_Result ToBlackTested(const View& s, const ArenaFrame& out, int32_t* state, int32_t hint = 0) {
-  return VX_CompositeToBlackAndTestSourceAlpha(s.base, s.rowBytes, s.format, out.base, out.rowBytes, out.format,
-                                               out.width, out.height, state, hint);
-}
 
 // Every code under every alpha. The quotients are rounded from double precision; 255 is odd, so no ties exist.
 TEST(CompositeToBlack, EveryCodeUnderEveryAlpha) {
@@ -34,7 +21,7 @@ TEST(CompositeToBlack, EveryCodeUnderEveryAlpha) {
     for (const float opacity : {1.0f, 0.999995f, 0.999f, 0.6f, 0.5f, 0.01f, 0.001f, 3.0f}) {
       if (format == F::VUYA_4444_8u_709 && opacity < 0.9999f) continue;  // goes through 601
       SCOPED_TRACE(std::string(FormatName(format)) + " at " + std::to_string(opacity));
-      const int alphaAt = IsReversed(format) ? 0 : 3;
+      const int alphaAt = static_cast<int>(AlphaAt(format));
       Image s(format, 256, 256), out(format, 256, 256);
       for (int i = 0; i < 256 * 256 * 4; ++i)
         s.bytes[i] = static_cast<uint8_t>(i % 4 == alphaAt ? i >> 10 : (i >> 2) + 85 * (i % 4));
@@ -52,7 +39,7 @@ TEST(CompositeToBlack, EveryCodeUnderEveryAlpha) {
 TEST(CompositeToBlack, Floats) {
   for (const F format : {F::BGRA_4444_32f, F::ARGB_4444_32f, F::VUYA_4444_32f})
     for (const float opacity : {1.0f, 0.6f}) {
-      const int alphaAt = IsReversed(format) ? 0 : 3;
+      const int alphaAt = static_cast<int>(AlphaAt(format));
       Image s(format, 500, 2), out(format, 500, 2);
       const float alphas[] = {0, 1, 0.999995f, 0.9999f, 1.5f, -0.5f, 2, 1 / 0.6f};
       for (int i = 0; i < 500; ++i) s.As<float>()[4 * i + alphaAt] = alphas[i % 8];
@@ -84,17 +71,16 @@ TEST(CompositeToBlack, ConvertsIntoAndOutOfTheWorkingFormat) {
         for (const int32_t hint : {-1, 2, 3}) {
           SCOPED_TRACE(std::string(FormatName(src)) + " in " + FormatName(dst) + " at " + std::to_string(opacity) +
                        ", hint " + std::to_string(hint));
-          const F working = WorkingByName(dst, opacity == 1, hint > 2);
-          Image s(src, 391, 2), out(dst, 391, 2), w(working, 391, 2), expected(dst, 391, 2);
-          ASSERT_EQ(Convert(s, w, hint), VX_Success);
+          const Image s(src, 391, 2);
+          Image out(dst, 391, 2), w = s.Converted(WorkingByName(dst, opacity == 1, hint > 2), hint);
           ASSERT_EQ(ToBlack(w, w, opacity), VX_Success);
-          ASSERT_EQ(Convert(w, expected, hint), VX_Success);
           ASSERT_EQ(ToBlack(s, out, opacity, hint), VX_Success);
-          ASSERT_EQ(out.bytes, expected.bytes);
-          ASSERT_EQ(VX_FillWithOpaqueBlack(expected.bytes.data(), expected.rowBytes, 391, 2, dst), VX_Success);
+          ASSERT_EQ(out.bytes, w.Converted(dst, hint).bytes);
+          Image black(dst, 391, 2);
+          ASSERT_EQ(FillWith(VX_FillWithOpaqueBlack, black), VX_Success);
           for (const float none : {0.0f, 7e-6f, -1.0f, std::numeric_limits<float>::quiet_NaN()}) {
             ASSERT_EQ(ToBlack(s, out, none, hint), VX_Success);
-            ASSERT_EQ(out.bytes, expected.bytes);
+            ASSERT_EQ(out.bytes, black.bytes);
           }
         }
 }
@@ -120,16 +106,15 @@ TEST(CompositeToBlack, RowsAreTestedForTheirAlpha) {
           SCOPED_TRACE(std::string(FormatName(pair.src)) + " in " + FormatName(pair.dst) + " rows " + c.rows + " of " +
                        std::to_string(width));
           const int height = static_cast<int>(std::strlen(c.rows));
-          Image straight(F::BGRA_4444_32f, width, height), s(pair.src, width, height), out(pair.dst, width, height);
+          Image straight(F::BGRA_4444_32f, width, height), out(pair.dst, width, height);
           for (int row = 0; row < height; ++row)
             for (int i = 0; i < width; ++i)
               reinterpret_cast<float*>(straight.UprightRow(row))[4 * i + 3] =
                   static_cast<float>(c.rows[row] == 'm' ? (i == width - 1 ? 0.5 : width % 2) : c.rows[row] - '0');
-          ASSERT_EQ(Convert(straight, s), VX_Success);
-          Image converted = out, black = out, composited = out;
-          ASSERT_EQ(Convert(s, converted, hint), VX_Success);
+          const Image s = straight.Converted(pair.src);
+          Image converted = s.Converted(pair.dst, hint), black = out, composited = out;
           ASSERT_EQ(ToBlack(s, composited, 1, hint), VX_Success);
-          VX_FillWithOpaqueBlack(black.bytes.data(), black.rowBytes, width, height, black.format);
+          ASSERT_EQ(FillWith(VX_FillWithOpaqueBlack, black), VX_Success);
           int32_t state = -1;
           ASSERT_EQ(ToBlackTested(s, out, &state, hint), VX_Success);
           EXPECT_EQ(state, c.state);
@@ -137,11 +122,6 @@ TEST(CompositeToBlack, RowsAreTestedForTheirAlpha) {
             Image& wanted = c.rows[row] == '1' ? converted : c.rows[row] == '0' ? black : composited;
             EXPECT_EQ(std::memcmp(out.UprightRow(row), wanted.UprightRow(row), static_cast<size_t>(out.rowBytes)), 0);
           }
-          ASSERT_EQ(ToBlackTested(s, out, nullptr, hint), VX_Success);
-          if (pair.src != pair.dst) continue;
-          ASSERT_EQ(ToBlackTested(s, s, &state, hint), VX_Success);
-          EXPECT_EQ(s.bytes, out.bytes);
-          EXPECT_EQ(state, c.state);
         }
   // Opaque rows keep what the working format could not hold.
   Image s(F::V210_422_10u, 100, 3), out(F::V210_422_10u, 100, 3);
@@ -151,80 +131,13 @@ TEST(CompositeToBlack, RowsAreTestedForTheirAlpha) {
   EXPECT_EQ(state, 0);
 }
 
-TEST(CompositeToBlack, Arena) {
-  const std::vector<F> formats = RasterFormats();
-  size_t turn = 0;
-  for (const F dst : formats)
-    for (const F src : {dst, formats[(turn * 7 + 3) % formats.size()], F::BGRA_4444_8u})
-      for (const float opacity : {1.0f, 0.6f, -1.0f}) {
-        ArenaCase arenaCase;
-        arenaCase.sources = {src};
-        arenaCase.destination = dst;
-        arenaCase.seed = ++turn;
-        arenaCase.everyContents = src == dst;
-        arenaCase.widths = {1, 2, 3, 5, 6, 8, 13, 15, 16, 17, 31, 33, 63, 64, 65, 127, 129, 385};
-        arenaCase.name = std::string(FormatName(src)) + " over black in " + FormatName(dst);
-        arenaCase.run = [opacity](const ArenaFrame* from, const ArenaFrame& to) {
-          int32_t state;
-          return opacity < 0 ? ToBlackTested(*from, to, &state) : ToBlack(*from, to, opacity, 3);
-        };
-        EXPECT_TRUE(RunArena(arenaCase));
-      }
-}
-
-TEST(CompositeToBlack, ThreadsPlaceAndMemory) {
-  for (const F format : {F::ARGB_4444_8u, F::VUYP_4444_32f, F::V210_422_10u}) {
-    Image s(format, 333, 200), one(format, 333, 200), tested(format, 333, 200);
-    vexel_host::SetThreadLimit(1);
-    ASSERT_EQ(ToBlack(s, one, 0.6f), VX_Success);
-    ASSERT_EQ(ToBlackTested(s, tested, nullptr), VX_Success);
-    for (const int limit : {2, 3, 7, 16}) {
-      vexel_host::SetThreadLimit(limit);
-      Image place = s;
-      ASSERT_EQ(ToBlack(place, place, 0.6f), VX_Success);
-      EXPECT_EQ(place.bytes, one.bytes);
-      place = s;
-      ASSERT_EQ(ToBlackTested(place, place, nullptr), VX_Success);
-      EXPECT_EQ(place.bytes, tested.bytes);
-    }
-    vexel_host::SetThreadLimit(0);
-  }
-  Image s(F::PRGB_4444_15u, 80001, 2), out(F::UYVY_422_8u, 80001, 2);
-  int32_t state;
-  ExpectSurvivesFailingAllocations("to black", [&] { return ToBlack(s, out, 0.5f); });
-  EXPECT_GE(ExpectSurvivesFailingAllocations("tested", [&] { return ToBlackTested(s, out, &state); }), 1);
-}
-
-TEST(CompositeToBlack, RefusalsAndTheControlWord) {
-  constexpr F kSpecial = F::YUV_420_MPEG2_FRAME, kNone = FromBits(0xFFFF), kRaster = F::BGRA_4444_8u;
-  const struct {
-    F src, dst;
-    int32_t width, height;
-    int null;
-    VX_Result expected;
-  } cases[] = {{kSpecial, kSpecial, -1, 4, 0, VX_ErrUnsupportedFormat},
-               {kNone, kRaster, 4, 4, 0, VX_ErrUnsupportedFormat},
-               {kRaster, kSpecial, -1, 4, 1, VX_ErrUnsupportedDestinationFormat},
-               {kRaster, kNone, 4, 4, 0, VX_ErrUnsupportedDestinationFormat},
-               {kRaster, kRaster, -1, 4, 1, VX_ErrArgumentOutOfRange},
-               {kRaster, kRaster, 4, INT32_MIN, 0, VX_ErrArgumentOutOfRange},
-               {kRaster, F::BGRA_4444_32f, INT32_MAX / 8, 1, 0, VX_ErrArgumentOutOfRange},
-               {kRaster, kRaster, 0, 4, 1, VX_Success},
-               {kRaster, kRaster, 4, 4, 1, VX_ErrNullSource},
-               {kRaster, kRaster, 4, 4, 2, VX_ErrNullDestination}};
-  for (const auto& c : cases)
-    for (const float opacity : {0.0f, 0.5f, 1.0f, -1.0f})
-      ExpectRefusal("to black", c.expected, [&](void* memory) {
-        void *const from = c.null == 1 ? nullptr : memory, *const to = c.null == 2 ? nullptr : memory;
-        int32_t state = 77;
-        const ArenaFrame out{to, -64, c.dst, c.width, c.height};
-        const VX_Result result = UnderControlWord(0x7F95, [&] {
-          const View in(from, 64, c.src);
-          return opacity < 0 ? ToBlackTested(in, out, &state) : ToBlack(in, out, opacity);
-        });
-        EXPECT_EQ(state, opacity < 0 && result == VX_Success ? 0 : 77);
-        return result;
-      });
+TEST(CompositeToBlack, TellsAStateWhenNothingIsRefused) {
+  Image s(F::BGRA_4444_8u, 4, 4), out = s;
+  int32_t state = 77;
+  EXPECT_EQ(ToBlackTested({nullptr, 16, s.format}, out, &state), VX_ErrNullSource);
+  EXPECT_EQ(state, 77);
+  EXPECT_EQ(ToBlackTested(s, {out.bytes.data(), 16, out.format, 4, 0}, &state), VX_Success);
+  EXPECT_EQ(state, 0);
 }
 
 }  // namespace

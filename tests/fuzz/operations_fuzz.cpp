@@ -13,8 +13,7 @@
 #include "frame/KernelVariant.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
-#include "vexel/compositing.h"
-#include "vexel/vexel.h"
+#include "support/Operations.h"
 
 namespace vexel::testing {
 namespace {
@@ -47,98 +46,75 @@ struct Operation {
   bool turns = false;  // width and height change places
 };
 
-Operation Convert(Input& input) {
+Operation AnyConversion(Input& input) {
   const F src = input.Raster(), dst = input.Raster();
   const int quality = input.ConsumeIntegralInRange(-1, 6);
-  return {{src}, dst, [quality](const ArenaFrame* from, const ArenaFrame& to) {
-            return VX_Convert(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format, to.width,
-                              to.height, quality);
-          }};
+  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) { return Convert(*from, to, quality); }};
 }
 
-Operation Rotate(Input& input) {
+Operation AnyRotation(Input& input) {
   const F format = input.Raster();
   const int angle = 90 * input.ConsumeIntegralInRange(-3, 3);
   const bool flip = input.ConsumeBool();
-  return {{format},
-          format,
-          [angle, flip](const ArenaFrame* from, const ArenaFrame& to) {
-            return VX_RotateImageAndFlip(from->base, from->rowBytes, to.base, to.rowBytes, from->width, from->height,
-                                         to.format, angle, flip);
-          },
-          angle % 180 != 0};
+  const auto rotate = [=](const ArenaFrame* from, const ArenaFrame& to) { return Rotate(*from, to, angle, flip); };
+  return {{format}, format, rotate, angle % 180 != 0};
 }
 
-Operation Composite(Input& input) {
-  const int mode = input.ConsumeIntegralInRange(-1, 27), option = input.ConsumeIntegralInRange(-1, 6);
+Operation AnyComposite(Input& input) {
+  const auto mode = static_cast<VX_BlendMode>(input.ConsumeIntegralInRange(-1, 27));
+  const int option = input.ConsumeIntegralInRange(-1, 6);
   const float opacity = input.Fraction();
   const F src = input.Raster(), background = input.Raster(), dst = input.Raster();
   return {{src, background}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return VX_CompositeWithBlendMode(from[0].base, from[0].rowBytes, from[0].format, from[1].base,
-                                             from[1].rowBytes, from[1].format, to.base, to.rowBytes, to.format,
-                                             to.width, to.height, opacity, mode, option, false);
+            return Blend(mode, from[0], from[1], to, opacity, option);
           }};
 }
 
-Operation CompositeToBlack(Input& input) {
+Operation AnyToBlack(Input& input) {
   const int hint = input.ConsumeIntegralInRange(0, 4);
   const float opacity = input.Fraction();
   const bool test = input.ConsumeBool();
   const F src = input.Raster(), dst = input.Raster();
   return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
             int32_t state;
-            return test ? VX_CompositeToBlackAndTestSourceAlpha(from->base, from->rowBytes, from->format, to.base,
-                                                                to.rowBytes, to.format, to.width, to.height, &state,
-                                                                hint)
-                        : VX_CompositeToBlack(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format,
-                                              to.width, to.height, opacity, hint);
+            return test ? ToBlackTested(*from, to, &state, hint) : ToBlack(*from, to, opacity, hint);
           }};
 }
 
-Operation CrossDissolve(Input& input) {
+Operation AnyDissolve(Input& input) {
   const int hint = input.ConsumeIntegralInRange(0, 4);
   const float mix = input.Fraction();
   const F a = input.Raster(), b = input.Raster(), dst = input.Raster();
   return {{a, b}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return VX_CrossDissolve(from[0].base, from[0].rowBytes, from[0].format, from[1].base, from[1].rowBytes,
-                                    from[1].format, to.base, to.rowBytes, to.format, to.width, to.height, mix, hint);
+            return Dissolve(from[0], from[1], to, mix, hint);
           }};
 }
 
-Operation AlphaGain(Input& input) {
+Operation AnyGain(Input& input) {
   const int hint = input.ConsumeIntegralInRange(0, 4);
   const float gain = input.Fraction();
   const F src = input.Raster(), dst = input.Raster();
-  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return VX_AlphaGain(from->base, from->rowBytes, from->format, to.base, to.rowBytes, to.format, to.width,
-                                to.height, gain, hint);
-          }};
+  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) { return AlphaGain(*from, to, gain, hint); }};
 }
 
-Operation Accumulate(Input& input) {
+Operation AnySum(Input& input) {
   const std::vector<float> weights = {input.Fraction(), input.Fraction(), input.Fraction()};
   const std::vector<F> sources = {input.Raster(), input.Raster(), input.Raster()};
   const F dst = input.Raster();
   return {sources, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            const void* const bases[] = {from[0].base, from[1].base, from[2].base};
-            const int32_t rowBytes[] = {from[0].rowBytes, from[1].rowBytes, from[2].rowBytes};
-            return VX_Accumulate(bases, rowBytes, sources.data(), 3, to.base, to.rowBytes, to.format, to.width,
-                                 to.height, weights.data(), 3);
+            return Accumulate({from[0], from[1], from[2]}, to, weights);
           }};
 }
 
-Operation Fill(Input& input) {
+Operation AnyFill(Input& input) {
   static constexpr auto kFills = {VX_FillWithOpaqueBlack, VX_FillWithTransparentBlack, VX_FillWithOpaqueWhite,
                                   VX_FillWithTransparentWhite};
   const auto fill = kFills.begin()[input.ConsumeIntegralInRange(0, 3)];
-  const F dst = input.Raster();
-  return {{}, dst, [fill](const ArenaFrame*, const ArenaFrame& to) {
-            return fill(to.base, to.rowBytes, to.width, to.height, to.format);
-          }};
+  return {{}, input.Raster(), [fill](const ArenaFrame*, const ArenaFrame& to) { return FillWith(fill, to); }};
 }
 
-constexpr Operation (*kOperations[])(Input&) = {Convert,       Rotate,    Composite,  CompositeToBlack,
-                                                CrossDissolve, AlphaGain, Accumulate, Fill};
+constexpr Operation (*kOperations[])(Input&) = {AnyConversion, AnyRotation, AnyComposite, AnyToBlack,
+                                                AnyDissolve,   AnyGain,     AnySum,       AnyFill};
 
 // A refusal depends on formats and arguments only, not on the buffers.
 VX_Result Verdict(const Operation& operation) {
