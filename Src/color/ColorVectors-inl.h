@@ -7,6 +7,7 @@
 #endif
 
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
 
 #include <hwy/highway.h>
@@ -31,14 +32,16 @@ struct RgbVectors {
   ColorVector r, g, b;
 };
 
-// A block of pixels, channel by channel. Blocks hold their pixels in the order that costs least to produce, the same in
-// all channels; only the way back to memory has to know it.
-constexpr size_t kBlockVectors = 16;
+// A block of pixels in whole vectors, all reds, then all greens, then all blues, so that what happens to each channel
+// alike is one loop. Blocks hold their pixels in the order that costs least to produce; only the way back to memory has
+// to know it.
 struct PixelBlock {
-  HWY_ALIGN float r[kBlockVectors * hn::MaxLanes(ColorTag())];
-  HWY_ALIGN float g[kBlockVectors * hn::MaxLanes(ColorTag())];
-  HWY_ALIGN float b[kBlockVectors * hn::MaxLanes(ColorTag())];
-  HWY_ALIGN float a[kBlockVectors * hn::MaxLanes(ColorTag())];
+  static constexpr size_t kVectors = 16;
+  static constexpr size_t kPixels = kVectors * hn::MaxLanes(ColorTag());
+  size_t pixels;
+  HWY_ALIGN float colors[3 * kPixels];
+  HWY_ALIGN float alpha[kPixels];
+  HWY_ALIGN float scratch[6 * kPixels];
 };
 
 #if HWY_TARGET == HWY_SCALAR
@@ -82,61 +85,115 @@ HWY_INLINE void StorePixels(ColorVector v0, ColorVector v1, ColorVector v2, Colo
 }
 #endif
 
-// One stage over whole vectors: from memory if it is the first, to memory if it is the last.
-template <bool kFirst, bool kLast, class Stage>
-HWY_INLINE void RunStage(const float* src, float* dst, PixelBlock& block, size_t vectors, const Stage& stage) {
+HWY_INLINE RgbVectors LoadColors(const PixelBlock& block, size_t i) {
   const ColorTag d;
-  const size_t lanes = hn::Lanes(d);
-  for (size_t i = 0; i < vectors * lanes; i += lanes) {
-    RgbVectors c;
-    ColorVector a;
-    if constexpr (kFirst) {
-      LoadPixels(src + 4 * i, c.b, c.g, c.r, a);
-      if constexpr (!kLast) hn::Store(a, d, block.a + i);
-    } else {
-      c = {hn::Load(d, block.r + i), hn::Load(d, block.g + i), hn::Load(d, block.b + i)};
-      if constexpr (kLast) a = hn::Load(d, block.a + i);
-    }
+  const float* from = block.colors + i;
+  return {hn::Load(d, from), hn::Load(d, from + block.pixels), hn::Load(d, from + 2 * block.pixels)};
+}
+HWY_INLINE void StoreColors(const RgbVectors& c, PixelBlock& block, size_t i) {
+  const ColorTag d;
+  float* to = block.colors + i;
+  hn::Store(c.r, d, to);
+  hn::Store(c.g, d, to + block.pixels);
+  hn::Store(c.b, d, to + 2 * block.pixels);
+}
+
+// stage(RgbVectors&) changes the colours of a block.
+template <class Stage>
+HWY_INLINE void ForEachColor(PixelBlock& block, const Stage& stage) {
+  const size_t lanes = hn::Lanes(ColorTag());
+  for (size_t i = 0; i < block.pixels; i += lanes) {
+    RgbVectors c = LoadColors(block, i);
     stage(c);
-    if constexpr (kLast) {
-      StorePixels(c.b, c.g, c.r, a, dst + 4 * i);
-    } else {
-      hn::Store(c.r, d, block.r + i);
-      hn::Store(c.g, d, block.g + i);
-      hn::Store(c.b, d, block.b + i);
-    }
+    StoreColors(c, block, i);
   }
 }
 
-template <bool kFirst, class Stage, class... Stages>
-HWY_INLINE void RunStages(const float* src, float* dst, PixelBlock& block, size_t vectors, const Stage& stage,
-                          const Stages&... stages) {
-  RunStage<kFirst, sizeof...(Stages) == 0>(src, dst, block, vectors, stage);
-  if constexpr (sizeof...(Stages) != 0) RunStages<false>(src, dst, block, vectors, stages...);
+// Asks for the pixels that stand one block further on: processors do not fetch them by themselves while a block is
+// worked on. Addresses past the pixels do no harm.
+HWY_INLINE void FetchNextBlock(const float* pixels) {
+  const auto address = reinterpret_cast<uintptr_t>(pixels) + PixelBlock::kPixels * 4 * sizeof(float);
+  for (size_t offset = 0; offset < 4 * sizeof(ColorVector); offset += 64)
+    __builtin_prefetch(reinterpret_cast<const void*>(address + offset));
 }
 
-// Calls the stages, each a change of RgbVectors&, one after the other on blocks that stay in the cache. A chain of
-// powers is cut into one stage per power: within a stage the vectors do not depend on each other, so that the long
-// latency of a power hides behind its neighbours. The last pixels go through the same code on a copy padded with zeros.
-template <class... Stages>
-HWY_INLINE void ForEachPixel(const float* src, float* dst, size_t count, const Stages&... stages) {
+HWY_INLINE void LoadBlock(const float* src, PixelBlock& block) {
+  const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
+  for (size_t i = 0; i < block.pixels; i += lanes) {
+    FetchNextBlock(src + 4 * i);
+    RgbVectors c;
+    ColorVector a;
+    LoadPixels(src + 4 * i, c.b, c.g, c.r, a);
+    StoreColors(c, block, i);
+    hn::Store(a, d, block.alpha + i);
+  }
+}
+HWY_INLINE void StoreBlock(const PixelBlock& block, float* dst) {
+  const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
+  for (size_t i = 0; i < block.pixels; i += lanes) {
+    FetchNextBlock(dst + 4 * i);
+    const RgbVectors c = LoadColors(block, i);
+    StorePixels(c.b, c.g, c.r, hn::Load(d, block.alpha + i), dst + 4 * i);
+  }
+}
+
+// Calls change(source, destination, pixels) for runs of whole vectors of pixels, at most `most`; the last pixels go
+// through the same code on a copy padded with zeros.
+template <class Change>
+HWY_INLINE void ForEachRun(const float* src, float* dst, size_t count, size_t most, const Change& change) {
   const size_t lanes = hn::Lanes(ColorTag());
-  PixelBlock block;
-  HWY_ALIGN float padded[4 * hn::MaxLanes(ColorTag())];
-  while (count != 0) {
-    const bool whole = count >= lanes;
-    const size_t vectors = whole ? HWY_MIN(count / lanes, kBlockVectors) : 1;
-    const size_t pixels = whole ? vectors * lanes : count;
-    if (!whole) {
-      std::memset(padded, 0, sizeof padded);
-      std::memcpy(padded, src, pixels * 4 * sizeof(float));
-    }
-    RunStages<true>(whole ? src : padded, whole ? dst : padded, block, vectors, stages...);
-    if (!whole) std::memcpy(dst, padded, pixels * 4 * sizeof(float));
+  while (count >= lanes) {
+    const size_t pixels = HWY_MIN(count / lanes * lanes, most);
+    change(src, dst, pixels);
     src += 4 * pixels;
     dst += 4 * pixels;
     count -= pixels;
   }
+  if (count != 0) {
+    HWY_ALIGN float padded[4 * hn::MaxLanes(ColorTag())] = {};
+    std::memcpy(padded, src, count * 4 * sizeof(float));
+    change(padded, padded, lanes);
+    std::memcpy(dst, padded, count * 4 * sizeof(float));
+  }
+}
+
+// change(PixelBlock&) for pixels in blocks that stay in the cache.
+template <class Change>
+HWY_INLINE void ForEachBlock(const float* src, float* dst, size_t count, const Change& change) {
+  PixelBlock block;
+  ForEachRun(src, dst, count, PixelBlock::kPixels, [&](const float* from, float* to, size_t pixels) VX_COLOR_STAGE {
+    block.pixels = pixels;
+    LoadBlock(from, block);
+    change(block);
+    StoreBlock(block, to);
+  });
+}
+
+// change(RgbVectors&) for pixels, in one pass.
+template <class Change>
+HWY_INLINE void ForEachPixel(const float* src, float* dst, size_t count, const Change& change) {
+  const size_t lanes = hn::Lanes(ColorTag());
+  ForEachRun(src, dst, count, SIZE_MAX, [&](const float* from, float* to, size_t pixels) VX_COLOR_STAGE {
+    for (size_t i = 0; i < pixels; i += lanes) {
+      RgbVectors c;
+      ColorVector a;
+      LoadPixels(from + 4 * i, c.b, c.g, c.r, a);
+      change(c);
+      StorePixels(c.b, c.g, c.r, a, to + 4 * i);
+    }
+  });
+}
+
+// Powers of all channels of a block, and the same between two changes of single values.
+template <PowerCore kCore>
+HWY_INLINE void SignedPowers(PixelBlock& block, const PowerExponent& y) {
+  SignedPowers<kCore>(block.colors, 3 * block.pixels, block.scratch, y);
+}
+template <PowerCore kCore, class Prepare, class Finish>
+HWY_INLINE void Powers(PixelBlock& block, const PowerExponent& y, const Prepare& prepare, const Finish& finish) {
+  Powers<kCore>(block.colors, 3 * block.pixels, block.scratch, y, prepare, finish);
 }
 
 // A matrix spread over vectors once per call.

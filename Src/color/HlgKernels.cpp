@@ -26,53 +26,74 @@ HWY_INLINE ColorVector HlgLuma(const RgbVectors& c) {
   return Luma(c, weights);
 }
 
+// A power of the luma of all pixels of a block, into `gain`.
+template <class Finish>
+HWY_INLINE void GainOfLuma(PixelBlock& block, const PowerExponent& y, float* gain, const Finish& finish) {
+  const ColorTag d;
+  for (size_t i = 0; i < block.pixels; i += hn::Lanes(d)) {
+    const RgbVectors c = LoadColors(block, i);
+    hn::Store(HlgLuma({hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)}), d, gain + i);
+  }
+  Powers<PowerCore::Float>(
+      gain, block.pixels, block.scratch, y, [](ColorVector v) VX_COLOR_STAGE { return v; }, finish);
+}
+
+// Multiplies the colours of a block by its gains.
+HWY_INLINE void ApplyGain(PixelBlock& block, const float* gain) {
+  const ColorTag d;
+  for (size_t i = 0; i < block.pixels; i += hn::Lanes(d)) {
+    const RgbVectors c = LoadColors(block, i);
+    const auto factor = hn::Load(d, gain + i);
+    StoreColors({hn::Mul(c.r, factor), hn::Mul(c.g, factor), hn::Mul(c.b, factor)}, block, i);
+  }
+}
+
 void Rec709ToHlg(const float* src, float* dst, size_t count, const HlgJob& job) {
   const MatrixVectors matrix(job.matrix);
-  ForEachPixel(
-      src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE { SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4); },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        matrix(c);
-        const RgbVectors linear = c;
-        const auto scene = [&](ColorVector v) HWY_ATTR { return hn::Mul(hn::Abs(v), hn::Set(d, 0.1f)); };
-        c = {scene(c.r), scene(c.g), scene(c.b)};
-        const auto gain = hn::Max(Power<PowerCore::Float>(HlgLuma(c), kHlgInverseGamma), hn::Set(d, kHlgLeastGain));
-        const auto inverse = hn::Div(hn::Set(d, 1.0f), gain);
-        c = {WithSignOf(hn::Mul(c.r, inverse), linear.r), WithSignOf(hn::Mul(c.g, inverse), linear.g),
-             WithSignOf(hn::Mul(c.b, inverse), linear.b)};
-      },
-      [](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        const RgbVectors in = c;
-        const auto shifted = [&](ColorVector v) HWY_ATTR { return hn::Sub(hn::Abs(v), hn::Set(d, kHlgB)); };
-        c = {shifted(c.r), shifted(c.g), shifted(c.b)};
-        Log3(c.r, c.g, c.b);
-        const auto join = [&](ColorVector log, ColorVector v) HWY_ATTR {
+  const ColorTag d;
+  HWY_ALIGN float gain[PixelBlock::kPixels];
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowers<PowerCore::Float>(block, kPower2_4);
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      matrix(c);
+      const auto scale = hn::Set(d, 0.1f);
+      c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
+    });
+    GainOfLuma(block, kHlgInverseGamma, gain, [&](ColorVector power, ColorVector) VX_COLOR_STAGE {
+      return hn::Div(hn::Set(d, 1.0f), hn::Max(power, hn::Set(d, kHlgLeastGain)));
+    });
+    ApplyGain(block, gain);
+    Logs(
+        block.colors, 3 * block.pixels, block.scratch,
+        // Below the threshold the logarithm does not count; held at a positive number it costs no detour. NaN stays.
+        [&](ColorVector v) VX_COLOR_STAGE {
+          return hn::Max(hn::Set(d, 0.5f * kHlgThreshold), hn::Sub(hn::Abs(v), hn::Set(d, kHlgB)));
+        },
+        [&](ColorVector log, ColorVector v) VX_COLOR_STAGE {
           const auto e = hn::Abs(v);
           const auto root = hn::Sqrt(hn::Mul(e, hn::Set(d, 3.0f)));
           const auto curve = hn::Add(hn::Mul(log, hn::Set(d, kHlgA)), hn::Set(d, kHlgC));
           return WithSignOf(hn::IfThenElse(hn::Lt(e, hn::Set(d, kHlgThreshold)), root, curve), v);
-        };
-        c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
-      });
+        });
+  });
 }
 
 void HlgToRec709(const float* src, float* dst, size_t count, const HlgJob& job) {
   const HlgJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixel(
-      src, dst, count,
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        c = {LookupUnit(c.r, local.table, kHlgTableSize), LookupUnit(c.g, local.table, kHlgTableSize),
-             LookupUnit(c.b, local.table, kHlgTableSize)};
-        const auto gain = hn::Mul(Power<PowerCore::Float>(HlgLuma(c), kHlgSystemGamma), hn::Set(d, 10.0f));
-        c = {hn::Mul(c.r, gain), hn::Mul(c.g, gain), hn::Mul(c.b, gain)};
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        matrix(c);
-        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
-      });
+  const ColorTag d;
+  HWY_ALIGN float gain[PixelBlock::kPixels];
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      c = {LookupUnit(c.r, local.table, kHlgTableSize), LookupUnit(c.g, local.table, kHlgTableSize),
+           LookupUnit(c.b, local.table, kHlgTableSize)};
+    });
+    GainOfLuma(block, kHlgSystemGamma, gain,
+               [&](ColorVector power, ColorVector) VX_COLOR_STAGE { return hn::Mul(power, hn::Set(d, 10.0f)); });
+    ApplyGain(block, gain);
+    ForEachColor(block, matrix);
+    SignedPowers<PowerCore::Float>(block, kPower1Over2_4);
+  });
 }
 
 }  // namespace HWY_NAMESPACE

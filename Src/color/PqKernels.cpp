@@ -18,42 +18,49 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
+HWY_INLINE ColorVector PqEncodingRatio(ColorVector v) {
+  const ColorTag d;
+  const auto y = hn::Abs(v);
+  return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
+                 hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
+}
+
+HWY_INLINE ColorVector PqDecodingRatio(ColorVector v) {
+  const ColorTag d;
+  const auto e = hn::Abs(v);
+  const auto below = hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)));
+  return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), below), hn::Zero(d));
+}
+
 void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixel(
-      src, dst, count, [](RgbVectors& c) VX_COLOR_STAGE { SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower2_4); },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        matrix(c);
-        const auto scale = hn::Set(d, 0.01f);
-        c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
-        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPqM1);
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        const RgbVectors in = c;
-        const auto ratio = [&](ColorVector v) HWY_ATTR {
-          const auto y = hn::Abs(v);
-          return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
-                         hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
-        };
-        c = {ratio(c.r), ratio(c.g), ratio(c.b)};
-        Power3<PowerCore::Long>(c.r, c.g, c.b, kPqM2);
-        const auto scale = hn::Set(d, local.scale);
-        c = {WithSignOf(hn::Mul(c.r, scale), in.r), WithSignOf(hn::Mul(c.g, scale), in.g),
-             WithSignOf(hn::Mul(c.b, scale), in.b)};
-      });
+  const ColorTag d;
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowers<PowerCore::Float>(block, kPower2_4);
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      matrix(c);
+      const auto scale = hn::Set(d, 0.01f);
+      c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
+    });
+    SignedPowers<PowerCore::Float>(block, kPqM1);
+    Powers<PowerCore::Long>(
+        block, kPqM2, [](ColorVector v) VX_COLOR_STAGE { return PqEncodingRatio(v); },
+        [&](ColorVector power, ColorVector v)
+            VX_COLOR_STAGE { return WithSignOf(hn::Mul(power, hn::Set(d, local.scale)), v); });
+  });
 }
 
 void PqTableToRec709(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixel(src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE {
-    c = {LookupUnit(c.r, local.table, kPqTableSize), LookupUnit(c.g, local.table, kPqTableSize),
-         LookupUnit(c.b, local.table, kPqTableSize)};
-    matrix(c);
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      c = {LookupUnit(c.r, local.table, kPqTableSize), LookupUnit(c.g, local.table, kPqTableSize),
+           LookupUnit(c.b, local.table, kPqTableSize)};
+      matrix(c);
+    });
+    SignedPowers<PowerCore::Float>(block, kPower1Over2_4);
   });
 }
 
@@ -61,33 +68,19 @@ template <bool kCompressed>
 HWY_INLINE void PqToRec709Loop(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  ForEachPixel(
-      src, dst, count,
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        const auto scale = hn::Set(d, local.scale);
-        c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
-        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPqInverseM2);
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        const RgbVectors in = c;
-        const auto ratio = [&](ColorVector v) HWY_ATTR {
-          const auto e = hn::Abs(v);
-          const auto below = hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)));
-          return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), below), hn::Zero(d));
-        };
-        c = {ratio(c.r), ratio(c.g), ratio(c.b)};
-        Power3<PowerCore::Long>(c.r, c.g, c.b, kPqInverseM1);
-        const auto light = [&](ColorVector v, ColorVector signal)
-                               HWY_ATTR { return WithSignOf(hn::Mul(v, hn::Set(d, 100.0f)), signal); };
-        c = {light(c.r, in.r), light(c.g, in.g), light(c.b, in.b)};
-        if (local.applyMatrix) matrix(c);
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        SignedPower3<PowerCore::Float>(c.r, c.g, c.b, kPower1Over2_4);
-        if constexpr (kCompressed) CompressGamut(c, local.luma);
-      });
+  const ColorTag d;
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    Powers<PowerCore::Float>(
+        block, kPqInverseM2, [&](ColorVector v) VX_COLOR_STAGE { return hn::Abs(hn::Mul(v, hn::Set(d, local.scale))); },
+        [](ColorVector power, ColorVector v) VX_COLOR_STAGE { return WithSignOf(power, v); });
+    Powers<PowerCore::Long>(
+        block, kPqInverseM1, [](ColorVector v) VX_COLOR_STAGE { return PqDecodingRatio(v); },
+        [&](ColorVector power, ColorVector v)
+            VX_COLOR_STAGE { return WithSignOf(hn::Mul(power, hn::Set(d, 100.0f)), v); });
+    if (local.applyMatrix) ForEachColor(block, matrix);
+    SignedPowers<PowerCore::Float>(block, kPower1Over2_4);
+    if constexpr (kCompressed) ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE { CompressGamut(c, local.luma); });
+  });
 }
 
 void PqToRec709(const float* src, float* dst, size_t count, const PqJob& job) {

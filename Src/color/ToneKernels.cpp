@@ -26,34 +26,29 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-HWY_INLINE void DecodeTones(RgbVectors& c, const ToneCurve& curve) {
+HWY_INLINE void DecodeTones(PixelBlock& block, const ToneCurve& curve) {
   const ColorTag d;
-  const RgbVectors in = c;
-  const auto base = [&](ColorVector v) HWY_ATTR {
-    return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, curve.offset)), hn::Set(d, curve.scale));
-  };
-  c = {base(c.r), base(c.g), base(c.b)};
-  Power3<PowerCore::Float>(c.r, c.g, c.b, curve.exponent);
-  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
-    const auto magnitude = hn::Abs(v);
-    const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
-    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), power, straight), v);
-  };
-  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+  Powers<PowerCore::Float>(
+      block, curve.exponent,
+      [&](ColorVector v)
+          VX_COLOR_STAGE { return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, curve.offset)), hn::Set(d, curve.scale)); },
+      [&](ColorVector power, ColorVector v) VX_COLOR_STAGE {
+        const auto magnitude = hn::Abs(v);
+        const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
+        return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), power, straight), v);
+      });
 }
 
-HWY_INLINE void EncodeTones(RgbVectors& c, const ToneCurve& curve) {
+HWY_INLINE void EncodeTones(PixelBlock& block, const ToneCurve& curve) {
   const ColorTag d;
-  const RgbVectors in = c;
-  c = {hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)};
-  Power3<PowerCore::Float>(c.r, c.g, c.b, curve.exponent);
-  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
-    const auto magnitude = hn::Abs(v);
-    const auto curved = hn::Add(hn::Mul(power, hn::Set(d, curve.scale)), hn::Set(d, curve.offset));
-    const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
-    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), curved, straight), v);
-  };
-  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+  Powers<PowerCore::Float>(
+      block, curve.exponent, [](ColorVector v) VX_COLOR_STAGE { return hn::Abs(v); },
+      [&](ColorVector power, ColorVector v) VX_COLOR_STAGE {
+        const auto magnitude = hn::Abs(v);
+        const auto curved = hn::Add(hn::Mul(power, hn::Set(d, curve.scale)), hn::Set(d, curve.offset));
+        const auto straight = hn::Mul(magnitude, hn::Set(d, curve.slope));
+        return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, curve.threshold)), curved, straight), v);
+      });
 }
 
 // The first half of the luminance curve: luminance to its place t on the curve, 0 at mid-tones, +-1 at the ends.
@@ -78,28 +73,29 @@ HWY_INLINE ColorVector BendCurve(ColorVector t, const ToneJob& job) {
 void CompressTones(const float* src, float* dst, size_t count, const ToneJob& job) {
   const ToneJob local = job;
   const MatrixVectors toXyz(local.toXyz), fromXyz(local.fromXyz);
-  ForEachPixel(
-      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { DecodeTones(c, local.decode); },
-      [&](RgbVectors& c) VX_COLOR_STAGE {  // From here x, t, y stand for red, green, blue.
-        const ColorTag d;
-        toXyz(c);
-        const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
-        const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
-        c = {hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX)), CurvePlace(c.g, local),
-             hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY))};
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE { c.g = BendCurve(c.g, local); },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        const ColorTag d;
-        const auto one = hn::Set(d, 1.0f);
-        const auto x = c.r, y = c.b;
-        // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
-        const auto luminance = hn::Mul(hn::Sub(Exp10(hn::Add(c.g, one)), one), hn::Set(d, kLogRange));
-        const auto z = hn::Sub(hn::Sub(one, x), y);
-        c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
-        fromXyz(c);
-      },
-      [&](RgbVectors& c) VX_COLOR_STAGE { EncodeTones(c, local.encode); });
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    DecodeTones(block, local.decode);
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {  // From here x, t, y stand for red, green, blue.
+      const ColorTag d;
+      toXyz(c);
+      const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
+      const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
+      c = {hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX)), CurvePlace(c.g, local),
+           hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY))};
+    });
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE { c.g = BendCurve(c.g, local); });
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      const ColorTag d;
+      const auto one = hn::Set(d, 1.0f);
+      const auto x = c.r, y = c.b;
+      // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
+      const auto luminance = hn::Mul(hn::Sub(Exp10(hn::Add(c.g, one)), one), hn::Set(d, kLogRange));
+      const auto z = hn::Sub(hn::Sub(one, x), y);
+      c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
+      fromXyz(c);
+    });
+    EncodeTones(block, local.encode);
+  });
 }
 
 }  // namespace HWY_NAMESPACE

@@ -27,13 +27,13 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-// kFloat: both exponents have the float core, as all usual ones; otherwise each vector asks.
+// kFloat: both exponents have the float core, as all usual ones; otherwise each block asks.
 template <bool kFloat>
-HWY_INLINE void SignedPowerRgb(RgbVectors& c, const PowerExponent& y) {
+HWY_INLINE void SignedPowersOf(PixelBlock& block, const PowerExponent& y) {
   if constexpr (kFloat) {
-    SignedPower3<PowerCore::Float>(c.r, c.g, c.b, y);
+    SignedPowers<PowerCore::Float>(block, y);
   } else {
-    SignedPower3Any(c.r, c.g, c.b, y);
+    SignedPowersAny(block.colors, 3 * block.pixels, block.scratch, y);
   }
 }
 
@@ -41,13 +41,16 @@ template <bool kFloat, GamutStep kStep>
 void PowerToPowerLoop(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;  // Nobody else's pointer reaches it, so constants stay in registers.
   const MatrixVectors matrix(local.matrix);
-  ForEachPixel(
-      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<kFloat>(c, local.decode); },
-      [&](RgbVectors& c) VX_COLOR_STAGE {
-        if constexpr (kStep != GamutStep::None) matrix(c);
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowersOf<kFloat>(block, local.decode);
+    if constexpr (kStep != GamutStep::None) {
+      ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+        matrix(c);
         if constexpr (kStep == GamutStep::MatrixAndCompression) CompressGamut(c, local.luma);
-        SignedPowerRgb<kFloat>(c, local.encode);
       });
+    }
+    SignedPowersOf<kFloat>(block, local.encode);
+  });
 }
 
 #define VX_POWER_TO_POWER(name, usual, step)                                      \
@@ -62,48 +65,46 @@ VX_POWER_TO_POWER(AnyPowerMatrix, false, GamutStep::Matrix)
 VX_POWER_TO_POWER(AnyPowerCompressed, false, GamutStep::MatrixAndCompression)
 #undef VX_POWER_TO_POWER
 
-HWY_INLINE void EncodeSrgb(RgbVectors& c, const PowerExponent& exponent) {
+HWY_INLINE void EncodeSrgb(PixelBlock& block, const PowerExponent& exponent) {
   const ColorTag d;
-  const RgbVectors linear = c;
-  c = {hn::Abs(c.r), hn::Abs(c.g), hn::Abs(c.b)};
-  Power3<PowerCore::Float>(c.r, c.g, c.b, exponent);
-  const auto join = [&](ColorVector power, ColorVector in) HWY_ATTR {
-    const auto magnitude = hn::Abs(in);
-    const auto curve = hn::Sub(hn::Mul(power, hn::Set(d, kSrgbEncodeScale)), hn::Set(d, kSrgbOffset));
-    const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbEncodeSlope));
-    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbEncodeThreshold)), curve, straight), in);
-  };
-  c = {join(c.r, linear.r), join(c.g, linear.g), join(c.b, linear.b)};
+  Powers<PowerCore::Float>(
+      block, exponent, [](ColorVector v) VX_COLOR_STAGE { return hn::Abs(v); },
+      [&](ColorVector power, ColorVector v) VX_COLOR_STAGE {
+        const auto magnitude = hn::Abs(v);
+        const auto curve = hn::Sub(hn::Mul(power, hn::Set(d, kSrgbEncodeScale)), hn::Set(d, kSrgbOffset));
+        const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbEncodeSlope));
+        return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbEncodeThreshold)), curve, straight), v);
+      });
 }
 
-HWY_INLINE void DecodeSrgb(RgbVectors& c, const PowerExponent& exponent) {
+HWY_INLINE void DecodeSrgb(PixelBlock& block, const PowerExponent& exponent) {
   const ColorTag d;
-  const RgbVectors in = c;
-  const auto base = [&](ColorVector v) HWY_ATTR {
-    return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, kSrgbOffset)), hn::Set(d, kSrgbDecodeScale));
-  };
-  c = {base(c.r), base(c.g), base(c.b)};
-  Power3<PowerCore::Float>(c.r, c.g, c.b, exponent);
-  const auto join = [&](ColorVector power, ColorVector v) HWY_ATTR {
-    const auto magnitude = hn::Abs(v);
-    const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbDecodeSlope));
-    return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbDecodeThreshold)), power, straight), v);
-  };
-  c = {join(c.r, in.r), join(c.g, in.g), join(c.b, in.b)};
+  Powers<PowerCore::Float>(
+      block, exponent,
+      [&](ColorVector v) VX_COLOR_STAGE {
+        return hn::Mul(hn::Add(hn::Abs(v), hn::Set(d, kSrgbOffset)), hn::Set(d, kSrgbDecodeScale));
+      },
+      [&](ColorVector power, ColorVector v) VX_COLOR_STAGE {
+        const auto magnitude = hn::Abs(v);
+        const auto straight = hn::Mul(magnitude, hn::Set(d, kSrgbDecodeSlope));
+        return WithSignOf(hn::IfThenElse(hn::Gt(magnitude, hn::Set(d, kSrgbDecodeThreshold)), power, straight), v);
+      });
 }
 
 void PowerToSrgb(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;
-  ForEachPixel(
-      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<true>(c, local.decode); },
-      [&](RgbVectors& c) VX_COLOR_STAGE { EncodeSrgb(c, local.encode); });
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowers<PowerCore::Float>(block, local.decode);
+    EncodeSrgb(block, local.encode);
+  });
 }
 
 void SrgbToPower(const float* src, float* dst, size_t count, const TransferJob& job) {
   const TransferJob local = job;
-  ForEachPixel(
-      src, dst, count, [&](RgbVectors& c) VX_COLOR_STAGE { DecodeSrgb(c, local.decode); },
-      [&](RgbVectors& c) VX_COLOR_STAGE { SignedPowerRgb<true>(c, local.encode); });
+  ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    DecodeSrgb(block, local.decode);
+    SignedPowers<PowerCore::Float>(block, local.encode);
+  });
 }
 
 }  // namespace HWY_NAMESPACE

@@ -51,49 +51,63 @@ void RgbToYuv2020(const float* src, float* dst, size_t count) {
   });
 }
 
+// The lanes of one value per pixel pair that the pixels of a vector take, in the order of StorePixels, from the first
+// (kHalf 0) or the second half of the pairs.
+template <int kHalf>
+HWY_INLINE auto PairLanes() {
+  const ColorTag d;
+  constexpr size_t kLanes = hn::MaxLanes(ColorTag()), kBlocks = HWY_MAX(kLanes / 4, 1);
+  HWY_ALIGN int32_t lanes[kLanes];
+  for (size_t i = 0; i < kLanes; ++i)
+    lanes[i] = static_cast<int32_t>((kHalf * kLanes + i % 4 * kBlocks + i / 4) / 2 % kLanes);
+  return hn::SetTableIndices(d, lanes);
+}
+HWY_INLINE auto PixelLanes() {
+  const hn::RebindToSigned<ColorTag> di;
+  constexpr size_t kLanes = hn::MaxLanes(ColorTag()), kBlocks = HWY_MAX(kLanes / 4, 1);
+  HWY_ALIGN int32_t lanes[kLanes];
+  for (size_t i = 0; i < kLanes; ++i) lanes[i] = static_cast<int32_t>((i % 4 * kBlocks + i / 4) % kLanes);
+  return hn::SetTableIndices(di, lanes);
+}
+
 void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, size_t count) {
   const ColorTag d;
   const hn::RebindToSigned<ColorTag> di;
-  const size_t lanes = hn::Lanes(d);
-  if constexpr (hn::MaxLanes(ColorTag()) >= 2) {
-    const hn::Rebind<uint16_t, ColorTag> d16;
-    const hn::Half<hn::RebindToUnsigned<ColorTag>> pairs;
-    const hn::Repartition<uint64_t, ColorTag> d64;
-    HWY_ALIGN uint16_t lumaBlock[hn::MaxLanes(ColorTag())], chromaBlock[hn::MaxLanes(ColorTag())];
-    HWY_ALIGN float rgbBlock[4 * hn::MaxLanes(ColorTag())];
-    for (size_t i = 0; i < count; i += lanes) {
-      const uint16_t *fromLuma = luma + i, *fromChroma = chroma + i;
-      float* to = dst + 4 * i;
-      const size_t rest = count - i;
-      if (HWY_UNLIKELY(rest < lanes)) {
-        std::memset(lumaBlock, 0, sizeof lumaBlock);
-        std::memset(chromaBlock, 0, sizeof chromaBlock);
-        std::memcpy(lumaBlock, fromLuma, rest * sizeof(uint16_t));
-        std::memcpy(chromaBlock, fromChroma, rest * sizeof(uint16_t));
-        fromLuma = lumaBlock;
-        fromChroma = chromaBlock;
-        to = rgbBlock;
-      }
-      // A pair U, V is the low and high half of 32 bits; each goes to both pixels.
-      const auto uv = hn::BitCast(pairs, hn::LoadU(d16, fromChroma));
-      const auto twice = [&](hn::Vec<decltype(pairs)> v) HWY_ATTR {
-        const auto wide = hn::PromoteTo(d64, v);
-        return hn::BitCast(di, hn::Or(wide, hn::ShiftLeft<32>(wide)));
-      };
-      const auto chromaOf = [&](hn::Vec<decltype(di)> code) HWY_ATTR {
-        const auto value =
-            hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Neutral))), hn::Set(d, kP010ChromaRange));
-        return hn::Min(hn::Max(value, hn::Set(d, -0.5f)), hn::Set(d, 0.5f));
-      };
-      const auto cb = chromaOf(twice(hn::And(uv, hn::Set(pairs, 0xffff))));
-      const auto cr = chromaOf(twice(hn::ShiftRight<16>(uv)));
-      const auto code = hn::PromoteTo(di, hn::LoadU(d16, fromLuma));
-      const auto y = hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Black))), hn::Set(d, kP010LumaRange));
-      const auto one = hn::Set(d, 1.0f);
-      const RgbVectors c = FromYuv(hn::Min(hn::Max(y, hn::Zero(d)), one), cb, cr);
-      hn::StoreInterleaved4(c.b, c.g, c.r, one, d, to);
-      if (HWY_UNLIKELY(rest < lanes)) std::memcpy(dst + 4 * i, rgbBlock, rest * 4 * sizeof(float));
-    }
+  const hn::Rebind<uint16_t, ColorTag> d16;
+  const hn::RebindToUnsigned<ColorTag> pairs;
+  constexpr size_t kLanes = hn::MaxLanes(ColorTag());
+  const auto firstPairs = PairLanes<0>(), secondPairs = PairLanes<1>();
+  const auto order = PixelLanes();
+  const auto chromaOf = [&](hn::Vec<decltype(pairs)> code) HWY_ATTR {
+    const auto value = hn::Div(hn::ConvertTo(d, hn::Sub(hn::BitCast(di, code), hn::Set(di, kP010Neutral))),
+                               hn::Set(d, kP010ChromaRange));
+    return hn::Min(hn::Max(value, hn::Set(d, -0.5f)), hn::Set(d, 0.5f));
+  };
+  const auto half = [&](const uint16_t* from, ColorVector cb, ColorVector cr, float* to) HWY_ATTR {
+    const auto code = hn::TableLookupLanes(hn::PromoteTo(di, hn::LoadU(d16, from)), order);
+    const auto y = hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Black))), hn::Set(d, kP010LumaRange));
+    const auto one = hn::Set(d, 1.0f);
+    const RgbVectors c = FromYuv(hn::Min(hn::Max(y, hn::Zero(d)), one), cb, cr);
+    StorePixels(c.b, c.g, c.r, one, to);
+  };
+  const auto body = [&](const uint16_t* fromLuma, const uint16_t* fromChroma, float* to) HWY_ATTR {
+    // A pair U, V is the low and high half of 32 bits.
+    const auto uv = hn::LoadU(pairs, reinterpret_cast<const uint32_t*>(fromChroma));
+    const auto cb = chromaOf(hn::And(uv, hn::Set(pairs, 0xffff)));
+    const auto cr = chromaOf(hn::ShiftRight<16>(uv));
+    half(fromLuma, hn::TableLookupLanes(cb, firstPairs), hn::TableLookupLanes(cr, firstPairs), to);
+    half(fromLuma + kLanes, hn::TableLookupLanes(cb, secondPairs), hn::TableLookupLanes(cr, secondPairs),
+         to + 4 * kLanes);
+  };
+  size_t i = 0;
+  for (; i + 2 * kLanes <= count; i += 2 * kLanes) body(luma + i, chroma + i, dst + 4 * i);
+  if (const size_t rest = count - i) {
+    HWY_ALIGN uint16_t lumaBlock[2 * kLanes] = {}, chromaBlock[2 * kLanes] = {};
+    HWY_ALIGN float rgbBlock[8 * kLanes];
+    std::memcpy(lumaBlock, luma + i, rest * sizeof(uint16_t));
+    std::memcpy(chromaBlock, chroma + i, rest * sizeof(uint16_t));
+    body(lumaBlock, chromaBlock, rgbBlock);
+    std::memcpy(dst + 4 * i, rgbBlock, rest * 4 * sizeof(float));
   }
 }
 

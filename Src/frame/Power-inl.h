@@ -20,6 +20,10 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
+#ifndef VX_POWER_STEP
+#define VX_POWER_STEP HWY_ATTR __attribute__((always_inline))
+#endif
+
 #if HWY_TARGET == HWY_SCALAR  // Compiled by foreach_target as the baseline, never chosen.
 
 namespace power_detail {
@@ -36,14 +40,28 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
   b = Power1<kCore, kSigned>(b, y);
   c = Power1<kCore, kSigned>(c, y);
 }
+template <PowerCore kCore, bool kSigned, class Prepare, class Finish>
+HWY_INLINE void PowerLoops(float* values, size_t count, float*, const PowerExponent& y, const Prepare& prepare,
+                           const Finish& finish) {
+  for (size_t i = 0; i < count; ++i)
+    values[i] = finish(Power1<kCore, false>(prepare(V(values[i])), y), V(values[i])).raw;
+}
+template <class Prepare, class Finish>
+HWY_INLINE void LogLoops(float* values, size_t count, float*, const vexel::power::ScaledLog2&, const Prepare& prepare,
+                         const Finish& finish) {
+  for (size_t i = 0; i < count; ++i) values[i] = finish(V(vexel::Log(prepare(V(values[i])).raw)), V(values[i])).raw;
+}
+template <bool kSigned>
+HWY_INLINE V Magnitude(V x) {
+  return kSigned ? hn::Abs(x) : x;
+}
+template <bool kSigned>
+HWY_INLINE V WithSign(V power, V x) {
+  return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(hn::ScalableTag<float>()))) : power;
+}
 }  // namespace power_detail
 HWY_INLINE power_detail::V Log(power_detail::V x) { return power_detail::V(vexel::Log(x.raw)); }
 HWY_INLINE power_detail::V Log10(power_detail::V x) { return power_detail::V(vexel::Log10(x.raw)); }
-HWY_INLINE void Log3(power_detail::V& a, power_detail::V& b, power_detail::V& c) {
-  a = Log(a);
-  b = Log(b);
-  c = Log(c);
-}
 HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::V(vexel::Exp(x.raw)); }
 HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::V(vexel::Exp10(x.raw)); }
 
@@ -85,10 +103,6 @@ HWY_INLINE hn::Vec<hn::ScalableTag<float>> LookupEighth(const float* table, cons
   const auto high = hn::TableLookupBytesOr0(hn::BitCast(d8, hn::Load(d, table + 4)), index.high);
   return hn::BitCast(d, hn::Or(low, high));
 }
-#endif
-
-#ifndef VX_POWER_STEP
-#define VX_POWER_STEP HWY_ATTR __attribute__((always_inline))
 #endif
 
 namespace power_detail {
@@ -212,42 +226,56 @@ HWY_INLINE Bundle<N> Linear(float factor, const float* offsets, const Bundle<N>&
       eighths);
 }
 
+// c[0] + v * c[1] + v^2 * c[2] + v^3 * c[3].
+HWY_INLINE V Cubic(V v, V square, const float* c) {
+  const D d;
+  const V low = hn::Add(hn::Set(d, c[0]), hn::Mul(v, hn::Set(d, c[1])));
+  const V high = hn::Add(hn::Set(d, c[2]), hn::Mul(v, hn::Set(d, c[3])));
+  return hn::Add(low, hn::Mul(square, high));
+}
+
 // start + w^2 * series(w).
 template <size_t N>
 HWY_INLINE Bundle<N> Curve(const Bundle<N>& start, const Bundle<N>& w, const vexel::power::ScaledLog2& log) {
-  const D d;
-  auto s = Map<N>(
-      [&](V v) VX_POWER_STEP { return hn::Add(hn::Mul(v, hn::Set(d, log.series[3])), hn::Set(d, log.series[2])); }, w);
-  s = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), hn::Set(d, log.series[1])); }, w, s);
-  s = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), hn::Set(d, log.series[0])); }, w, s);
-  return Map<N>([&](V a, V v, V p) VX_POWER_STEP { return hn::Add(a, hn::Mul(hn::Mul(v, v), p)); }, start, w, s);
+  return Map<N>(
+      [&](V a, V v) VX_POWER_STEP {
+        const V square = hn::Mul(v, v);
+        return hn::Add(a, hn::Mul(square, Cubic(v, square, log.series)));
+      },
+      start, w);
 }
 
-// scale * log2(x) as a sum; the float form has no middle term.
-template <bool kAll, size_t N>
-HWY_INLINE void FloatLog(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& large, Bundle<N>& small) {
+// A power goes in three thirds, which loops over many vectors take one after the other. The first: x to eighths of an
+// octave and its place in the segment, in the float form already multiplied by the slope.
+template <bool kAll, PowerCore kCore, size_t N>
+HWY_INLINE void PlaceOf(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& eighths, Bundle<N>& place) {
   const auto bits = SegmentBits<kAll>(x);
-  const auto eighths = EighthsOf(bits);
-  const auto fraction = FractionOf(bits, eighths);
-  auto w =
-      Map<N>([&](V r, V k)
-                 VX_POWER_STEP { return hn::Mul(r, LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(DI(), k)))); },
-             fraction, eighths);
+  eighths = EighthsOf(bits);
+  place = FractionOf(bits, eighths);
+  if constexpr (kCore == PowerCore::Float) {
+    place = Map<N>(
+        [&](V r, V k)
+            VX_POWER_STEP { return hn::Mul(r, LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(DI(), k)))); },
+        place, eighths);
+  }
+}
+
+// scale * log2(x) - shift as a sum, large + small.
+template <size_t N>
+HWY_INLINE void FloatLog(const Bundle<N>& eighths, const Bundle<N>& w, const vexel::power::ScaledLog2& log,
+                         Bundle<N>& large, Bundle<N>& small) {
   large = Linear(log.eighthHigh, nullptr, eighths);
   auto offset = Linear(log.eighthLow, log.offsets, eighths);
-  EndStep<N>(w, large, offset);
+  EndStep<N>(large, offset);
   const auto curve = Curve(w, w, log);
   small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
 }
 
-template <bool kAll, size_t N>
-HWY_INLINE void LongLog(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& large, Bundle<N>& middle,
-                        Bundle<N>& small) {
+template <size_t N>
+HWY_INLINE void LongLog(const Bundle<N>& eighths, const Bundle<N>& fraction, const vexel::power::ScaledLog2& log,
+                        Bundle<N>& large, Bundle<N>& middle, Bundle<N>& small) {
   const DI di;
   const V mask = hn::BitCast(D(), hn::Set(di, static_cast<int32_t>(0xfffff000)));
-  const auto bits = SegmentBits<kAll>(x);
-  const auto eighths = EighthsOf(bits);
-  const auto fraction = FractionOf(bits, eighths);
   middle = Map<N>(
       [&](V r, V k) VX_POWER_STEP {
         return hn::Mul(hn::And(r, mask), LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(di, k))));
@@ -268,20 +296,40 @@ HWY_INLINE void LongLog(const Bundle<N>& x, const vexel::power::ScaledLog2& log,
   small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
 }
 
-// 2^(n / 8 + f); `count` is n / 8 + kEighthsMagic, |f| at most 1/16. kAll: results that overflow or are denormal too.
+// A sum as n / 8 + f, |f| at most 1/16; `count` is n / 8 + kEighthsMagic.
+template <size_t N>
+HWY_INLINE void CountEighths(const Bundle<N>& large, const Bundle<N>& small, Bundle<N>& count, Bundle<N>& f) {
+  const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
+  count = Map<N>([&](V a, V c) VX_POWER_STEP { return hn::Add(hn::Add(a, c), magic); }, large, small);
+  f = Map<N>([&](V a, V n, V c) VX_POWER_STEP { return hn::Add(hn::Sub(a, hn::Sub(n, magic)), c); }, large, count,
+             small);
+}
+
+// The second third of a power: its logarithm, counted in eighths.
+template <PowerCore kCore, size_t N>
+HWY_INLINE void ExponentOf(const Bundle<N>& eighths, const Bundle<N>& place, const vexel::power::ScaledLog2& log,
+                           Bundle<N>& count, Bundle<N>& f) {
+  Bundle<N> large, small;
+  if constexpr (kCore == PowerCore::Float) {
+    FloatLog(eighths, place, log, large, small);
+    CountEighths(large, small, count, f);
+  } else {
+    Bundle<N> middle;
+    LongLog(eighths, place, log, large, middle, small);
+    const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
+    count = Map<N>([&](V a, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Add(a, b), c), magic); }, large,
+                   middle, small);
+    f = Map<N>([&](V a, V n, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Sub(a, hn::Sub(n, magic)), b), c); },
+               large, count, middle, small);
+  }
+}
+
+// The last third: 2^(n / 8 + f + kRootShift). kAll: results that overflow or are denormal too.
 template <bool kAll, size_t N>
 HWY_INLINE Bundle<N> Exp2Of(const Bundle<N>& count, const Bundle<N>& f) {
   const D d;
   const DI di;
-  const auto coefficient = [&](int i) VX_POWER_STEP { return hn::Set(d, vexel::power::kExp2[i]); };
-  auto series = Map<N>([&](V v) VX_POWER_STEP { return hn::Add(hn::Mul(v, coefficient(3)), coefficient(2)); }, f);
-  series = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), coefficient(1)); }, f, series);
-  series = Map<N>([&](V v, V p) VX_POWER_STEP { return hn::Add(hn::Mul(v, p), coefficient(0)); }, f, series);
-  const auto g = Map<N>(
-      [&](V v, V p, V n) VX_POWER_STEP {
-        return hn::Add(LookupEighth(vexel::power::kRootRest, MakeEighthIndex(hn::BitCast(di, n))), hn::Mul(v, p));
-      },
-      f, series, count);
+  const auto g = Map<N>([&](V v) VX_POWER_STEP { return hn::Mul(v, Cubic(v, hn::Mul(v, v), vexel::power::kExp2)); }, f);
   return Map<N>(
       [&](V n, V part) VX_POWER_STEP {
         const VI bits = hn::BitCast(di, n);
@@ -300,53 +348,27 @@ HWY_INLINE Bundle<N> Exp2Of(const Bundle<N>& count, const Bundle<N>& f) {
       count, g);
 }
 
-template <bool kAll, size_t N>
-HWY_INLINE Bundle<N> Exp2OfSum(const Bundle<N>& large, const Bundle<N>& small) {
-  const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
-  auto count = Map<N>([&](V a, V c) VX_POWER_STEP { return hn::Add(hn::Add(a, c), magic); }, large, small);
-  auto f = Map<N>([&](V a, V n, V c) VX_POWER_STEP { return hn::Add(hn::Sub(a, hn::Sub(n, magic)), c); }, large, count,
-                  small);
+template <bool kAll, PowerCore kCore, size_t N>
+HWY_INLINE Bundle<N> PowersOf(const Bundle<N>& x, const PowerExponent& y) {
+  Bundle<N> eighths, place, count, f;
+  PlaceOf<kAll, kCore>(x, y.log, eighths, place);
+  EndStep<N>(eighths, place);
+  ExponentOf<kCore>(eighths, place, y.log, count, f);
   EndStep<N>(count, f);
   return Exp2Of<kAll>(count, f);
 }
 
-template <bool kAll, PowerCore kCore, size_t N>
-HWY_INLINE Bundle<N> PowersOf(const Bundle<N>& x, const PowerExponent& y) {
-  Bundle<N> large, small;
-  if constexpr (kCore == PowerCore::Float) {
-    FloatLog<kAll>(x, y.log, large, small);
-    return Exp2OfSum<kAll>(large, small);
-  } else {
-    Bundle<N> middle;
-    LongLog<kAll>(x, y.log, large, middle, small);
-    const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
-    auto count = Map<N>([&](V a, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Add(a, b), c), magic); }, large,
-                        middle, small);
-    auto f =
-        Map<N>([&](V a, V n, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Sub(a, hn::Sub(n, magic)), b), c); },
-               large, count, middle, small);
-    EndStep<N>(count, f);
-    return Exp2Of<kAll>(count, f);
-  }
-}
-
-template <bool kAll, PowerCore kCore>
-HWY_INLINE V PowerCoreOf(V x, const PowerExponent& y) {
-  return PowersOf<kAll, kCore>(Bundle<1>{x}, y).a;
-}
-
-// Any argument at all. kSigned: sign(x) * |x|^y, NaN without a sign.
-template <PowerCore kCore, bool kSigned>
+// Any argument at all.
+template <PowerCore kCore>
 HWY_NOINLINE V PowerAll(V x, const PowerExponent& y) {
   const D d;
   const DI di;
-  const VI given = hn::BitCast(di, kSigned ? hn::Abs(x) : x);
+  const VI given = hn::BitCast(di, x);
   const auto isZero = hn::Eq(hn::Add(given, given), hn::Zero(di));
   const VI bits = hn::IfThenZeroElse(isZero, given);
   const VI infinity = hn::Set(di, 0x7f800000);
-  VI result = hn::BitCast(di, PowerCoreOf<true, kCore>(hn::BitCast(d, bits), y));
+  VI result = hn::BitCast(di, PowersOf<true, kCore>(Bundle<1>{hn::BitCast(d, bits)}, y).a);
   result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, hn::IfThenZeroElse(isZero, result));
-  if constexpr (kSigned) result = hn::Or(result, hn::BitCast(di, hn::And(x, hn::SignBit(d))));
   result = hn::IfThenElse(hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, hn::Zero(di))), hn::Set(di, 0x7fc00000), result);
   return hn::BitCast(d, result);
 }
@@ -383,19 +405,32 @@ HWY_INLINE V WithSign(V power, V x) {
 
 template <PowerCore kCore, bool kSigned>
 HWY_INLINE V FastPower(V x, const PowerExponent& y) {
-  return WithSign<kSigned>(PowerCoreOf<false, kCore>(Magnitude<kSigned>(x), y), x);
+  return WithSign<kSigned>(PowersOf<false, kCore>(Bundle<1>{Magnitude<kSigned>(x)}, y).a, x);
 }
 
-// With arguments outside the fast range among them. Zeros, the usual ones, cost little.
-template <PowerCore kCore, bool kSigned>
-HWY_NOINLINE V RarePower(V x, const PowerExponent& y) {
+// The fast power of a vector that may have arguments outside the fast range, put right. Zeros, the usual ones, cost
+// little.
+template <PowerCore kCore>
+HWY_INLINE V MendRare(V fast, V magnitude, const PowerExponent& y) {
   const D d;
   const DI di;
-  const V magnitude = Magnitude<kSigned>(x);
   const auto isZero = hn::Eq(hn::BitCast(di, magnitude), hn::Zero(di));
   const auto outside = hn::AndNot(isZero, hn::Gt(AboveFirst(magnitude, y), FastSpan(y)));
-  if (!hn::AllFalse(di, outside)) return PowerAll<kCore, kSigned>(x, y);
-  return hn::IfThenElse(hn::RebindMask(d, isZero), x, FastPower<kCore, kSigned>(x, y));
+  if (HWY_UNLIKELY(!hn::AllFalse(di, outside))) return PowerAll<kCore>(magnitude, y);
+  return hn::IfThenZeroElse(hn::RebindMask(d, isZero), fast);
+}
+
+// The power of NaN has no sign.
+template <bool kSigned>
+HWY_INLINE V WithoutSignedNaN(V power, V x) {
+  return kSigned ? hn::IfThenElse(hn::IsNaN(x), hn::BitCast(D(), hn::Set(DI(), 0x7fc00000)), power) : power;
+}
+
+template <PowerCore kCore, bool kSigned>
+HWY_NOINLINE V RarePower(V x, const PowerExponent& y) {
+  const V magnitude = Magnitude<kSigned>(x);
+  const V power = MendRare<kCore>(PowersOf<false, kCore>(Bundle<1>{magnitude}, y).a, magnitude, y);
+  return WithoutSignedNaN<kSigned>(WithSign<kSigned>(power, x), x);
 }
 
 template <PowerCore kCore, bool kSigned>
@@ -432,16 +467,65 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
   }
 }
 
+// The loops keep more vectors in flight than a scheduler finds in one long chain.
+template <PowerCore kCore, bool kSigned, class Prepare, class Finish>
+HWY_INLINE void PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
+                           const PowerExponent& y, const Prepare& prepare, const Finish& finish) {
+  const D d;
+  const DI di;
+  const size_t lanes = hn::Lanes(d);
+  float* HWY_RESTRICT scratch2 = scratch + count;
+  if constexpr (kCore == PowerCore::Scalar) {
+    for (size_t i = 0; i < count; i += lanes) {
+      const V v = hn::Load(d, values + i);
+      hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane<false>(prepare(v), y), v), v), d, values + i);
+    }
+    return;
+  } else {
+    VI above = hn::Set(di, INT32_MIN);
+    for (size_t i = 0; i < count; i += lanes) {
+      const Bundle<1> x{prepare(hn::Load(d, values + i))};
+      above = hn::Max(above, AboveFirst(x.a, y));
+      Bundle<1> eighths, place;
+      PlaceOf<false, kCore>(x, y.log, eighths, place);
+      hn::Store(eighths.a, d, scratch + i);
+      hn::Store(place.a, d, scratch2 + i);
+    }
+    for (size_t i = 0; i < count; i += lanes) {
+      Bundle<1> whole, f;
+      ExponentOf<kCore>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}, y.log, whole, f);
+      hn::Store(whole.a, d, scratch + i);
+      hn::Store(f.a, d, scratch2 + i);
+    }
+    const bool rare = !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
+    for (size_t i = 0; i < count; i += lanes) {
+      const V v = hn::Load(d, values + i);
+      V power = Exp2Of<false>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}).a;
+      if (HWY_UNLIKELY(rare)) {
+        power = WithoutSignedNaN<kSigned>(finish(MendRare<kCore>(power, prepare(v), y), v), v);
+      } else {
+        power = finish(power, v);
+      }
+      hn::Store(power, d, values + i);
+    }
+  }
+}
+
+HWY_INLINE V SumOfLog(V large, V middle, V small) {
+  const V sum = hn::Add(large, middle);
+  return hn::Add(sum, hn::Add(hn::Sub(middle, hn::Sub(sum, large)), small));
+}
+
 template <size_t N>
 HWY_INLINE Bundle<N> LogOfBase(const Bundle<N>& x, const vexel::power::ScaledLog2& log) {
   const D d;
   const DI di;
-  Bundle<N> large, middle, small;
-  LongLog<true>(x, log, large, middle, small);
+  Bundle<N> eighths, fraction, large, middle, small;
+  PlaceOf<true, PowerCore::Long>(x, log, eighths, fraction);
+  LongLog(eighths, fraction, log, large, middle, small);
   return Map<N>(
       [&](V in, V a, V b, V c) VX_POWER_STEP {
-        const V sum = hn::Add(a, b);
-        const V value = hn::Add(sum, hn::Add(hn::Sub(b, hn::Sub(sum, a)), c));
+        const V value = SumOfLog(a, b, c);
         const VI bits = hn::BitCast(di, in);
         const VI infinity = hn::Set(di, 0x7f800000);
         const VI zero = hn::Zero(di);
@@ -455,6 +539,40 @@ HWY_INLINE Bundle<N> LogOfBase(const Bundle<N>& x, const vexel::power::ScaledLog
       x, large, middle, small);
 }
 
+// Logarithms in loops like PowerLoops: finish(log of prepare(value), value).
+template <class Prepare, class Finish>
+HWY_INLINE void LogLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
+                         const vexel::power::ScaledLog2& log, const Prepare& prepare, const Finish& finish) {
+  const D d;
+  const DI di;
+  const size_t lanes = hn::Lanes(d);
+  float* HWY_RESTRICT scratch2 = scratch + count;
+  const VI first = hn::Set(di, static_cast<int32_t>(0x00800000 + kFlip));
+  const VI span = hn::Set(di, static_cast<int32_t>(0x7f7fffff - 0x00800000 + kFlip));
+  VI above = hn::Set(di, INT32_MIN);
+  for (size_t i = 0; i < count; i += lanes) {
+    const Bundle<1> x{prepare(hn::Load(d, values + i))};
+    above = hn::Max(above, hn::Sub(hn::BitCast(di, x.a), first));
+    Bundle<1> eighths, fraction;
+    PlaceOf<false, PowerCore::Long>(x, log, eighths, fraction);
+    hn::Store(eighths.a, d, scratch + i);
+    hn::Store(fraction.a, d, scratch2 + i);
+  }
+  const bool rare = !hn::AllFalse(di, hn::Gt(above, span));
+  for (size_t i = 0; i < count; i += lanes) {
+    const V v = hn::Load(d, values + i);
+    V logarithm;
+    if (HWY_UNLIKELY(rare)) {
+      logarithm = LogOfBase(Bundle<1>{prepare(v)}, log).a;
+    } else {
+      Bundle<1> large, middle, small;
+      LongLog(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}, log, large, middle, small);
+      logarithm = SumOfLog(large.a, middle.a, small.a);
+    }
+    hn::Store(finish(logarithm, v), d, values + i);
+  }
+}
+
 HWY_INLINE V ExpOfBase(V x, const vexel::power::SplitFloat& log2Base) {
   const D d;
   const DI di;
@@ -462,8 +580,11 @@ HWY_INLINE V ExpOfBase(V x, const vexel::power::SplitFloat& log2Base) {
   const V top = hn::And(bounded, hn::BitCast(d, hn::Set(di, static_cast<int32_t>(0xfffff000))));
   const V low = hn::Add(hn::Mul(top, hn::Set(d, log2Base.low)),
                         hn::Mul(hn::Sub(bounded, top), hn::Set(d, log2Base.high + log2Base.low)));
-  const Bundle<1> power = Exp2OfSum<true>(Bundle<1>{hn::Mul(top, hn::Set(d, log2Base.high))}, Bundle<1>{low});
-  return hn::IfThenElse(hn::IsNaN(x), hn::BitCast(d, hn::Set(di, 0x7fc00000)), power.a);
+  const V shifted = hn::Sub(low, hn::Set(d, static_cast<float>(vexel::power::kRootShift)));
+  Bundle<1> count, f;
+  CountEighths(Bundle<1>{hn::Mul(top, hn::Set(d, log2Base.high))}, Bundle<1>{shifted}, count, f);
+  const V power = Exp2Of<true>(count, f).a;
+  return hn::IfThenElse(hn::IsNaN(x), hn::BitCast(d, hn::Set(di, 0x7fc00000)), power);
 }
 
 }  // namespace power_detail
@@ -473,12 +594,6 @@ HWY_INLINE power_detail::V Log(power_detail::V x) {
 }
 HWY_INLINE power_detail::V Log10(power_detail::V x) {
   return power_detail::LogOfBase(power_detail::Bundle<1>{x}, vexel::power::kDecimalLog).a;
-}
-HWY_INLINE void Log3(power_detail::V& a, power_detail::V& b, power_detail::V& c) {
-  const auto logs = power_detail::LogOfBase(power_detail::Bundle<3>{a, b, c}, vexel::power::kNaturalLog);
-  a = logs.a;
-  b = logs.b;
-  c = logs.c;
 }
 HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2EShort); }
 HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2Of10Short); }
@@ -505,11 +620,40 @@ HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detai
   power_detail::Power3<kCore, true>(a, b, c, y);
 }
 
+// `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value), where finish
+// leaves magnitudes as they are or gives them a sign. `scratch`, aligned too, has room for twice as many.
+template <PowerCore kCore, class Prepare, class Finish>
+HWY_INLINE void Powers(float* values, size_t count, float* scratch, const PowerExponent& y, const Prepare& prepare,
+                       const Finish& finish) {
+  power_detail::PowerLoops<kCore, false>(values, count, scratch, y, prepare, finish);
+}
+template <PowerCore kCore>
+HWY_INLINE void SignedPowers(float* values, size_t count, float* scratch, const PowerExponent& y) {
+  using power_detail::V;
+  power_detail::PowerLoops<kCore, true>(
+      values, count, scratch, y, [](V v) VX_POWER_STEP { return power_detail::Magnitude<true>(v); },
+      [](V power, V v) VX_POWER_STEP { return power_detail::WithSign<true>(power, v); });
+}
+
+template <class Prepare, class Finish>
+HWY_INLINE void Logs(float* values, size_t count, float* scratch, const Prepare& prepare, const Finish& finish) {
+  power_detail::LogLoops(values, count, scratch, vexel::power::kNaturalLog, prepare, finish);
+}
+
 // For exponents whose core is known only at run time.
 HWY_NOINLINE inline power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
   if (y.core == PowerCore::Float) return Power<PowerCore::Float>(x, y);
   if (y.core == PowerCore::Long) return Power<PowerCore::Long>(x, y);
   return Power<PowerCore::Scalar>(x, y);
+}
+HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scratch, const PowerExponent& y) {
+  if (y.core == PowerCore::Float) {
+    SignedPowers<PowerCore::Float>(values, count, scratch, y);
+  } else if (y.core == PowerCore::Long) {
+    SignedPowers<PowerCore::Long>(values, count, scratch, y);
+  } else {
+    SignedPowers<PowerCore::Scalar>(values, count, scratch, y);
+  }
 }
 HWY_NOINLINE inline void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c,
                                          const PowerExponent& y) {

@@ -28,13 +28,14 @@ SplitArgument Split(float x) {
   return {i >> 20, std::bit_cast<float>((static_cast<uint32_t>(i) & power::kMantissaMask) + power::kFirstBits)};
 }
 
-// 2^(eighths + f), where eighths is a whole number of eighths below 2^18 in magnitude.
+// 2^(eighths + kRootShift + f), where eighths is a whole number of eighths below 2^18 in magnitude.
 float Exp2Tail(float eighths, float f) {
   const uint32_t count = std::bit_cast<uint32_t>(eighths + kEighthsMagic);
   const uint32_t j = count & 7;
-  const float series = power::kExp2[0] + f * (power::kExp2[1] + f * (power::kExp2[2] + f * power::kExp2[3]));
+  const float* c = power::kExp2;
+  const float series = (c[0] + f * c[1]) + (f * f) * (c[2] + f * c[3]);
   const float root = power::kRoot[j];
-  const float mantissa = root + root * (power::kRootRest[j] + f * series);
+  const float mantissa = root + root * (f * series);
   const int32_t n = static_cast<int32_t>(count - power::kEighthsMagicBits) >> 3;
   if (n > 128) return kInfinity;
   if (n < -125) {
@@ -46,7 +47,7 @@ float Exp2Tail(float eighths, float f) {
   return std::bit_cast<float>(bits < kInfinityBits ? bits : kInfinityBits);
 }
 
-// 2^(high + low); high has enough trailing zeros that taking eighths off it is exact.
+// 2^(high + low + kRootShift); high has enough trailing zeros that taking eighths off it is exact.
 float Exp2Pair(float high, float low) {
   const float eighths = ((high + low) + kEighthsMagic) - kEighthsMagic;
   return Exp2Tail(eighths, (high - eighths) + low);
@@ -63,7 +64,7 @@ double Log2Double(float x) {
 }
 
 float Series(const power::ScaledLog2& log, float w) {
-  return log.series[0] + w * (log.series[1] + w * (log.series[2] + w * log.series[3]));
+  return (log.series[0] + w * log.series[1]) + (w * w) * (log.series[2] + w * log.series[3]);
 }
 
 float PowerFloat(float x, const power::ScaledLog2& log) {
@@ -103,7 +104,7 @@ float PowerLong(float x, const power::ScaledLog2& log) {
 float PowerDouble(float x, float y) {
   double t = static_cast<double>(y) * Log2Double(x);
   t = t < 1024.0 ? t : 1024.0;
-  t = t > -1024.0 ? t : -1024.0;
+  t = (t > -1024.0 ? t : -1024.0) - power::kRootShift;
   const double eighths = (t + kEighthsMagicDouble) - kEighthsMagicDouble;
   return Exp2Tail(static_cast<float>(eighths), static_cast<float>(t - eighths));
 }
@@ -128,7 +129,8 @@ float ExpOfBase(float x, const power::SplitFloat& log2Base) {
   x = x > -256.0f ? x : -256.0f;
   const float top = std::bit_cast<float>(std::bit_cast<uint32_t>(x) & 0xfffff000);
   const float bottom = x - top;
-  return Exp2Pair(top * log2Base.high, top * log2Base.low + bottom * (log2Base.high + log2Base.low));
+  const float low = top * log2Base.low + bottom * (log2Base.high + log2Base.low);
+  return Exp2Pair(top * log2Base.high, low - static_cast<float>(power::kRootShift));
 }
 
 float LogOfBase(float x, const power::ScaledLog2& log) {

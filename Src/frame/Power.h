@@ -6,10 +6,10 @@
 // flush-to-zero says; denormals-are-zero is not supported. Rounding must be to nearest.
 //
 // How: the bits of x split into k, the number of eighths of an octave, and a mantissa in one of eight segments;
-// y log2(x) = y / 8 * k + (what is left of the segment, below y / 12), 2^t = 2^(n / 8) * (1 + f * polynomial), |f| <=
-// 1/16. The large term is exact, because y / 8 is cut into a short number that k multiplies exactly and a small rest.
-// Exponents above 4 carry more digits of what is left (the long form); the rare ones beyond both forms are computed in
-// double.
+// y log2(x) = y / 8 * k + (what is left of the segment, below y / 12), 2^t = 2^(n / 8 + s) * (1 + f * polynomial), |f|
+// <= 1/16, with a small s that makes the eight roots floats almost exactly. The large term is exact, because y / 8 is
+// cut into a short number that k multiplies exactly and a small rest. Exponents above 4 carry more digits of what is
+// left (the long form); the rare ones beyond both forms are computed in double.
 #pragma once
 
 #include <bit>
@@ -45,19 +45,13 @@ inline constexpr float kReciprocalOffset[8] = {0.0f,          0.0183662698f, 0.0
 inline constexpr double kLog2[6] = {1.4426950411084996,   -0.72134752104861699, 0.48089712699959069,
                                     -0.36067218359279224, 0.28954285675094638,  -0.24145339859794785};
 
-// 2^f - 1 = f * (...), |f| <= 1/16, to 2^-32, and 2^(j / 8) as a float and what it lacks of 1.
+// 2^f - 1 = f * (...), |f| <= 1/16, to 2^-32.
 inline constexpr float kExp2[4] = {0.693147182464599609375f, 0.2402265071868896484375f, 5.5508099496364593505859375e-2f,
                                    9.6186101436614990234375e-3f};
-alignas(32) inline constexpr float kRoot[8] = {1.0f,        1.09050775f, 1.18920708f, 1.29683959f,
-                                               1.41421354f, 1.54221082f, 1.68179286f, 1.8340081f};
-alignas(32) inline constexpr float kRootRest[8] = {0.0f,
-                                                   -1.19921575e-08f,
-                                                   3.19341815e-08f,
-                                                   -3.09907193e-08f,
-                                                   1.71142709e-08f,
-                                                   5.23333421e-09f,
-                                                   -1.47196051e-08f,
-                                                   -6.12825968e-09f};
+// 2^(j / 8 + kRootShift); with this shift all eight are floats to 2^-28.
+inline constexpr double kRootShift = -0.0036995260014282961;
+alignas(32) inline constexpr float kRoot[8] = {0.997438967f, 1.08771491f, 1.18616152f, 1.2935183f,
+                                               1.41059172f,  1.53826118f, 1.6774857f,  1.82931113f};
 
 // Adding these rounds a float or double to eighths, which then stand in the low bits.
 inline constexpr float kEighthsMagic = 1572864.0f;                // 1.5 * 2^20
@@ -78,11 +72,11 @@ struct SplitFloat {
 inline constexpr SplitFloat kLog2EShort{kLog2E, 12};
 inline constexpr SplitFloat kLog2Of10Short{3.3219280948873623, 12};
 
-// What scale * log2(x) needs. In the long form slopes and offsets are a short number and its rest; in the other the
-// high offsets and low slopes are not used.
+// What scale * log2(x) - shift needs. In the long form slopes and offsets are a short number and its rest; in the other
+// the high offsets and low slopes are not used.
 struct ScaledLog2 {
   constexpr ScaledLog2() = default;
-  constexpr ScaledLog2(double scale, bool isLong) {
+  constexpr ScaledLog2(double scale, bool isLong, double shift) {
     const SplitFloat eighth(scale * 0.125, 13);
     eighthHigh = eighth.high;
     eighthLow = eighth.low;
@@ -92,7 +86,7 @@ struct ScaledLog2 {
       series[i] = static_cast<float>(kLn[i] * factor);
     }
     for (int j = 0; j < 8; ++j) {
-      const double slope = scale * kLog2E / kCentre[j], offset = scale * kCentreOffset[j];
+      const double slope = scale * kLog2E / kCentre[j], offset = scale * kCentreOffset[j] - shift;
       if (isLong) {
         const SplitFloat shortSlope(slope, 12);
         slopes[j] = shortSlope.high;
@@ -114,8 +108,8 @@ struct ScaledLog2 {
   alignas(32) float slopeRests[8] = {};
   alignas(32) float offsetsHigh[8] = {};
 };
-inline constexpr ScaledLog2 kNaturalLog{kLn2, true};
-inline constexpr ScaledLog2 kDecimalLog{kLog10Of2, true};
+inline constexpr ScaledLog2 kNaturalLog{kLn2, true, 0.0};
+inline constexpr ScaledLog2 kDecimalLog{kLog10Of2, true, 0.0};
 
 }  // namespace power
 
@@ -131,7 +125,7 @@ struct PowerExponent {
              : y > 4.0f && y <= 80.0f   ? PowerCore::Long
                                         : PowerCore::Scalar) {
     if (core == PowerCore::Scalar) return;
-    log = power::ScaledLog2(y, core == PowerCore::Long);
+    log = power::ScaledLog2(y, core == PowerCore::Long, power::kRootShift);
     // Every x between these powers of two gives a result whose smallest terms are normal numbers too.
     if (y > 0.75f) {
       const int down = static_cast<int>(95.0f / y);
