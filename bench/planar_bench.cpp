@@ -25,16 +25,19 @@ struct Size {
 };
 constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
 
+// Bytes of a picture itself, without what lies between its rows and planes.
+size_t PictureBytes(F format, Size size) {
+  if (!Is420(format)) return static_cast<size_t>(UnpaddedRowBytes(format, size.width)) * size.height;
+  return static_cast<size_t>(size.width) * size.height * 3 / 2 * (HasWideSamples(format) ? 2 : 1);
+}
+
 struct Block {
   Block(F f, Size s) : format(f), size(s), memory(static_cast<size_t>(VX_PixelFormatSize(f, s.width, s.height))) {
     memory.FillBytes();
     VX_GetPlanarBuffers(memory.data(), f, s.width, s.height, planes, rowBytes);
   }
   const uint8_t* plane(int i) const { return static_cast<const uint8_t*>(planes[i]); }
-  // Bytes of the picture itself.
-  size_t pixelBytes() const {
-    return static_cast<size_t>(size.width) * size.height * 3 / 2 * (HasWideSamples(format) ? 2 : 1);
-  }
+  size_t pixelBytes() const { return PictureBytes(format, size); }
   F format;
   Size size;
   Memory memory;
@@ -143,6 +146,35 @@ void OtherSizeCases(Size size) {
   Decode("I420 * 4/3", frame, {size.name, size.width / 4 * 3, size.height}, size, true);
 }
 
+// Conversions by way of a raster that the decoder makes or the encoder takes.
+void ConvertCases(Size size) {
+  const F nv12 = FromBits(0x0E000A31), i420 = F::YUV_420_MPEG4_FRAME_709;
+  const struct {
+    const char* name;
+    F src, dst;
+  } cases[] = {{"I420 709 to UYVY8 709", i420, F::UYVY_422_8u_709},
+               {"I420 709 to BGRA8", i420, F::BGRA_4444_8u},
+               {"I420 709 to BGRA32f", i420, F::BGRA_4444_32f},
+               {"NV12 709 to V210 709", nv12, F::V210_422_10u_709},
+               {"UYVY8 709 to I420 709", F::UYVY_422_8u_709, i420},
+               {"BGRA8 to I420 full range", F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME_FullRange},
+               {"NV12 709 to I420 full range", nv12, F::YUV_420_MPEG4_FRAME_FullRange}};
+  for (const auto& c : cases) {
+    const auto bytes = [&](F format) {
+      return static_cast<size_t>(VX_PixelFormatSize(format, size.width, size.height));
+    };
+    const auto src = std::make_shared<Memory>(bytes(c.src)), dst = std::make_shared<Memory>(bytes(c.dst));
+    src->FillBytes();
+    const auto rowBytes = [&](F format) { return static_cast<int32_t>(PaddedRowBytes(format, size.width)); };
+    const auto work = [=, c = c, srcRow = rowBytes(c.src), dstRow = rowBytes(c.dst)] {
+      return VX_Convert(src->data(), srcRow, c.src, dst->data(), dstRow, c.dst, size.width, size.height, 2);
+    };
+    Check(work(), c.name);
+    BenchCase report(std::string("convert ") + c.name + " " + size.name, static_cast<size_t>(size.width) * size.height);
+    report.Add("vexel", work).AddFloor(PictureBytes(c.src, size), PictureBytes(c.dst, size));
+  }
+}
+
 void EncodeCases(Size size) {
   for (const F format : {F::YUV_420_MPEG4_FRAME_FullRange, F::YUV_420_MPEG4_FRAME_709}) {
     const bool video = format == F::YUV_420_MPEG4_FRAME_709;
@@ -175,5 +207,6 @@ void RegisterBenchmarks() {
     FullSizeCases(size);
     OtherSizeCases(size);
     EncodeCases(size);
+    ConvertCases(size);
   }
 }
