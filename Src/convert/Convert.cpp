@@ -24,30 +24,6 @@ struct Buffer {
   VX_PixelFormat format;
 };
 
-// A transient pixel buffer for the length of a scope.
-class Intermediate {
- public:
-  Intermediate() = default;
-  ~Intermediate() { VX_FreeTransientPixelBuffer(mFormat, mRaw, mRawSize); }
-  Intermediate(const Intermediate&) = delete;
-  Intermediate& operator=(const Intermediate&) = delete;
-
-  VX_Result Allocate(VX_PixelFormat format, int32_t width, int32_t height) noexcept {
-    mFormat = format;
-    return VX_AllocateTransientPixelBuffer(format, width, height, &mRaw, &mPixels, &mRowBytes, &mRawSize);
-  }
-  void* pixels() const noexcept { return mPixels; }
-  int32_t rowBytes() const noexcept { return mRowBytes; }
-  VX_PixelFormat format() const noexcept { return mFormat; }
-
- private:
-  VX_PixelFormat mFormat{};
-  void* mRaw = nullptr;
-  void* mPixels = nullptr;
-  size_t mRawSize = 0;
-  int32_t mRowBytes = 0;
-};
-
 // Bottom picture row first, walking up.
 template <class B>
 B BottomUp(B buffer, int32_t height) noexcept {
@@ -149,6 +125,22 @@ bool HasEncoder(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) n
   return PlanEncode(src, dst, input) && Is420(dst);
 }
 
+// What the encoder takes is reached at the render quality; what it makes of that itself, at its own.
+int32_t EncodeQuality(VX_PixelFormat src, VX_PixelFormat input, int32_t renderQuality) noexcept {
+  return src == input ? kEncodeQuality : renderQuality;
+}
+
+// The block of a planar picture above 8 bits has no defined size, so only its planes can be decoded.
+bool CanDecodeBlock(VX_PixelFormat format) noexcept { return !HasWideSamples(format) || IsBiplanar(format); }
+
+// From one 4:2:0 format to another, or to itself.
+VX_Result RecodePicture(const ConstBuffer& src, VX_PixelFormat decoded, VX_PixelFormat input, const Buffer& dst,
+                        int32_t width, int32_t height, int32_t renderQuality) noexcept {
+  if (!CanDecodeBlock(src.format)) return VX_ErrUnsupportedFormat;
+  return Recode420(src.base, src.format, decoded, renderQuality, dst.base, dst.format, width, height,
+                   EncodeQuality(decoded, input, renderQuality));
+}
+
 VX_Result ConvertToSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                            int32_t renderQuality) noexcept {
   VX_PixelFormat input;
@@ -160,14 +152,9 @@ VX_Result ConvertToSpecial(const ConstBuffer& src, const Buffer& dst, int32_t wi
   const VX_Result check = CheckBuffers(src, raster, dst, VX_PixelFormat::BGRX_4444_8u, width, height, &done);
   if (check != VX_Success || done) return check;
 
-  if (input == src.format)
-    return Encode420(src.base, static_cast<int32_t>(src.rowBytes), src.format, dst.base, dst.format, width, height);
-  Intermediate encoded;
-  if (const VX_Result result = encoded.Allocate(input, width, height)) return result;
-  if (const VX_Result result = VX_Convert(src.base, static_cast<int32_t>(src.rowBytes), src.format, encoded.pixels(),
-                                          encoded.rowBytes(), input, width, height, renderQuality))
-    return result;
-  return Encode420(encoded.pixels(), encoded.rowBytes(), input, dst.base, dst.format, width, height);
+  if (IsSpecial(src.format)) return RecodePicture(src, input, input, dst, width, height, renderQuality);
+  return Encode420(src.base, static_cast<int32_t>(src.rowBytes), src.format, dst.base, dst.format, width, height,
+                   EncodeQuality(src.format, input, renderQuality));
 }
 
 VX_Result ConvertRasters(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
@@ -190,22 +177,14 @@ VX_Result ConvertFrom420(const ConstBuffer& src, const Buffer& dst, int32_t widt
   const VX_Result check = CheckBuffers(src, plan.format, dst, raster, width, height, &done);
   if (check != VX_Success || done) return check;
 
-  if (plan.format == dst.format)
-    return Decode420(src.base, src.format, width, height, dst.base, static_cast<int32_t>(dst.rowBytes), dst.format,
-                     renderQuality);
-  Intermediate decoded;
-  if (const VX_Result result = decoded.Allocate(plan.format, width, height)) return result;
-  if (const VX_Result result = Decode420(src.base, src.format, width, height, decoded.pixels(), decoded.rowBytes(),
-                                         plan.format, renderQuality))
-    return result;
-  return ConvertRasters({static_cast<const uint8_t*>(decoded.pixels()), decoded.rowBytes(), plan.format}, dst, width,
-                        height, renderQuality);
+  if (IsSpecial(dst.format)) return RecodePicture(src, plan.format, raster, dst, width, height, renderQuality);
+  return Decode420Through(plan.format, src.base, src.format, width, height, dst.base,
+                          static_cast<int32_t>(dst.rowBytes), dst.format, renderQuality);
 }
 
 VX_Result ConvertFromSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                              int32_t renderQuality) noexcept {
-  // The block of a planar picture above 8 bits has no defined size, so only its planes can be decoded.
-  if (Is420(src.format) && HasWideSamples(src.format) && !IsBiplanar(src.format)) return VX_ErrUnsupportedFormat;
+  if (Is420(src.format) && !CanDecodeBlock(src.format)) return VX_ErrUnsupportedFormat;
   if (Is420(src.format)) return ConvertFrom420(src, dst, width, height, renderQuality);
   const DecodeTarget target = PlanDvDecode(src.format, width, height, renderQuality);
   if (!target.known) return VX_ErrUnsupportedFormat;

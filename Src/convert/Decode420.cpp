@@ -26,11 +26,10 @@ struct TopDown {
 constexpr int32_t kStreamPixels = 1024;
 static_assert(kStreamPixels % 2 == 0);
 
-// A destination that the cache cannot hold. One that just fits is written faster through the cache: the decoder does
-// enough work per byte to hide what that costs.
+// A destination that would take most of the cache. A smaller one is written faster through it.
 bool GoesPastCache(const TopDown& dst) noexcept {
   const uint32_t cache = VX_GetCacheSize();
-  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= int64_t{cache};
+  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= int64_t{cache / 2};
 }
 
 // What the decoder makes for a destination: its own format if it can, else one on the way that loses least. 8-bit RGB
@@ -39,20 +38,6 @@ VX_PixelFormat WorkingFormat(VX_PixelFormat src, VX_PixelFormat dst) noexcept {
   if (Rows420::CanMake(dst)) return dst;
   if (!IsYuv(dst) && Layout(dst) == kLayout4444 && Depth(dst) == kDepth8u) return VX_PixelFormat::BGRX_4444_8u;
   return PlanDecode420(src, 0, 0, dst, 0, 0, 0).format;
-}
-
-void TraceFullSize(const Picture420& src) noexcept try {
-  static TraceSite site("Vexel", 5);
-  if (!site.Enabled()) return;
-  constexpr const char* kFunction = "<unnamed>::ConvertFromYUV_420_8u_full";
-  std::ostringstream text;
-  text << kFunction << ": inSrcWidth =" << src.width << ", inSrcHeight =" << src.height
-       << ", inSrcRowBytes[3]:" << src.rowBytes[0] << " " << src.rowBytes[1] << " " << src.rowBytes[2];
-  site.Line(text.str());
-  // The rows are made with 8 bits: what a deeper destination could hold of the rest is dropped.
-  if (HasWideSamples(src.format)) site.Line(std::string(kFunction) + ": TODO for BiPlanar 10u");
-} catch (...) {
-  // no memory for the text
 }
 
 VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
@@ -87,11 +72,11 @@ void ConvertRows(Rows420& rows, const TopDown& dst, const RowConverter& converte
   }
 }
 
-VX_Result Decode(const Picture420& src, const TopDown& dst, int32_t field, int32_t quality) noexcept {
-  const uint32_t depth = Depth(src.format);
-  if (!Is420(src.format) || (depth != kDepth8u && depth != kDepth10u)) return VX_ErrUnsupportedFormat;
+// By way of `working`, which the decoder makes.
+VX_Result Decode(const Picture420& src, const TopDown& dst, VX_PixelFormat working, int32_t field,
+                 int32_t quality) noexcept {
+  if (!CanDecode420(src.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
-  const VX_PixelFormat working = WorkingFormat(src.format, dst.format);
   Rows420 rows;
   if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) return result;
   RowConverter converter;
@@ -111,7 +96,7 @@ VX_Result Decode(const Picture420& src, const TopDown& dst, int32_t field, int32
   rows.UseScratch(scratch.get());
   uint8_t* const decoded = scratch.get() + rowsBytes + converterBytes;
 
-  if (dst.width == src.width && dst.height == src.height) TraceFullSize(src);
+  if (dst.width == src.width && dst.height == src.height) TraceFullSize420(src);
   if (converts) {
     converter.UseScratch(scratch.get() + rowsBytes);
     ConvertRows(rows, dst, converter, decoded);
@@ -122,23 +107,55 @@ VX_Result Decode(const Picture420& src, const TopDown& dst, int32_t field, int32
   return VX_Success;
 }
 
+TopDown Raster(void* base, int32_t rowBytes, int32_t width, int32_t height, VX_PixelFormat format) noexcept {
+  TopDown raster{static_cast<uint8_t*>(base), rowBytes, width, height, format};
+  if (base && VX_IsOriginBottomLeft(format)) {
+    raster.top += (ptrdiff_t{height} - 1) * rowBytes;
+    raster.rowBytes = -raster.rowBytes;
+  }
+  return raster;
+}
+
 }  // namespace
+
+bool CanDecode420(VX_PixelFormat format) noexcept {
+  return Is420(format) && (Depth(format) == kDepth8u || Depth(format) == kDepth10u);
+}
+
+void TraceFullSize420(const Picture420& src) noexcept try {
+  static TraceSite site("Vexel", 5);
+  if (!site.Enabled()) return;
+  constexpr const char* kFunction = "<unnamed>::ConvertFromYUV_420_8u_full";
+  std::ostringstream text;
+  text << kFunction << ": inSrcWidth =" << src.width << ", inSrcHeight =" << src.height
+       << ", inSrcRowBytes[3]:" << src.rowBytes[0] << " " << src.rowBytes[1] << " " << src.rowBytes[2];
+  site.Line(text.str());
+  // The rows are made with 8 bits: what a deeper destination could hold of the rest is dropped.
+  if (HasWideSamples(src.format)) site.Line(std::string(kFunction) + ": TODO for BiPlanar 10u");
+} catch (...) {
+  // no memory for the text
+}
 
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t srcWidth, int32_t srcHeight, void* dst,
                     int32_t dstRowBytes, int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat, int32_t field,
                     int32_t quality) noexcept {
   if (!src && Is420(srcFormat) && !IsSpecial(dstFormat)) return VX_ErrNullSource;
-  TopDown raster{static_cast<uint8_t*>(dst), dstRowBytes, dstWidth, dstHeight, dstFormat};
-  if (dst && VX_IsOriginBottomLeft(dstFormat)) {
-    raster.top += (ptrdiff_t{dstHeight} - 1) * dstRowBytes;
-    raster.rowBytes = -raster.rowBytes;
-  }
-  return Decode(PictureFromBlock(src, srcFormat, srcWidth, srcHeight), raster, field, quality);
+  return Decode(PictureFromBlock(src, srcFormat, srcWidth, srcHeight),
+                Raster(dst, dstRowBytes, dstWidth, dstHeight, dstFormat), WorkingFormat(srcFormat, dstFormat), field,
+                quality);
 }
 
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t width, int32_t height, void* dst,
                     int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t quality) noexcept {
   return Decode420(src, srcFormat, width, height, dst, dstRowBytes, width, height, dstFormat, 0, quality);
+}
+
+VX_Result Decode420Through(VX_PixelFormat decoded, const void* src, VX_PixelFormat srcFormat, int32_t width,
+                           int32_t height, void* dst, int32_t dstRowBytes, VX_PixelFormat dstFormat,
+                           int32_t quality) noexcept {
+  if (!src) return VX_ErrNullSource;
+  return Decode(PictureFromBlock(src, srcFormat, width, height), Raster(dst, dstRowBytes, width, height, dstFormat),
+                decoded, 0, quality);
 }
 
 }  // namespace vexel
@@ -157,5 +174,5 @@ VX_Result VX::DecompressYUV_420_8u(const void* const* srcPlanes, const int32_t* 
       picture.rowBytes[i] = srcRowBytes[i];
     }
   return Decode(picture, {static_cast<uint8_t*>(dst), dstRowBytes, dstWidth, dstHeight, dstFormat},
-                static_cast<int32_t>(field), static_cast<int32_t>(quality));
+                WorkingFormat(srcFormat, dstFormat), static_cast<int32_t>(field), static_cast<int32_t>(quality));
 }

@@ -1,8 +1,8 @@
-// Encoding of rasters into planar 4:2:0 blocks.
+// Encoding of rasters and of decoded pictures into planar 4:2:0 blocks.
 #include <algorithm>
 
+#include "convert/Decode420.h"
 #include "convert/Encode420Kernels.h"
-#include "convert/Planar420.h"
 #include "convert/RowConverter.h"
 #include "convert/YuvMatrices.h"
 #include "frame/FpModeGuard.h"
@@ -14,122 +14,157 @@ using namespace encode420;
 
 namespace {
 
-// Quality of conversions on the way: chroma of 4:2:2 sources is interpolated before it is filtered.
-constexpr int32_t kRowQuality = 2;
-
 bool CanEncode(VX_PixelFormat format) noexcept {
   if (!Is420(format) || IsBiplanar(format) || Depth(format) != kDepth8u) return false;
   return Colorimetry(format) == kColorimetry709 || (Colorimetry(format) == 0 && !IsVideoRange(format));
 }
 
+// What the kernels take.
+VX_PixelFormat WorkingFormat(VX_PixelFormat dst) noexcept {
+  return IsVideoRange(dst) ? VX_PixelFormat::VUYX_4444_8u_709 : VX_PixelFormat::BGRX_4444_8u;
+}
+
 constexpr int16_t Factor(double value) { return static_cast<int16_t>(value * 32768 + (value < 0 ? -0.5 : 0.5)); }
 
 // The green factor takes the rounding of the others, so that grey keeps its code and has no chroma.
-constexpr BgrFactors Factors(double b, double r, int total) {
+constexpr BgrFactors FactorsOf(double b, double r, int total) {
   return {Factor(b), static_cast<int16_t>(total - Factor(b) - Factor(r)), Factor(r)};
 }
-
-struct Encoding {
-  BgrFactors luma;
-  ChromaFactors chroma;
-};
-constexpr Encoding EncodingOf(const YuvMatrix& m) {
-  return {Factors(m.yB, m.yR, 32768), {Factors(m.uB, m.uR, 0), Factors(m.vB, m.vR, 0)}};
+constexpr Factors FactorsOf(const YuvMatrix& m) {
+  return {FactorsOf(m.yB, m.yR, 32768), FactorsOf(m.uB, m.uR, 0), FactorsOf(m.vB, m.vR, 0)};
 }
-constexpr Encoding kEncoding601 = EncodingOf(kBt601), kEncoding709 = EncodingOf(kBt709);
+constexpr Factors kFactors601 = FactorsOf(kBt601), kFactors709 = FactorsOf(kBt709);
 
-// The lines that make a chroma row, and their weights in quarters. Each line belongs to one pair; a picture of an odd
-// number of line pairs in fields has a pair more than chroma rows.
-struct LinePair {
+size_t Pad(size_t bytes) noexcept { return (bytes + 63) & ~size_t{63}; }
+
+// The lines of a picture in the format that the kernels take, top line first: of a raster or of a 4:2:0 picture.
+class Lines {
+ public:
+  explicit Lines(int32_t width) noexcept : mWidth(width) {}
+
+  // Both come before the memory is known. Codes as those of the decoder and of the planner.
+  VX_Result Decode(const Picture420& src, VX_PixelFormat format, int32_t quality) noexcept {
+    mDecodes = true;
+    return mDecoder.Prepare(src, format, src.width, src.height, 0, quality);
+  }
+  VX_Result Convert(VX_PixelFormat from, VX_PixelFormat to, int32_t quality) noexcept {
+    mConverts = from != to;
+    return mConverter.Prepare(from, to, quality, mWidth);
+  }
+
+  void SetRaster(const uint8_t* top, ptrdiff_t rowBytes) noexcept {
+    mTop = top;
+    mRowBytes = rowBytes;
+  }
+
+  size_t ScratchBytes() const noexcept;
+  void UseScratch(uint8_t* scratch) noexcept;
+
+  // Where a line lies that is read straight from memory.
+  uintptr_t Address(int64_t line) const noexcept {
+    return reinterpret_cast<uintptr_t>(mTop) + static_cast<uintptr_t>(line * mRowBytes);
+  }
+
+  // Stays until another line takes the slot, 0 or 1.
+  const uint8_t* Get(int64_t line, int slot) noexcept;
+
+ private:
+  size_t SlotBytes() const noexcept { return Pad(4 * static_cast<size_t>(mWidth)); }
+  int SlotCount() const noexcept { return mDecodes || mConverts ? mDecodes && mConverts ? 3 : 2 : 0; }
+
+  int32_t mWidth;
+  bool mDecodes = false, mConverts = false;
+  Rows420 mDecoder;
+  RowConverter mConverter;
+  const uint8_t* mTop = nullptr;
+  ptrdiff_t mRowBytes = 0;
+  uint8_t* mSlots[3] = {};  // the last one for what is decoded, then converted
+};
+
+size_t Lines::ScratchBytes() const noexcept {
+  const size_t converterBytes = mConverts ? Pad(mConverter.ScratchBytes()) : 0;
+  return static_cast<size_t>(SlotCount()) * SlotBytes() + converterBytes + (mDecodes ? mDecoder.ScratchBytes() : 0);
+}
+
+void Lines::UseScratch(uint8_t* scratch) noexcept {
+  for (int i = 0; i < SlotCount(); ++i, scratch += SlotBytes()) mSlots[i] = scratch;
+  if (mConverts) {
+    mConverter.UseScratch(scratch);
+    scratch += Pad(mConverter.ScratchBytes());
+  }
+  if (mDecodes) mDecoder.UseScratch(scratch);
+}
+
+const uint8_t* Lines::Get(int64_t line, int slot) noexcept {
+  const uint8_t* pixels = mTop + line * mRowBytes;
+  if (mDecodes) {
+    uint8_t* const decoded = mSlots[mConverts ? 2 : slot];
+    mDecoder.BeginRow(static_cast<int32_t>(line));
+    mDecoder.Pixels(0, mWidth, decoded);
+    pixels = decoded;
+  }
+  if (!mConverts) return pixels;
+  mConverter.Convert(pixels, mSlots[slot]);
+  return mSlots[slot];
+}
+
+// The lines that make a chroma row. Each line belongs to one pair; a picture of an odd number of line pairs in fields
+// has a pair more than chroma rows.
+struct Pair {
   int64_t a, b;
-  int weightA, weightB;
+  EncodeLines encode;
 };
-
-LinePair PairOf(int64_t row, bool oneField) noexcept {
-  if (!oneField) return {2 * row, 2 * row + 1, 2, 2};
-  const int64_t parity = row % 2, first = row / 2 * 4 + parity;
-  return parity == 0 ? LinePair{first, first + 2, 3, 1} : LinePair{first, first + 2, 1, 3};
-}
 
 class Encoder {
  public:
-  Encoder(VX_PixelFormat dstFormat, void* dst, int32_t width, int32_t height) noexcept
-      : mWidth(width),
-        mHeight(height),
-        mMakeLuma((IsVideoRange(dstFormat) ? kLumaFromVuyx : kLumaFromBgrx)[mVariant]),
-        mMakeChroma((IsVideoRange(dstFormat) ? kChromaFromVuyx : kChromaFromBgrx)[mVariant]),
-        mEncoding(Colorimetry(dstFormat) == 0 ? kEncoding601 : kEncoding709),
-        mOneField(IsFieldPicture(dstFormat)),
-        mChromaWidth(ChromaWidth(PictureFromBlock(dst, dstFormat, width, height))) {
-    VX_GetPlanarBuffers(dst, dstFormat, width, height, mPlanes, mRowBytes);
-    if (IsReversed(dstFormat)) std::swap(mPlanes[1], mPlanes[2]);
+  Encoder(VX_PixelFormat format, void* dst, int32_t width, int32_t height) noexcept
+      : mFormat(format), mWidth(width), mHeight(height) {
+    VX_GetPlanarBuffers(dst, format, width, height, mPlanes, mRowBytes);
+    if (IsReversed(format)) std::swap(mPlanes[1], mPlanes[2]);
   }
 
-  VX_Result Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* converter) noexcept;
+  VX_Result Run(Lines& lines) const noexcept;
 
  private:
-  const uint8_t* Line(int64_t line, uint8_t* converted) const noexcept;
+  Pair PairOf(int64_t row) const noexcept;
   uint8_t* PlaneRow(int plane, int64_t row) const noexcept {
     return static_cast<uint8_t*>(mPlanes[plane]) + row * mRowBytes[plane];
   }
-  void WriteChroma(const uint8_t* a, const uint8_t* b, const LinePair& pair, int64_t row,
-                   const SumRows& sums) const noexcept;
 
-  KernelVariant mVariant = ActiveKernelVariant();
+  VX_PixelFormat mFormat;
   int32_t mWidth, mHeight;
-  MakeLuma mMakeLuma;
-  MakeChroma mMakeChroma;
-  const Encoding& mEncoding;
-  bool mOneField;
-  int32_t mChromaWidth;
   void* mPlanes[3];
   int32_t mRowBytes[3];
-  const uint8_t* mTop = nullptr;
-  ptrdiff_t mSrcRowBytes = 0;
-  const RowConverter* mConverter = nullptr;
+  KernelVariant mVariant = ActiveKernelVariant();
 };
 
-const uint8_t* Encoder::Line(int64_t line, uint8_t* converted) const noexcept {
-  const uint8_t* row = mTop + line * mSrcRowBytes;
-  if (!mConverter) return row;
-  mConverter->Convert(row, converted);
-  return converted;
+Pair Encoder::PairOf(int64_t row) const noexcept {
+  const PairKernels& kernels = IsVideoRange(mFormat) ? kFromVuyx : kFromBgrx;
+  if (!IsFieldPicture(mFormat)) return {2 * row, 2 * row + 1, kernels.even[mVariant]};
+  const int64_t parity = row % 2, first = row / 2 * 4 + parity;
+  return {first, first + 2, (parity == 0 ? kernels.nearFirst : kernels.nearSecond)[mVariant]};
 }
 
-void Encoder::WriteChroma(const uint8_t* a, const uint8_t* b, const LinePair& pair, int64_t row,
-                          const SumRows& sums) const noexcept {
-  kSumLines[mVariant](a, b, pair.weightA, pair.weightB, sums, static_cast<size_t>(mWidth));
-  for (uint16_t* const pixels : {sums.outer, sums.inner}) {  // the edges go on
-    std::copy_n(pixels, 2, pixels - 2);
-    std::copy_n(pixels + 2 * ptrdiff_t{mWidth} - 2, 2, pixels + 2 * ptrdiff_t{mWidth});
-  }
-  mMakeChroma(sums, mEncoding.chroma, PlaneRow(1, row), PlaneRow(2, row), static_cast<size_t>(mChromaWidth));
-}
-
-VX_Result Encoder::Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* converter) noexcept {
-  mTop = top;
-  mSrcRowBytes = rowBytes;
-  mConverter = converter;
-  const auto pad = [](size_t bytes) { return (bytes + 63) & ~size_t{63}; };
+VX_Result Encoder::Run(Lines& lines) const noexcept {
+  const Factors& factors = Colorimetry(mFormat) == 0 ? kFactors601 : kFactors709;
   const auto width = static_cast<size_t>(mWidth);
-  const size_t pixelBytes = converter ? pad(4 * width) : 0, converterBytes = converter ? converter->ScratchBytes() : 0;
-  const size_t sumWords = pad(2 * width + 2 * kSumSlack);
-  VX_SCRATCH(scratch, 2 * pixelBytes + 4 * sumWords + converterBytes);
+  const auto chromaWidth = static_cast<size_t>(ChromaWidth(PictureFromBlock(mPlanes[0], mFormat, mWidth, mHeight)));
+  const int64_t chromaRows = mHeight / 2 + mHeight % 2, pairs = chromaRows + (IsFieldPicture(mFormat) ? 1 : 0);
+  const size_t noChromaBytes = Pad(chromaWidth + 1);
+  VX_SCRATCH(scratch, noChromaBytes + lines.ScratchBytes());
   if (!scratch) return VX_ErrOutOfMemory;
-  uint8_t* const rows[2] = {scratch.get(), scratch.get() + pixelBytes};
-  auto* const words = reinterpret_cast<uint16_t*>(scratch.get() + 2 * pixelBytes) + kSumSlack;
-  const SumRows sums = {words, words + sumWords};
-  if (converter) converter->UseScratch(scratch.get() + 2 * pixelBytes + 4 * sumWords);
-
-  const int64_t chromaRows = mHeight / 2 + mHeight % 2, pairs = chromaRows + (mOneField ? 1 : 0);
+  lines.UseScratch(scratch.get() + noChromaBytes);
   for (int64_t row = 0; row < pairs; ++row) {
-    const LinePair pair = PairOf(row, mOneField);
+    const Pair pair = PairOf(row), next = PairOf(row + 1);
     if (pair.a >= mHeight) continue;
-    const uint8_t* const a = Line(pair.a, rows[0]);
-    const uint8_t* const b = pair.b < mHeight ? Line(pair.b, rows[1]) : a;
-    mMakeLuma(a, mEncoding.luma, PlaneRow(0, pair.a), width);
-    if (b != a) mMakeLuma(b, mEncoding.luma, PlaneRow(0, pair.b), width);
-    if (row < chromaRows && mChromaWidth > 0) WriteChroma(a, b, pair, row, sums);
+    const int64_t lineB = pair.b < mHeight ? pair.b : pair.a;
+    const uint8_t* const a = lines.Get(pair.a, 0);
+    const uint8_t* const b = lineB == pair.a ? a : lines.Get(lineB, 1);
+    const bool hasChroma = row < chromaRows;
+    pair.encode({a, b, PlaneRow(0, pair.a), PlaneRow(0, lineB), hasChroma ? PlaneRow(1, row) : scratch.get(),
+                 hasChroma ? PlaneRow(2, row) : scratch.get(), lines.Address(next.a), lines.Address(next.b), width,
+                 chromaWidth},
+                factors);
   }
   return VX_Success;
 }
@@ -137,23 +172,36 @@ VX_Result Encoder::Run(const uint8_t* top, ptrdiff_t rowBytes, RowConverter* con
 }  // namespace
 
 VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, VX_PixelFormat dstFormat,
-                    int32_t width, int32_t height) noexcept {
+                    int32_t width, int32_t height, int32_t quality) noexcept {
   if (IsSpecial(srcFormat) || !CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
   const FpModeGuard fpMode;
-  const VX_PixelFormat working =
-      IsVideoRange(dstFormat) ? VX_PixelFormat::VUYX_4444_8u_709 : VX_PixelFormat::BGRX_4444_8u;
-  RowConverter converter;
-  if (const VX_Result result = converter.Prepare(srcFormat, working, kRowQuality, width)) return result;
+  Lines lines(width);
+  if (const VX_Result result = lines.Convert(srcFormat, WorkingFormat(dstFormat), quality)) return result;
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;
   const auto* top = static_cast<const uint8_t*>(src);
-  ptrdiff_t rowBytes = srcRowBytes;
-  if (VX_IsOriginBottomLeft(srcFormat)) {
-    top += (height - 1) * rowBytes;
-    rowBytes = -rowBytes;
-  }
-  return Encoder(dstFormat, dst, width, height).Run(top, rowBytes, srcFormat == working ? nullptr : &converter);
+  if (VX_IsOriginBottomLeft(srcFormat))
+    lines.SetRaster(top + (height - 1) * ptrdiff_t{srcRowBytes}, -ptrdiff_t{srcRowBytes});
+  else
+    lines.SetRaster(top, srcRowBytes);
+  return Encoder(dstFormat, dst, width, height).Run(lines);
+}
+
+VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat decoded, int32_t decodeQuality, void* dst,
+                    VX_PixelFormat dstFormat, int32_t width, int32_t height, int32_t quality) noexcept {
+  if (!CanDecode420(srcFormat)) return VX_ErrUnsupportedFormat;
+  if (!CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
+  const FpModeGuard fpMode;
+  const Picture420 picture = PictureFromBlock(src, srcFormat, width, height);
+  Lines lines(width);
+  if (const VX_Result result = lines.Decode(picture, decoded, decodeQuality)) return result;
+  if (const VX_Result result = lines.Convert(decoded, WorkingFormat(dstFormat), quality)) return result;
+  if (width < 1 || height < 1) return VX_Success;
+  if (!src) return VX_ErrNullSource;
+  if (!dst) return VX_ErrNullDestination;
+  TraceFullSize420(picture);
+  return Encoder(dstFormat, dst, width, height).Run(lines);
 }
 
 }  // namespace vexel

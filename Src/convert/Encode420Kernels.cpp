@@ -1,5 +1,6 @@
 #include "convert/Encode420Kernels.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -17,8 +18,19 @@
 namespace vexel::encode420 {
 namespace {
 
-// Fractional bits of luma sums, and of chroma sums: those of the factors and of weights that total 16.
-inline constexpr int kLumaBits = 15, kWeightBits = 4, kChromaBits = kLumaBits + kWeightBits;
+// Fractional bits of the factors.
+inline constexpr int kFactorBits = 15;
+
+// Weights of the two lines that make a chroma row; kBits are the fractional bits of their sums, filtered across.
+template <int kWeightA, int kWeightB>
+struct Weights {
+  static constexpr int kA = kWeightA, kB = kWeightB;
+  static constexpr int kBits = kA + kB == 4 ? 4 : 3;
+  static_assert(4 * (kA + kB) == 1 << kBits);
+};
+using Even = Weights<1, 1>;
+using NearFirst = Weights<3, 1>;
+using NearSecond = Weights<1, 3>;
 
 }  // namespace
 }  // namespace vexel::encode420
@@ -33,123 +45,201 @@ using namespace vexel::HWY_NAMESPACE;
 using hwy::HWY_NAMESPACE::ScalableTag;
 
 constexpr size_t kPixels = kLanes<uint32_t>;  // in a vector
-constexpr size_t kOutputs = 4 * kPixels;      // bytes in a vector
+constexpr size_t kBlock = 4 * kPixels;
 
 HWY_INLINE I32 Set(int32_t value) { return hn::Set(ScalableTag<int32_t>(), value); }
 
-// Channels 0 and 2, or 1 and 3, of each pixel as words.
-HWY_INLINE U16 Outer(U8 pixels) { return AsU16(hn::And(pixels, Dwords(0x00FF00FF))); }
-HWY_INLINE U16 Inner(U8 pixels) { return hn::ShiftRight<8>(AsU16(pixels)); }
-
-// The product of factors and a pixel's channels.
-struct Dot {
-  I16 outer, inner;
-  explicit HWY_INLINE Dot(const BgrFactors& f) : outer(WordPair(f.b, f.r)), inner(WordPair(f.g, 0)) {}
-  HWY_INLINE I32 operator()(U16 outerPixels, U16 innerPixels) const {
-    return hn::Add(MultiplyPairs(AsI16(outerPixels), outer), MultiplyPairs(AsI16(innerPixels), inner));
-  }
-};
-
-void LumaFromBgrx(const uint8_t* pixels, const BgrFactors& factors, uint8_t* luma, size_t count) {
-  const Dot dot(factors);
-  const auto make = [&](const uint8_t* in, size_t index) HWY_ATTR {
-    const U8 p = LoadVector<uint8_t>(in, index);
-    return hn::ShiftRight<kLumaBits>(hn::Add(dot(Outer(p), Inner(p)), Set(1 << (kLumaBits - 1))));
-  };
-  RowLoop<kOutputs, 4, 1>(pixels, luma, count, [&](const uint8_t* in, uint8_t* out) HWY_ATTR {
-    StoreVector(PackTo8(make(in, 0), make(in, 1), make(in, 2), make(in, 3)), out);
-  });
-}
-
-void LumaFromVuyx(const uint8_t* pixels, const BgrFactors&, uint8_t* luma, size_t count) {
-  const auto take = [](const uint8_t* in, size_t index) HWY_ATTR {
-    return AsI32(hn::And(hn::ShiftRight<16>(LoadVector<uint32_t>(in, index)), hn::Set(ScalableTag<uint32_t>(), 255)));
-  };
-  RowLoop<kOutputs, 4, 1>(pixels, luma, count, [&](const uint8_t* in, uint8_t* out) HWY_ATTR {
-    StoreVector(PackTo8(take(in, 0), take(in, 1), take(in, 2), take(in, 3)), out);
-  });
-}
-
-void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums, size_t count) {
-  const ScalableTag<uint16_t> d;
-  const U16 wa = hn::Set(d, static_cast<uint16_t>(weightA)), wb = hn::Set(d, static_cast<uint16_t>(weightB));
-  const auto sum = [&](const uint8_t* inA, const uint8_t* inB, size_t i) HWY_ATTR {
-    const U8 pa = LoadVector<uint8_t>(inA), pb = LoadVector<uint8_t>(inB);
-    hn::StoreU(hn::Add(hn::Mul(Outer(pa), wa), hn::Mul(Outer(pb), wb)), d, sums.outer + 2 * i);
-    hn::StoreU(hn::Add(hn::Mul(Inner(pa), wa), hn::Mul(Inner(pb), wb)), d, sums.inner + 2 * i);
-  };
-  size_t i = 0;
-  for (; i + kPixels <= count; i += kPixels) sum(a + 4 * i, b + 4 * i, i);
-  if (i == count) return;
-  alignas(64) uint8_t tailA[4 * kPixels] = {};
-  alignas(64) uint8_t tailB[4 * kPixels] = {};
-  std::memcpy(tailA, a + 4 * i, 4 * (count - i));
-  std::memcpy(tailB, b + 4 * i, 4 * (count - i));
-  sum(tailA, tailB, i);
-}
-
-// (1, 2, 1) about the even ones of the pixels from `sums` on.
-HWY_INLINE U16 Filter(const uint16_t* sums) {
-  const ScalableTag<uint16_t> d;
-  const ScalableTag<uint32_t> d32;
-  const auto load = [&](ptrdiff_t pixel) HWY_ATTR { return hn::BitCast(d32, hn::LoadU(d, sums + 2 * pixel)); };
-  const U32 low = load(0), high = load(kPixels);
-  const U16 even = AsU16(hn::ConcatEven(d32, high, low)), odd = AsU16(hn::ConcatOdd(d32, high, low));
-  const U16 before = AsU16(hn::ConcatEven(d32, load(kPixels - 1), load(-1)));
-  return hn::Add(hn::Add(even, even), hn::Add(odd, before));
-}
-
-// Two filtered vectors of words, channels by pairs, of kPixels chroma samples.
-struct Filtered {
+// Words of pixels: channels 0 and 2, and channels 1 and 3, side by side.
+struct Words {
   U16 outer, inner;
-  HWY_INLINE Filtered(const SumRows& sums, size_t sample)
-      : outer(Filter(sums.outer + 4 * sample)), inner(Filter(sums.inner + 4 * sample)) {}
+  static HWY_INLINE Words Of(U8 pixels) {
+    return {AsU16(hn::And(pixels, Dwords(0x00FF00FF))), hn::ShiftRight<8>(AsU16(pixels))};
+  }
 };
 
-// make(filtered, u, v) for each vector of sums, then bytes.
-template <class Make>
-HWY_INLINE void ChromaLoop(const SumRows& sums, uint8_t* u, uint8_t* v, size_t count, const Make& make) {
-  for (size_t i = 0; i < count; i += kOutputs) {
-    I32 us[4], vs[4];
-    for (size_t k = 0; k < 4; ++k) {
-      // Past the end of the row there is nothing to read.
-      if (k != 0 && i + k * kPixels >= count)
-        us[k] = vs[k] = Set(0);
-      else
-        make(Filtered(sums, i + k * kPixels), us[k], vs[k]);
-    }
-    const U8 bytesU = PackTo8(us[0], us[1], us[2], us[3]), bytesV = PackTo8(vs[0], vs[1], vs[2], vs[3]);
-    if (count - i >= kOutputs) {
-      StoreVector(bytesU, u + i);
-      StoreVector(bytesV, v + i);
-    } else {
-      alignas(64) uint8_t tail[kOutputs];
-      StoreVector(bytesU, tail);
-      std::memcpy(u + i, tail, count - i);
-      StoreVector(bytesV, tail);
-      std::memcpy(v + i, tail, count - i);
-    }
+template <class W>
+HWY_INLINE U16 WeightedSum(U16 a, U16 b) {
+  const U16 sum = hn::Add(a, b);
+  if constexpr (W::kA == 3) return hn::Add(sum, hn::Add(a, a));
+  if constexpr (W::kB == 3) return hn::Add(sum, hn::Add(b, b));
+  return sum;
+}
+
+// The pixels one to the left: the last one of `before`, then all but the last.
+HWY_INLINE U16 PixelBefore(U16 before, U16 v) {
+#if HWY_TARGET == HWY_AVX3
+  return U16{_mm512_alignr_epi32(v.raw, before.raw, 15)};
+#elif HWY_TARGET == HWY_AVX2
+  return U16{_mm256_alignr_epi8(v.raw, _mm256_permute2x128_si256(before.raw, v.raw, 0x21), 12)};
+#else
+  return U16{_mm_alignr_epi8(v.raw, before.raw, 12)};
+#endif
+}
+
+// Sums of two neighbouring pixels each: those of an even one and the one before, and those with the one behind, meet
+// in the filter about the even pixel. In each 128-bit block the results of `low` come before those of `high`.
+HWY_INLINE U16 AddNeighbours(U16 low, U16 high) {
+#if HWY_TARGET == HWY_AVX3
+  const __m512 a = _mm512_castsi512_ps(low.raw), b = _mm512_castsi512_ps(high.raw);
+  const U16 even{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0x88))};
+  const U16 odd{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0xDD))};
+#elif HWY_TARGET == HWY_AVX2
+  const __m256 a = _mm256_castsi256_ps(low.raw), b = _mm256_castsi256_ps(high.raw);
+  const U16 even{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0x88))};
+  const U16 odd{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0xDD))};
+#else
+  const __m128 a = _mm_castsi128_ps(low.raw), b = _mm_castsi128_ps(high.raw);
+  const U16 even{_mm_castps_si128(_mm_shuffle_ps(a, b, 0x88))};
+  const U16 odd{_mm_castps_si128(_mm_shuffle_ps(a, b, 0xDD))};
+#endif
+  return hn::Add(even, odd);
+}
+
+// 32-bit results of two vectors of samples each for U and V to bytes in memory order, U in the lower half.
+HWY_INLINE U8 PackChroma(I32 u0, I32 u1, I32 v0, I32 v1) {
+  const ScalableTag<int16_t> d;
+  const U8 packed = PackBlocks(hn::ReorderDemote2To(d, u0, u1), hn::ReorderDemote2To(d, v0, v1));
+#if HWY_TARGET == HWY_AVX3
+  alignas(64) static constexpr uint16_t kOrder[32] = {0, 8,  16, 24, 1, 9,  17, 25, 2, 10, 18, 26, 3, 11, 19, 27,
+                                                      4, 12, 20, 28, 5, 13, 21, 29, 6, 14, 22, 30, 7, 15, 23, 31};
+  return U8{_mm512_permutexvar_epi16(_mm512_load_si512(kOrder), packed.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  static constexpr ShuffleTable kOrder({0, 1, 8, 9, 2, 3, 10, 11, 4, 5, 12, 13, 6, 7, 14, 15});
+  return hn::TableLookupBytes(OrderPacked2(packed), kOrder.Load());
+#else
+  return packed;
+#endif
+}
+
+// Luma of a vector of pixels, and chroma of a vector of filtered ones.
+struct FromBgr {
+  I16 lumaOuter, lumaInner, uOuter, uInner, vOuter, vInner;
+  explicit HWY_INLINE FromBgr(const Factors& f)
+      : lumaOuter(WordPair(f.luma.b, f.luma.r)),
+        lumaInner(WordPair(f.luma.g, 0)),
+        uOuter(WordPair(f.u.b, f.u.r)),
+        uInner(WordPair(f.u.g, 0)),
+        vOuter(WordPair(f.v.b, f.v.r)),
+        vInner(WordPair(f.v.g, 0)) {}
+  template <int kBits>
+  static HWY_INLINE I32 Dot(const Words& pixels, I16 outer, I16 inner, int32_t base) {
+    const I32 sum = hn::Add(MultiplyPairs(AsI16(pixels.outer), outer), MultiplyPairs(AsI16(pixels.inner), inner));
+    return hn::ShiftRight<kBits>(hn::Add(sum, Set((base << kBits) + (1 << (kBits - 1)))));
   }
+  HWY_INLINE I32 Luma(const Words& pixels) const { return Dot<kFactorBits>(pixels, lumaOuter, lumaInner, 0); }
+  template <int kBits>
+  HWY_INLINE I32 U(const Words& sums) const {
+    return Dot<kFactorBits + kBits>(sums, uOuter, uInner, 128);
+  }
+  template <int kBits>
+  HWY_INLINE I32 V(const Words& sums) const {
+    return Dot<kFactorBits + kBits>(sums, vOuter, vInner, 128);
+  }
+};
+
+struct FromVuy {
+  explicit HWY_INLINE FromVuy(const Factors&) {}
+  template <int kBits>
+  static HWY_INLINE I32 Round(U16 words) {
+    return hn::ShiftRight<kBits>(hn::Add(hn::And(AsI32(words), Set(0xFFFF)), Set(1 << (kBits - 1))));
+  }
+  HWY_INLINE I32 Luma(const Words& pixels) const { return hn::ShiftRight<16>(AsI32(pixels.outer)); }
+  template <int kBits>
+  HWY_INLINE I32 U(const Words& sums) const {
+    return Round<kBits>(sums.inner);
+  }
+  template <int kBits>
+  HWY_INLINE I32 V(const Words& sums) const {
+    return Round<kBits>(sums.outer);
+  }
+};
+
+template <class W, class Op>
+class Encoder {
+ public:
+  // The first pixel goes on to the left.
+  HWY_INLINE Encoder(const Factors& factors, const uint8_t* a, const uint8_t* b) : mOp(factors) {
+    uint32_t pixelA, pixelB;
+    std::memcpy(&pixelA, a, 4);
+    std::memcpy(&pixelB, b, 4);
+    mBefore = Sum(Words::Of(Dwords(pixelA)), Words::Of(Dwords(pixelB)));
+  }
+
+  HWY_INLINE void Block(const uint8_t* a, const uint8_t* b, uint8_t* lumaA, uint8_t* lumaB, uint8_t* u, uint8_t* v) {
+    const ScalableTag<uint8_t> d;
+    const hn::Half<decltype(d)> dHalf;
+    I32 ya[4], yb[4];
+    Words pairs[4];
+    for (size_t k = 0; k < 4; ++k) {
+      const Words wordsA = Words::Of(LoadVector<uint8_t>(a, k)), wordsB = Words::Of(LoadVector<uint8_t>(b, k));
+      ya[k] = mOp.Luma(wordsA);
+      yb[k] = mOp.Luma(wordsB);
+      const Words sum = Sum(wordsA, wordsB);
+      pairs[k] = {hn::Add(sum.outer, PixelBefore(mBefore.outer, sum.outer)),
+                  hn::Add(sum.inner, PixelBefore(mBefore.inner, sum.inner))};
+      mBefore = sum;
+    }
+    StoreVector(PackTo8(ya[0], ya[1], ya[2], ya[3]), lumaA);
+    StoreVector(PackTo8(yb[0], yb[1], yb[2], yb[3]), lumaB);
+    const Words low = Filter(pairs[0], pairs[1]), high = Filter(pairs[2], pairs[3]);
+    const U8 chroma = PackChroma(mOp.template U<W::kBits>(low), mOp.template U<W::kBits>(high),
+                                 mOp.template V<W::kBits>(low), mOp.template V<W::kBits>(high));
+    hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
+    hn::StoreU(hn::UpperHalf(dHalf, chroma), dHalf, v);
+  }
+
+ private:
+  static HWY_INLINE Words Sum(const Words& a, const Words& b) {
+    return {WeightedSum<W>(a.outer, b.outer), WeightedSum<W>(a.inner, b.inner)};
+  }
+  static HWY_INLINE Words Filter(const Words& low, const Words& high) {
+    return {AddNeighbours(low.outer, high.outer), AddNeighbours(low.inner, high.inner)};
+  }
+
+  const Op mOp;
+  Words mBefore;
+};
+
+// Asks for memory. Addresses that are not there do no harm.
+template <size_t kBytes>
+HWY_INLINE void Fetch(uintptr_t address) {
+  for (size_t offset = 0; offset < kBytes; offset += 64)
+    __builtin_prefetch(reinterpret_cast<const void*>(address + offset));
 }
 
-void ChromaFromBgrx(const SumRows& sums, const ChromaFactors& factors, uint8_t* u, uint8_t* v, size_t count) {
-  const Dot dotU(factors.u), dotV(factors.v);
-  const I32 bias = Set((128 << kChromaBits) + (1 << (kChromaBits - 1)));
-  ChromaLoop(sums, u, v, count, [&](const Filtered& f, I32& outU, I32& outV) HWY_ATTR {
-    outU = hn::ShiftRight<kChromaBits>(hn::Add(dotU(f.outer, f.inner), bias));
-    outV = hn::ShiftRight<kChromaBits>(hn::Add(dotV(f.outer, f.inner), bias));
-  });
+template <class W, class Op>
+HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
+  Encoder<W, Op> encoder(factors, lines.a, lines.b);
+  size_t x = 0;
+  for (; x + kBlock <= lines.width; x += kBlock) {
+    Fetch<4 * kBlock>(lines.nextA + 4 * x);
+    Fetch<4 * kBlock>(lines.nextB + 4 * x);
+    encoder.Block(lines.a + 4 * x, lines.b + 4 * x, lines.lumaA + x, lines.lumaB + x, lines.u + x / 2, lines.v + x / 2);
+  }
+  const size_t rest = lines.width - x;
+  if (rest == 0) return;
+  // The last pixel goes on to the right.
+  alignas(64) uint8_t a[4 * kBlock] = {};
+  alignas(64) uint8_t b[4 * kBlock] = {};
+  std::memcpy(a, lines.a + 4 * x, 4 * rest);
+  std::memcpy(b, lines.b + 4 * x, 4 * rest);
+  std::memcpy(a + 4 * rest, lines.a + 4 * (lines.width - 1), 4);
+  std::memcpy(b + 4 * rest, lines.b + 4 * (lines.width - 1), 4);
+  alignas(64) uint8_t lumaA[kBlock], lumaB[kBlock], u[kBlock / 2], v[kBlock / 2];
+  encoder.Block(a, b, lumaA, lumaB, u, v);
+  std::memcpy(lines.lumaA + x, lumaA, rest);
+  std::memcpy(lines.lumaB + x, lumaB, rest);
+  std::memcpy(lines.u + x / 2, u, lines.chromaWidth - x / 2);
+  std::memcpy(lines.v + x / 2, v, lines.chromaWidth - x / 2);
 }
 
-void ChromaFromVuyx(const SumRows& sums, const ChromaFactors&, uint8_t* u, uint8_t* v, size_t count) {
-  const auto take = [](U16 pairs) HWY_ATTR {
-    const I32 low = hn::And(AsI32(pairs), Set(0xFFFF));
-    return hn::ShiftRight<kWeightBits>(hn::Add(low, Set(1 << (kWeightBits - 1))));
-  };
-  ChromaLoop(sums, u, v, count, [&](const Filtered& f, I32& outU, I32& outV) HWY_ATTR {
-    outU = take(f.inner);
-    outV = take(f.outer);
-  });
+template <class W>
+void EncodeBgrx(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromBgr>(lines, factors);
+}
+template <class W>
+void EncodeVuyx(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromVuy>(lines, factors);
 }
 
 }  // namespace
@@ -169,50 +259,81 @@ uint8_t Round(int32_t sum) {
   return static_cast<uint8_t>(code < 0 ? 0 : code > 255 ? 255 : code);
 }
 
-void LumaFromBgrx(const uint8_t* pixels, const BgrFactors& f, uint8_t* luma, size_t count) {
-  for (size_t x = 0; x < count; ++x) {
-    const uint8_t* p = pixels + 4 * x;
-    luma[x] = Round<kLumaBits>(p[0] * f.b + p[1] * f.g + p[2] * f.r);
+struct FromBgr {
+  const Factors& factors;
+  static int32_t Dot(const BgrFactors& f, const int32_t* p) { return p[0] * f.b + p[1] * f.g + p[2] * f.r; }
+  uint8_t Luma(const int32_t* pixel) const { return Round<kFactorBits>(Dot(factors.luma, pixel)); }
+  template <int kBits>
+  uint8_t Chroma(const BgrFactors& f, const int32_t* sums) const {
+    return Round<kFactorBits + kBits>(Dot(f, sums) + (128 << (kFactorBits + kBits)));
+  }
+  template <int kBits>
+  uint8_t U(const int32_t* sums) const {
+    return Chroma<kBits>(factors.u, sums);
+  }
+  template <int kBits>
+  uint8_t V(const int32_t* sums) const {
+    return Chroma<kBits>(factors.v, sums);
+  }
+};
+
+struct FromVuy {
+  explicit FromVuy(const Factors&) {}
+  uint8_t Luma(const int32_t* pixel) const { return static_cast<uint8_t>(pixel[2]); }
+  template <int kBits>
+  uint8_t U(const int32_t* sums) const {
+    return Round<kBits>(sums[1]);
+  }
+  template <int kBits>
+  uint8_t V(const int32_t* sums) const {
+    return Round<kBits>(sums[0]);
+  }
+};
+
+template <class Op>
+void LumaRow(const uint8_t* pixels, uint8_t* luma, size_t width, const Op& op) {
+  for (size_t x = 0; x < width; ++x) {
+    const int32_t pixel[3] = {pixels[4 * x], pixels[4 * x + 1], pixels[4 * x + 2]};
+    luma[x] = op.Luma(pixel);
   }
 }
 
-void LumaFromVuyx(const uint8_t* pixels, const BgrFactors&, uint8_t* luma, size_t count) {
-  for (size_t x = 0; x < count; ++x) luma[x] = pixels[4 * x + 2];
-}
-
-void SumLines(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums, size_t count) {
-  for (size_t i = 0; i < 2 * count; ++i) {
-    sums.outer[i] = static_cast<uint16_t>(weightA * a[2 * i] + weightB * b[2 * i]);
-    sums.inner[i] = static_cast<uint16_t>(weightA * a[2 * i + 1] + weightB * b[2 * i + 1]);
+template <class W, class Op>
+void EncodeRows(const LinePair& lines, const Factors& factors) {
+  const Op op{factors};
+  LumaRow(lines.a, lines.lumaA, lines.width, op);
+  LumaRow(lines.b, lines.lumaB, lines.width, op);
+  for (size_t i = 0; i < lines.chromaWidth; ++i) {
+    const size_t x = 2 * i, left = x == 0 ? 0 : x - 1, right = std::min(x + 1, lines.width - 1);
+    int32_t sums[3];
+    for (size_t k = 0; k < 3; ++k) {
+      const auto across = [&](const uint8_t* line) {
+        return line[4 * left + k] + 2 * line[4 * x + k] + line[4 * right + k];
+      };
+      sums[k] = W::kA * across(lines.a) + W::kB * across(lines.b);
+    }
+    lines.u[i] = op.template U<W::kBits>(sums);
+    lines.v[i] = op.template V<W::kBits>(sums);
   }
 }
 
-// (1, 2, 1) about pixel 2 i of every second word.
-int32_t Filter(const uint16_t* words, size_t i) { return *(words + 4 * i - 2) + 2 * words[4 * i] + words[4 * i + 2]; }
-
-void ChromaFromBgrx(const SumRows& sums, const ChromaFactors& f, uint8_t* u, uint8_t* v, size_t count) {
-  for (size_t i = 0; i < count; ++i) {
-    const int32_t b = Filter(sums.outer, i), g = Filter(sums.inner, i), r = Filter(sums.outer + 1, i);
-    u[i] = Round<kChromaBits>(b * f.u.b + g * f.u.g + r * f.u.r + (128 << kChromaBits));
-    v[i] = Round<kChromaBits>(b * f.v.b + g * f.v.g + r * f.v.r + (128 << kChromaBits));
-  }
+template <class W>
+void EncodeBgrx(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromBgr>(lines, factors);
 }
-
-void ChromaFromVuyx(const SumRows& sums, const ChromaFactors&, uint8_t* u, uint8_t* v, size_t count) {
-  for (size_t i = 0; i < count; ++i) {
-    u[i] = Round<kWeightBits>(Filter(sums.inner, i));
-    v[i] = Round<kWeightBits>(Filter(sums.outer, i));
-  }
+template <class W>
+void EncodeVuyx(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromVuy>(lines, factors);
 }
 
 }  // namespace
 }  // namespace plain
 
-const KernelVariants<MakeLuma> kLumaFromBgrx = VX_KERNEL_VARIANTS(LumaFromBgrx);
-const KernelVariants<MakeLuma> kLumaFromVuyx = VX_KERNEL_VARIANTS(LumaFromVuyx);
-const KernelVariants<encode420::SumLines> kSumLines = VX_KERNEL_VARIANTS(SumLines);
-const KernelVariants<MakeChroma> kChromaFromBgrx = VX_KERNEL_VARIANTS(ChromaFromBgrx);
-const KernelVariants<MakeChroma> kChromaFromVuyx = VX_KERNEL_VARIANTS(ChromaFromVuyx);
+#define VX_PAIR_KERNELS(Encode) \
+  { VX_KERNEL_VARIANTS(Encode<Even>), VX_KERNEL_VARIANTS(Encode<NearFirst>), VX_KERNEL_VARIANTS(Encode<NearSecond>) }
+const PairKernels kFromBgrx = VX_PAIR_KERNELS(EncodeBgrx);
+const PairKernels kFromVuyx = VX_PAIR_KERNELS(EncodeVuyx);
+#undef VX_PAIR_KERNELS
 
 }  // namespace vexel::encode420
 #endif

@@ -1,4 +1,4 @@
-// The stages of 4:2:0 encoding from four-channel 8-bit pixels.
+// The kernels of 4:2:0 encoding from four-channel 8-bit pixels.
 #pragma once
 
 #include <cstddef>
@@ -8,35 +8,29 @@
 
 namespace vexel::encode420 {
 
-// Factors of B, G and R in 1/32768.
+// Factors of B, G and R in 1/32768: for luma 32768 in all, for chroma 0. Pixels of V, U and Y need none.
 struct BgrFactors {
   int16_t b, g, r;
 };
-
-using MakeLuma = void (*)(const uint8_t* pixels, const BgrFactors& factors, uint8_t* luma, size_t count);
-extern const KernelVariants<MakeLuma> kLumaFromBgrx;  // factors that total 32768
-extern const KernelVariants<MakeLuma> kLumaFromVuyx;  // takes Y, no factors
-
-// A row of sums has a pair of words for each pixel. They are scratch memory of kSumSlack words more than they hold on
-// either side, which kernels read and write by whole vectors; rows of pictures are read and written exactly.
-inline constexpr size_t kSumSlack = 64;
-struct SumRows {
-  uint16_t* outer;  // channels 0 and 2
-  uint16_t* inner;  // channels 1 and 3
+struct Factors {
+  BgrFactors luma, u, v;
 };
 
-// weightA a + weightB b, the weights 4 in all.
-using SumLines = void (*)(const uint8_t* a, const uint8_t* b, int weightA, int weightB, const SumRows& sums,
-                          size_t count);
-extern const KernelVariants<SumLines> kSumLines;
-
-// Chroma about 128 at the even columns of sums, filtered with (1, 2, 1) / 4. `count` samples, for which the sums reach
-// one pixel beyond both ends.
-struct ChromaFactors {
-  BgrFactors u, v;  // each totals 0
+// Two lines of pixels, the rows of luma made of them, and the row of either chroma plane that they share. The ends of
+// lines go on for the chroma filter, (1, 2, 1) / 4 about the even columns. All rows are read and written exactly.
+struct LinePair {
+  const uint8_t *a, *b;  // one line twice, luma rows and all, where the picture ends between them
+  uint8_t *lumaA, *lumaB;
+  uint8_t *u, *v;
+  uintptr_t nextA, nextB;     // asked for, not read: lines that lie downward in memory are not fetched ahead
+  size_t width, chromaWidth;  // chroma may lack the last sample of an odd width
 };
-using MakeChroma = void (*)(const SumRows& sums, const ChromaFactors& factors, uint8_t* u, uint8_t* v, size_t count);
-extern const KernelVariants<MakeChroma> kChromaFromBgrx;
-extern const KernelVariants<MakeChroma> kChromaFromVuyx;  // takes U and V, no factors
+using EncodeLines = void (*)(const LinePair& lines, const Factors& factors);
+
+// By the weights of the two lines in chroma.
+struct PairKernels {
+  KernelVariants<EncodeLines> even, nearFirst, nearSecond;  // (2, 2), (3, 1), (1, 3)
+};
+extern const PairKernels kFromBgrx, kFromVuyx;
 
 }  // namespace vexel::encode420

@@ -58,7 +58,13 @@ DecodePlan PlanDecode420(VX_PixelFormat srcFormat, int32_t srcWidth, int32_t src
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t width, int32_t height, void* dst,
                     int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t quality) noexcept;
 
-// The same at a size of its own and for one field (0 whole, 1 upper, 2 lower).
+// The same by way of a format that the decoder makes (Rows420::CanMake), row for row: the bytes of a decode to that
+// format and a conversion from it.
+VX_Result Decode420Through(VX_PixelFormat decoded, const void* src, VX_PixelFormat srcFormat, int32_t width,
+                           int32_t height, void* dst, int32_t dstRowBytes, VX_PixelFormat dstFormat,
+                           int32_t quality) noexcept;
+
+// Decodes at a size of its own and for one field (0 whole, 1 upper, 2 lower).
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t srcWidth, int32_t srcHeight, void* dst,
                     int32_t dstRowBytes, int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat, int32_t field,
                     int32_t quality) noexcept;
@@ -66,8 +72,14 @@ VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t srcWidth,
 // Encodes a raster into a block. Planar full range takes BGRX_4444_8u (or another 8-bit BGR of four channels) and
 // planar video range BT.709 any raster; VX_ErrFormatNotHandled for every other pair. Chroma is filtered at its siting:
 // (1, 2, 1) / 4 across, the mean of both lines down in frame pictures, (3, 1) / 4 and (1, 3) / 4 of two lines of the
-// field in field pictures. Only samples of the picture are written, padding of rows and planes keeps its bytes.
+// field in field pictures. Only samples of the picture are written, padding of rows and planes keeps its bytes. Rows
+// that need it are converted at `quality` first.
+inline constexpr int32_t kEncodeQuality = 2;  // chroma of 4:2:2 sources is interpolated before it is filtered
 VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, VX_PixelFormat dstFormat,
-                    int32_t width, int32_t height) noexcept;
+                    int32_t width, int32_t height, int32_t quality = kEncodeQuality) noexcept;
+
+// Decodes a block to a format that the decoder makes and encodes that, line for line.
+VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat decoded, int32_t decodeQuality, void* dst,
+                    VX_PixelFormat dstFormat, int32_t width, int32_t height, int32_t quality) noexcept;
 
 }  // namespace vexel

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "convert/Planar420.h"
 #include "convert/RowConverter.h"
 #include "formats/FormatBits.h"
 #include "frame/KernelVariant.h"
@@ -210,6 +211,79 @@ TEST(Convert, AChainGivesTheBytesOfItsSteps) {
       }
       ASSERT_EQ(stepped, chained) << FormatName(src) << " to " << FormatName(dst);
     }
+}
+
+// A picture of any kind, its rows upward or downward in memory.
+struct Picture {
+  F format;
+  int32_t width, height;
+  bool down;
+  std::vector<uint8_t> bytes;
+  Picture(F f, int32_t w, int32_t h, bool upsideDown = false)
+      : format(f),
+        width(w),
+        height(h),
+        down(upsideDown && !IsSpecial(f)),
+        bytes(static_cast<size_t>(VX_PixelFormatSize(f, w, h))) {}
+  int32_t RowBytes() const {
+    if (IsSpecial(format)) return 0;
+    const auto rowBytes = static_cast<int32_t>(bytes.size() / static_cast<size_t>(height));
+    return down ? -rowBytes : rowBytes;
+  }
+  uint8_t* Base() { return down ? &bytes[bytes.size() - bytes.size() / static_cast<size_t>(height)] : bytes.data(); }
+  // The other way up, without what lies between the rows.
+  Picture Turned() const {
+    Picture turned(format, width, height, !down);
+    if (IsSpecial(format)) turned.bytes = bytes;
+    const size_t rowBytes = bytes.size() / static_cast<size_t>(height);
+    for (size_t y = 0; !IsSpecial(format) && y < static_cast<size_t>(height); ++y)
+      std::copy_n(&bytes[y * rowBytes], UnpaddedRowBytes(format, width),
+                  &turned.bytes[(static_cast<size_t>(height) - 1 - y) * rowBytes]);
+    return turned;
+  }
+};
+
+VX_Result Convert(Picture& src, Picture& dst, int32_t quality) {
+  return VX_Convert(src.Base(), src.RowBytes(), src.format, dst.Base(), dst.RowBytes(), dst.format, src.width,
+                    src.height, quality);
+}
+
+// 4:2:0 pictures come and go line by line: with the bytes of whole frames, whichever way up.
+TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
+  struct Size {
+    int32_t width, height;
+  };
+  const Size sizes[] = {{781, 5}, {1, 1}, {34, 6}};
+  std::vector<F> all = testing::Formats420();
+  const std::vector<F> rasters = RasterFormats();
+  all.insert(all.end(), rasters.begin(), rasters.end());
+  int turn = 0, reached = 0;
+  for (const F from : all)
+    for (const F to : all) {
+      F formats[9];
+      int32_t count = 0;
+      const int32_t quality = turn % 3 + 1;
+      if (!Is420(from) && !Is420(to)) continue;
+      if (VX_ExplainConversion(from, to, quality, formats, &count) != VX_Success) continue;
+      if (Is420(from) && HasWideSamples(from) && !IsBiplanar(from)) continue;
+      const Size size = sizes[turn++ % 3];
+      Picture src(from, size.width, size.height);
+      testing::Random random(static_cast<uint64_t>(turn));
+      testing::FillSamples(src.bytes.data(), src.bytes.size(), from, testing::Contents::Random, random);
+      Picture turned = src.Turned(), dst(to, size.width, size.height), dstTurned = dst.Turned();
+      ASSERT_EQ(Convert(src, dst, quality), VX_Success) << FormatName(from) << " to " << FormatName(to);
+      ASSERT_EQ(Convert(turned, dstTurned, quality), VX_Success);
+      Picture stepped = src;
+      for (int i = 1; i < count; ++i) {
+        Picture next(formats[i], size.width, size.height);
+        ASSERT_EQ(Convert(stepped, next, quality), VX_Success);
+        stepped = next;
+      }
+      ASSERT_EQ(stepped.bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to) << " " << size.width;
+      ASSERT_EQ(dstTurned.Turned().bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to);
+      ++reached;
+    }
+  EXPECT_GT(reached, 2000);
 }
 
 }  // namespace
