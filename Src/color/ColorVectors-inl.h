@@ -39,6 +39,7 @@ struct PixelBlock {
   static constexpr size_t kVectors = 16;
   static constexpr size_t kPixels = kVectors * hn::MaxLanes(ColorTag());
   size_t pixels;
+  bool negative;  // A minus sign has been met, in this block or an earlier one.
   HWY_ALIGN float colors[3 * kPixels];
   HWY_ALIGN float alpha[kPixels];
   HWY_ALIGN float scratch[6 * kPixels];
@@ -163,6 +164,7 @@ HWY_INLINE void ForEachRun(const float* src, float* dst, size_t count, size_t mo
 template <class Change>
 HWY_INLINE void ForEachBlock(const float* src, float* dst, size_t count, const Change& change) {
   PixelBlock block;
+  block.negative = false;
   ForEachRun(src, dst, count, PixelBlock::kPixels, [&](const float* from, float* to, size_t pixels) VX_COLOR_STAGE {
     block.pixels = pixels;
     LoadBlock(from, block);
@@ -189,7 +191,7 @@ HWY_INLINE void ForEachPixel(const float* src, float* dst, size_t count, const C
 // Powers of all channels of a block, and the same between two changes of single values.
 template <PowerCore kCore>
 HWY_INLINE void SignedPowers(PixelBlock& block, const PowerExponent& y) {
-  SignedPowers<kCore>(block.colors, 3 * block.pixels, block.scratch, y);
+  SignedPowers<kCore>(block.colors, 3 * block.pixels, block.scratch, y, block.negative);
 }
 template <PowerCore kCore, class Prepare, class Finish>
 HWY_INLINE void Powers(PixelBlock& block, const PowerExponent& y, const Prepare& prepare, const Finish& finish) {

@@ -70,9 +70,11 @@ HWY_INLINE void PqToRec709Loop(const float* src, float* dst, size_t count, const
   const MatrixVectors matrix(local.matrix);
   const ColorTag d;
   ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
-    Powers<PowerCore::Float>(
-        block, kPqInverseM2, [&](ColorVector v) VX_COLOR_STAGE { return hn::Abs(hn::Mul(v, hn::Set(d, local.scale))); },
-        [](ColorVector power, ColorVector v) VX_COLOR_STAGE { return WithSignOf(power, v); });
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      const auto scale = hn::Set(d, local.scale);
+      c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
+    });
+    SignedPowers<PowerCore::Float>(block, kPqInverseM2);
     Powers<PowerCore::Long>(
         block, kPqInverseM1, [](ColorVector v) VX_COLOR_STAGE { return PqDecodingRatio(v); },
         [&](ColorVector power, ColorVector v)

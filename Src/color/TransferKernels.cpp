@@ -33,7 +33,7 @@ HWY_INLINE void SignedPowersOf(PixelBlock& block, const PowerExponent& y) {
   if constexpr (kFloat) {
     SignedPowers<PowerCore::Float>(block, y);
   } else {
-    SignedPowersAny(block.colors, 3 * block.pixels, block.scratch, y);
+    SignedPowersAny(block.colors, 3 * block.pixels, block.scratch, y, block.negative);
   }
 }
 

@@ -40,11 +40,13 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
   b = Power1<kCore, kSigned>(b, y);
   c = Power1<kCore, kSigned>(c, y);
 }
-template <PowerCore kCore, bool kSigned, class Prepare, class Finish>
-HWY_INLINE void PowerLoops(float* values, size_t count, float*, const PowerExponent& y, const Prepare& prepare,
+enum class Signs : uint8_t { ByFinish, Kept, Refused };
+template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
+HWY_INLINE bool PowerLoops(float* values, size_t count, float*, const PowerExponent& y, const Prepare& prepare,
                            const Finish& finish) {
   for (size_t i = 0; i < count; ++i)
     values[i] = finish(Power1<kCore, false>(prepare(V(values[i])), y), V(values[i])).raw;
+  return kSigns != Signs::Refused;
 }
 template <class Prepare, class Finish>
 HWY_INLINE void LogLoops(float* values, size_t count, float*, const vexel::power::ScaledLog2&, const Prepare& prepare,
@@ -467,20 +469,32 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
   }
 }
 
-// The loops keep more vectors in flight than a scheduler finds in one long chain.
-template <PowerCore kCore, bool kSigned, class Prepare, class Finish>
-HWY_INLINE void PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
+// The loops keep more vectors in flight than a scheduler finds in one long chain. kSigns: what they do with negative
+// values; false is returned, with nothing done, where they refuse them.
+enum class Signs : uint8_t { ByFinish, Kept, Refused };
+
+HWY_INLINE bool AnyNegative(const float* values, size_t count) {
+  const D d;
+  const DI di;
+  VI all = hn::Zero(di);
+  for (size_t i = 0; i < count; i += hn::Lanes(d)) all = hn::Or(all, hn::BitCast(di, hn::Load(d, values + i)));
+  return !hn::AllFalse(di, hn::Lt(all, hn::Zero(di)));
+}
+
+template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
+HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
                            const PowerExponent& y, const Prepare& prepare, const Finish& finish) {
   const D d;
   const DI di;
   const size_t lanes = hn::Lanes(d);
+  constexpr bool kSigned = kSigns == Signs::Kept;
   float* HWY_RESTRICT scratch2 = scratch + count;
   if constexpr (kCore == PowerCore::Scalar) {
+    if (kSigns == Signs::Refused && AnyNegative(values, count)) return false;
     for (size_t i = 0; i < count; i += lanes) {
       const V v = hn::Load(d, values + i);
       hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane<false>(prepare(v), y), v), v), d, values + i);
     }
-    return;
   } else {
     VI above = hn::Set(di, INT32_MIN);
     for (size_t i = 0; i < count; i += lanes) {
@@ -491,24 +505,28 @@ HWY_INLINE void PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
       hn::Store(eighths.a, d, scratch + i);
       hn::Store(place.a, d, scratch2 + i);
     }
+    const bool rare = !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
+    if (kSigns == Signs::Refused && HWY_UNLIKELY(rare) && AnyNegative(values, count)) return false;
     for (size_t i = 0; i < count; i += lanes) {
       Bundle<1> whole, f;
       ExponentOf<kCore>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}, y.log, whole, f);
       hn::Store(whole.a, d, scratch + i);
       hn::Store(f.a, d, scratch2 + i);
     }
-    const bool rare = !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
-    for (size_t i = 0; i < count; i += lanes) {
-      const V v = hn::Load(d, values + i);
-      V power = Exp2Of<false>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}).a;
-      if (HWY_UNLIKELY(rare)) {
-        power = WithoutSignedNaN<kSigned>(finish(MendRare<kCore>(power, prepare(v), y), v), v);
-      } else {
-        power = finish(power, v);
+    const auto last = [&](size_t i) VX_POWER_STEP {
+      return Exp2Of<false>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}).a;
+    };
+    if (HWY_LIKELY(!rare)) {
+      for (size_t i = 0; i < count; i += lanes) hn::Store(finish(last(i), hn::Load(d, values + i)), d, values + i);
+    } else {
+      for (size_t i = 0; i < count; i += lanes) {
+        const V v = hn::Load(d, values + i);
+        const V power = MendRare<kCore>(last(i), prepare(v), y);
+        hn::Store(WithoutSignedNaN<kSigned>(finish(power, v), v), d, values + i);
       }
-      hn::Store(power, d, values + i);
     }
   }
+  return true;
 }
 
 HWY_INLINE V SumOfLog(V large, V middle, V small) {
@@ -620,17 +638,28 @@ HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detai
   power_detail::Power3<kCore, true>(a, b, c, y);
 }
 
-// `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value), where finish
-// leaves magnitudes as they are or gives them a sign. `scratch`, aligned too, has room for twice as many.
+// `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value). `scratch`,
+// aligned too, has room for twice as many.
 template <PowerCore kCore, class Prepare, class Finish>
 HWY_INLINE void Powers(float* values, size_t count, float* scratch, const PowerExponent& y, const Prepare& prepare,
                        const Finish& finish) {
-  power_detail::PowerLoops<kCore, false>(values, count, scratch, y, prepare, finish);
+  power_detail::PowerLoops<kCore, power_detail::Signs::ByFinish>(values, count, scratch, y, prepare, finish);
 }
+
+// Powers with the sign of their arguments. `negative` is set by the first call that meets a minus sign; until then
+// signs are neither taken off nor put back.
 template <PowerCore kCore>
-HWY_INLINE void SignedPowers(float* values, size_t count, float* scratch, const PowerExponent& y) {
+HWY_INLINE void SignedPowers(float* values, size_t count, float* scratch, const PowerExponent& y, bool& negative) {
+  using power_detail::PowerLoops;
+  using power_detail::Signs;
   using power_detail::V;
-  power_detail::PowerLoops<kCore, true>(
+  if (!negative) {
+    const bool done = PowerLoops<kCore, Signs::Refused>(
+        values, count, scratch, y, [](V v) VX_POWER_STEP { return v; }, [](V power, V) VX_POWER_STEP { return power; });
+    if (HWY_LIKELY(done)) return;
+    negative = true;
+  }
+  PowerLoops<kCore, Signs::Kept>(
       values, count, scratch, y, [](V v) VX_POWER_STEP { return power_detail::Magnitude<true>(v); },
       [](V power, V v) VX_POWER_STEP { return power_detail::WithSign<true>(power, v); });
 }
@@ -646,13 +675,14 @@ HWY_NOINLINE inline power_detail::V PowerAny(power_detail::V x, const PowerExpon
   if (y.core == PowerCore::Long) return Power<PowerCore::Long>(x, y);
   return Power<PowerCore::Scalar>(x, y);
 }
-HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scratch, const PowerExponent& y) {
+HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scratch, const PowerExponent& y,
+                                         bool& negative) {
   if (y.core == PowerCore::Float) {
-    SignedPowers<PowerCore::Float>(values, count, scratch, y);
+    SignedPowers<PowerCore::Float>(values, count, scratch, y, negative);
   } else if (y.core == PowerCore::Long) {
-    SignedPowers<PowerCore::Long>(values, count, scratch, y);
+    SignedPowers<PowerCore::Long>(values, count, scratch, y, negative);
   } else {
-    SignedPowers<PowerCore::Scalar>(values, count, scratch, y);
+    SignedPowers<PowerCore::Scalar>(values, count, scratch, y, negative);
   }
 }
 HWY_NOINLINE inline void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c,
