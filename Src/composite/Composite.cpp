@@ -74,7 +74,9 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   const OverKernelSet& kernels = premultiplied ? (narrow ? OverPremultiplied8u(choice) : OverPremultiplied32f(choice))
                                                : (narrow ? Over8u(choice) : Over32f(choice));
   const OverKernel over = kernels[job.Variant()];
-  return job.Run([=](const RowSpan& span) { over(span.src[0], span.src[1], span.dst, span.count, opacity); });
+  job.KernelStreams();
+  return job.Run(
+      [=](const RowSpan& span) { over(span.src[0], span.src[1], span.dst, span.count, opacity, span.stream); });
 }
 
 }  // namespace

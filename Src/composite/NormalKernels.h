@@ -9,9 +9,9 @@
 namespace vexel {
 
 // Composites `count` pixels at an opacity of 0..1. Reads and writes no byte outside of the rows; dst may be one of the
-// others.
-using OverKernel = void (*)(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count,
-                            float opacity);
+// others. `stream`: dst is aligned to kStreamAlignment and better written past the cache.
+using OverKernel = void (*)(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity,
+                            bool stream);
 using OverKernelSet = KernelVariants<OverKernel>;
 
 // What a kernel is chosen by. Where alpha is not usable its channel is not looked at and counts as opaque.

@@ -55,18 +55,20 @@ HWY_INLINE F32 Over(F32 s, F32 d, F32 opacity) {
 }
 
 template <OverChoice kChoice>
-HWY_ATTR void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+HWY_ATTR void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity,
+                     bool stream) {
   const auto part = hn::Set(FloatTag(), opacity);
   TwoRowLoop<4 * HWY_MAX_BYTES>(
-      source, background, dst, 16 * count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+      stream, source, background, dst, 16 * count,
+      [&](const uint8_t* from, const uint8_t* onto, const auto& put) HWY_ATTR {
         const auto r0 = Over<kChoice>(LoadVector<float>(from, 0), LoadVector<float>(onto, 0), part);
         const auto r1 = Over<kChoice>(LoadVector<float>(from, 1), LoadVector<float>(onto, 1), part);
         const auto r2 = Over<kChoice>(LoadVector<float>(from, 2), LoadVector<float>(onto, 2), part);
         const auto r3 = Over<kChoice>(LoadVector<float>(from, 3), LoadVector<float>(onto, 3), part);
-        StoreVector(r0, out, 0);
-        StoreVector(r1, out, 1);
-        StoreVector(r2, out, 2);
-        StoreVector(r3, out, 3);
+        put(r0, 0);
+        put(r1, 1);
+        put(r2, 2);
+        put(r3, 3);
       });
 }
 
@@ -82,7 +84,7 @@ namespace plain {
 namespace {
 
 template <OverChoice kChoice>
-void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity, bool) {
   for (size_t i = 0; i < count; ++i) {
     float s[4], d[4];
     std::memcpy(s, source + 16 * i, sizeof s);

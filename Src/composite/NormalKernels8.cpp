@@ -27,7 +27,6 @@ namespace {
 
 // A straight result's alpha up to this counts as none; the colour is black then.
 constexpr float kClearAlpha = 7.6293945e-6f;
-constexpr uint32_t kBlackVuyWord = 0x00108080;
 
 }  // namespace
 }  // namespace vexel
@@ -90,13 +89,11 @@ struct Compositor {
   }
 
  private:
-  // Alpha times opacity in 1/32768, in all channels and in one lane for each pixel.
-  HWY_INLINE Halves Weights(U8 s) const {
+  // Alpha times opacity in 1/32768, for all channels and in one lane for each pixel.
+  HWY_INLINE I16 Weights(U8 s) const {
     const hn::ScalableTag<int16_t> d16;
-    if constexpr (!kChoice.sourceAlpha) return {hn::Set(d16, weight), hn::Set(d16, weight)};
-    const Halves alpha = SpreadByte<kAlpha, true>(s);
-    return {hn::BitCast(d16, hn::MulHigh(hn::BitCast(dw, alpha.lower), fixedOpacity)),
-            hn::BitCast(d16, hn::MulHigh(hn::BitCast(dw, alpha.upper), fixedOpacity))};
+    if constexpr (!kChoice.sourceAlpha) return hn::Set(d16, weight);
+    return hn::BitCast(d16, hn::MulHigh(hn::BitCast(dw, SpreadByte<kAlpha, true>(s)), fixedOpacity));
   }
   HWY_INLINE I32 WeightOfPixel(U8 s) const {
     if constexpr (!kChoice.sourceAlpha) return hn::Set(di, weight);
@@ -107,7 +104,7 @@ struct Compositor {
   static HWY_INLINE U32 StraightColour(U8 s, U8 d, F32 as, F32 ao) {
     const auto inverse = hn::Div(hn::Set(df, 32768.0f), hn::Max(ao, hn::Set(df, kClearAlpha)));
     const auto part = hn::Min(ConvertNearest(hn::Mul(as, inverse)), hn::Set(di, 32767));
-    return hn::BitCast(du, hn::AndNot(OpaqueVector<kAlpha, uint8_t>(), Mix15(s, d, SpreadWords(part))));
+    return hn::BitCast(du, hn::AndNot(OpaqueVector<kAlpha, uint8_t>(), Mix15(s, d, SpreadWord(part))));
   }
   static HWY_INLINE U32 PremultipliedColour(U8 s, U8 d, F32 as, F32 ao) {
     const auto channel = [&](F32 cs, F32 cd, int black) HWY_ATTR {
@@ -135,21 +132,23 @@ struct Compositor {
 };
 
 template <OverChoice kChoice>
-HWY_ATTR void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+HWY_ATTR void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity,
+                    bool stream) {
   const Compositor<kChoice> compositor(opacity);
   const auto opaque = OpaqueVector<AlphaAt(kChoice), uint8_t>();
   TwoRowLoop<2 * HWY_MAX_BYTES>(
-      source, background, dst, 4 * count, [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+      stream, source, background, dst, 4 * count,
+      [&](const uint8_t* from, const uint8_t* onto, const auto& put) HWY_ATTR {
         const auto s0 = LoadVector<uint8_t>(from, 0), s1 = LoadVector<uint8_t>(from, 1);
         const auto d0 = LoadVector<uint8_t>(onto, 0), d1 = LoadVector<uint8_t>(onto, 1);
         const auto both = hn::And(hn::And(d0, d1), opaque);
         if (!kChoice.backgroundAlpha || hn::AllTrue(hn::ScalableTag<uint8_t>(), hn::Eq(both, opaque))) {
-          StoreVector(compositor.OverOpaque(s0, d0), out, 0);
-          StoreVector(compositor.OverOpaque(s1, d1), out, 1);
+          put(compositor.OverOpaque(s0, d0), 0);
+          put(compositor.OverOpaque(s1, d1), 1);
         } else {
           const auto r0 = compositor.OverAny(s0, d0), r1 = compositor.OverAny(s1, d1);
-          StoreVector(r0, out, 0);
-          StoreVector(r1, out, 1);
+          put(r0, 0);
+          put(r1, 1);
         }
       });
 }
@@ -194,7 +193,7 @@ void PixelOverAny(const uint8_t* s, const uint8_t* d, float opacity, uint8_t* ou
 }
 
 template <OverChoice kChoice>
-void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+void Over8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity, bool) {
   for (size_t i = 0; i < 4 * count; i += 4) {
     uint8_t out[4];
     if (!kChoice.backgroundAlpha || background[i + AlphaAt(kChoice)] == 255)

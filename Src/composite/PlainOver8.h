@@ -7,6 +7,7 @@ namespace vexel {
 
 // Of V, U, Y and alpha.
 inline constexpr int kBlackVuy[4] = {128, 128, 16, 0};
+inline constexpr uint32_t kBlackVuyWord = 0x00108080;
 
 namespace plain {
 

@@ -35,31 +35,30 @@ struct Adder {
     constexpr size_t kAlpha = AlphaAt(kChoice);
     if constexpr (!kChoice.sourceAlpha) s = hn::Or(s, OpaqueVector<kAlpha, uint8_t>());
     if constexpr (!kChoice.backgroundAlpha) d = hn::Or(d, OpaqueVector<kAlpha, uint8_t>());
-    const Halves alpha = SpreadByte<kAlpha, true>(s);
-    const auto sum = PackBlocks(Sum(hn::InterleaveLower(s, d), alpha.lower),
-                                Sum(hn::InterleaveUpper(hn::ScalableTag<uint8_t>(), s, d), alpha.upper));
+    const hn::ScalableTag<uint16_t> dw;
+    const auto alpha = hn::BitCast(dw, SpreadByte<kAlpha, true>(s));
+    const auto forBackground =
+        hn::Sub(hn::Set(I16Tag(), 32767), hn::BitCast(I16Tag(), hn::MulHigh(alpha, fixedOpacity)));
+    const auto sum = JoinSaturated(Sum<0>(s, d, forBackground), Sum<1>(s, d, forBackground));
     return kChoice.backgroundAlpha ? sum : hn::Or(sum, OpaqueVector<kAlpha, uint8_t>());
   }
 
  private:
-  // Of pairs of a source's and a background's byte, and the source's alpha times 256.
-  HWY_INLINE I16 Sum(U8 pairs, I16 alpha) const {
-    const hn::ScalableTag<uint16_t> dw;
+  // Of the even or odd bytes.
+  template <int kOdd>
+  HWY_INLINE I16 Sum(U8 s, U8 d, I16 forBackground) const {
     const hn::ScalableTag<uint8_t> d8;
-    const I16Tag d;
-    const auto part = hn::BitCast(d, hn::MulHigh(hn::BitCast(dw, alpha), fixedOpacity));
-    const auto forBackground = hn::Sub(hn::Set(d, 32767), part);
-    auto s64 = MultiplyAddBytes(pairs, hn::BitCast(d8, hn::Set(dw, 0x0040)));
-    auto d64 = MultiplyAddBytes(pairs, hn::BitCast(d8, hn::Set(dw, 0x4000)));
-    alignas(16) static constexpr int16_t kBlack64[8] = {128 * 64, 128 * 64, 16 * 64, 0, 128 * 64, 128 * 64, 16 * 64, 0};
-    const auto black = hn::LoadDup128(d, kBlack64);
+    const auto times64 = hn::BitCast(d8, hn::Set(hn::ScalableTag<uint16_t>(), kOdd ? 0x4000 : 0x0040));
+    auto s64 = MultiplyAddBytes(s, times64), d64 = MultiplyAddBytes(d, times64);
+    const auto black = hn::BitCast(
+        I16Tag(), MultiplyAddBytes(hn::BitCast(d8, hn::Set(hn::ScalableTag<uint32_t>(), kBlackVuyWord)), times64));
     if constexpr (kChoice.yuv) {
       s64 = hn::Sub(s64, black);
       d64 = hn::Sub(d64, black);
     }
     auto sum = hn::Add(hn::MulFixedPoint15(s64, forSource), hn::MulFixedPoint15(d64, forBackground));
     if constexpr (kChoice.yuv) sum = hn::Add(sum, black);
-    return hn::MulFixedPoint15(sum, hn::Set(d, 512));
+    return hn::MulFixedPoint15(sum, hn::Set(I16Tag(), 512));
   }
 
   I16 forSource;
@@ -68,20 +67,20 @@ struct Adder {
 
 template <OverChoice kChoice>
 HWY_ATTR void Premultiplied8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count,
-                             float opacity) {
+                             float opacity, bool stream) {
   const Adder<kChoice> add(opacity);
-  TwoRowLoop<2 * HWY_MAX_BYTES>(source, background, dst, 4 * count,
-                                [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+  TwoRowLoop<2 * HWY_MAX_BYTES>(stream, source, background, dst, 4 * count,
+                                [&](const uint8_t* from, const uint8_t* onto, const auto& put) HWY_ATTR {
                                   const auto r0 = add(LoadVector<uint8_t>(from, 0), LoadVector<uint8_t>(onto, 0));
                                   const auto r1 = add(LoadVector<uint8_t>(from, 1), LoadVector<uint8_t>(onto, 1));
-                                  StoreVector(r0, out, 0);
-                                  StoreVector(r1, out, 1);
+                                  put(r0, 0);
+                                  put(r1, 1);
                                 });
 }
 
 template <OverChoice kChoice>
 HWY_ATTR void Premultiplied32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count,
-                              float opacity) {
+                              float opacity, bool stream) {
   constexpr size_t kAlpha = AlphaAt(kChoice);
   const FloatTag df;
   const auto one = hn::Set(df, 1.0f), part = hn::Set(df, opacity);
@@ -92,12 +91,12 @@ HWY_ATTR void Premultiplied32(const uint8_t* source, const uint8_t* background, 
     const auto sum = hn::Add(scaled, hn::Mul(d, hn::Sub(one, hn::Broadcast<kAlpha>(scaled))));
     return kChoice.backgroundAlpha ? sum : TakeChannels<1 << kAlpha>(sum, one);
   };
-  TwoRowLoop<2 * HWY_MAX_BYTES>(source, background, dst, 16 * count,
-                                [&](const uint8_t* from, const uint8_t* onto, uint8_t* out) HWY_ATTR {
+  TwoRowLoop<2 * HWY_MAX_BYTES>(stream, source, background, dst, 16 * count,
+                                [&](const uint8_t* from, const uint8_t* onto, const auto& put) HWY_ATTR {
                                   const auto r0 = over(LoadVector<float>(from, 0), LoadVector<float>(onto, 0));
                                   const auto r1 = over(LoadVector<float>(from, 1), LoadVector<float>(onto, 1));
-                                  StoreVector(r0, out, 0);
-                                  StoreVector(r1, out, 1);
+                                  put(r0, 0);
+                                  put(r1, 1);
                                 });
 }
 
@@ -129,7 +128,7 @@ void OverPixels(const uint8_t* source, const uint8_t* background, uint8_t* dst, 
 }
 
 template <OverChoice kChoice>
-void Premultiplied8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+void Premultiplied8(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity, bool) {
   const int forSource = Factor15(opacity);
   const uint16_t fixedOpacity = FixedOpacity(opacity);
   OverPixels<uint8_t, kChoice>(source, background, dst, count, [&](size_t k, int s, int d, int alpha) {
@@ -141,7 +140,8 @@ void Premultiplied8(const uint8_t* source, const uint8_t* background, uint8_t* d
 }
 
 template <OverChoice kChoice>
-void Premultiplied32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity) {
+void Premultiplied32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size_t count, float opacity,
+                     bool) {
   OverPixels<float, kChoice>(source, background, dst, count, [&](size_t, float s, float d, float alpha) {
     return s * opacity + d * (1 - alpha * opacity);
   });

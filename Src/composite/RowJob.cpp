@@ -64,6 +64,9 @@ void RowJob::Layout() noexcept {
   const uint32_t cache = VX_GetCacheSize();
   mStream = cache != 0 && bytes * mHeight >= static_cast<int64_t>(cache / 2) && !TargetIsASource();
   if (mStream && mTarget.converts && whole) mTarget.converter.StreamOutput();
+  const auto isAligned = [](auto address) { return static_cast<uintptr_t>(address) % kStreamAlignment == 0; };
+  mStages = mStream && (!mKernelStreams || mTarget.converts || !isAligned(mTarget.rowBytes) ||
+                        !isAligned(reinterpret_cast<uintptr_t>(mTarget.base)));
 
   // The converters' own rows come first and are shared: conversions run one after the other.
   size_t own = mTarget.converts ? mTarget.converter.ScratchBytes() : 0;
@@ -77,16 +80,18 @@ void RowJob::Layout() noexcept {
   };
   for (int i = 0; i < mSourceCount; ++i)
     if (mSources[i].converts) mSources[i].scratchOffset = take(mSources[i].working);
-  if (mTarget.converts || mStream) mTarget.scratchOffset = take(mTarget.working);
+  if (mTarget.converts || mStages) mTarget.scratchOffset = take(mTarget.working);
   if (mTarget.converts && mStream) mStagingOffset = take(mTarget.format);
   mScratchBytes = end;
 }
 
+const uint8_t* RowJob::StoredRow(const Side& side, int32_t row) const noexcept {
+  return side.base + ptrdiff_t{side.upsideDown ? mHeight - 1 - row : row} * side.rowBytes;
+}
+
 const uint8_t* RowJob::Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column,
                              size_t count) const noexcept {
-  const ptrdiff_t stored = side.upsideDown ? mHeight - 1 - row : row;
-  const uint8_t* from =
-      side.base + stored * side.rowBytes + static_cast<size_t>(column) / kBlockMultiple * side.bytesPerSixPixels;
+  const uint8_t* from = StoredRow(side, row) + static_cast<size_t>(column) / kBlockMultiple * side.bytesPerSixPixels;
   if (!side.converts) return from;
   uint8_t* const to = scratch + side.scratchOffset;
   if (side.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock))
@@ -96,17 +101,28 @@ const uint8_t* RowJob::Fetch(const Side& side, uint8_t* scratch, int32_t row, in
   return to;
 }
 
+void RowJob::PrefetchNext(const RowSpan& span) const noexcept {
+  for (int i = 0; i < mSourceCount; ++i) {
+    const Side& side = mSources[i];
+    const size_t bytes = span.count / kBlockMultiple * side.bytesPerSixPixels;
+    PrefetchBlock(
+        StoredRow(side, span.row) + static_cast<size_t>(span.column) / kBlockMultiple * side.bytesPerSixPixels + bytes,
+        bytes);
+  }
+}
+
 uint8_t* RowJob::Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept {
-  if (mTarget.converts || mStream) return scratch + mTarget.scratchOffset;
+  if (mTarget.converts || mStages) return scratch + mTarget.scratchOffset;
   return mTarget.base + row * mTarget.rowBytes +
          static_cast<size_t>(column) / kBlockMultiple * mTarget.bytesPerSixPixels;
 }
 
 void RowJob::Deliver(const RowSpan& span) const noexcept {
-  if (!mTarget.converts && !mStream) return;
+  if (!mTarget.converts && !mStages) return;
   uint8_t* const to = mTarget.base + span.row * mTarget.rowBytes +
                       static_cast<size_t>(span.column) / kBlockMultiple * mTarget.bytesPerSixPixels;
   const size_t bytes = static_cast<size_t>(UnpaddedRowBytes(mTarget.format, static_cast<int64_t>(span.count)));
+  if (mStream) PrefetchNext(span);
   const bool block = mTarget.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock);
   if (!mTarget.converts) {
     StreamCopy(to, span.dst, bytes, mVariant);

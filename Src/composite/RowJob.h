@@ -24,12 +24,15 @@ struct TargetImage {
 };
 
 // What a row kernel gets: `count` pixels of every image in its working format. `row` counts from the destination's
-// first stored row, `column` from its first pixel. The destination may be one of the sources.
+// first stored row, `column` from its first pixel. The destination may be one of the sources. `stream`: dst is the
+// destination itself, aligned to kStreamAlignment, and better written past the cache.
+inline constexpr size_t kStreamAlignment = 64;
 struct RowSpan {
   const uint8_t* src[3];
   uint8_t* dst;
   size_t count;
   int32_t row, column;
+  bool stream;
 };
 
 // Use: AddSource for each source, SetTarget, CheckBuffers, Run.
@@ -51,6 +54,9 @@ class RowJob {
   // Whether sizes and pointers can be worked with: -17 for a negative size or a row beyond 2^31 - 1 bytes, -11 and -12
   // for null buffers. Success with *done set means that there is nothing to do.
   VX_Result CheckBuffers(bool* done) noexcept;
+
+  // Says that the kernel heeds RowSpan::stream; otherwise a big destination is written by way of the scratch memory.
+  void KernelStreams() noexcept { mKernelStreams = true; }
 
   // Calls kernel(const RowSpan&) for the whole picture: whole rows in order of the band, and within a row blocks from
   // left to right. -16 when there is no memory for the rows between, -999 when the host's fan-out failed; the
@@ -87,6 +93,8 @@ class RowJob {
   // Decides between blocks and whole rows, and where in the scratch memory everything lies.
   void Layout() noexcept;
   bool TargetIsASource() const noexcept;
+  const uint8_t* StoredRow(const Side& side, int32_t row) const noexcept;
+  void PrefetchNext(const RowSpan& span) const noexcept;
   const uint8_t* Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column, size_t count) const noexcept;
   uint8_t* Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept;
   void Deliver(const RowSpan& span) const noexcept;
@@ -100,6 +108,7 @@ class RowJob {
     for (int i = 0; i < mSourceCount; ++i) band.mSources[i].converter.UseScratch(scratch.get());
     band.mTarget.converter.UseScratch(scratch.get());
     RowSpan span;
+    span.stream = mStream && !mStages;
     for (span.row = first; span.row < end; ++span.row)
       for (int32_t column = 0; column < mWidth; column += mBlock) {
         span.column = column;
@@ -120,7 +129,8 @@ class RowJob {
   int mSourceCount = 0;
   int32_t mBlock = 0;
   size_t mScratchBytes = 0, mStagingOffset = 0;  // staging: a converted block on its way past the cache
-  bool mStream = false;
+  bool mKernelStreams = false;
+  bool mStream = false, mStages = false;  // past the cache; by way of the scratch memory
 };
 
 }  // namespace vexel

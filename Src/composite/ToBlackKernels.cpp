@@ -61,25 +61,24 @@ HWY_INLINE void MapInPlace(const uint8_t* src, uint8_t* dst, size_t count, const
 // rounded quotient. The differences wrap around where they are negative.
 template <BlackLayout kLayout, bool kFull>
 struct Darken8 {
-  U16 level;  // 0..255
-  U16 black;  // of the channels
+  U16 level;                // 0..255
+  U16 blackEven, blackOdd;  // of the channels
 
   HWY_INLINE U8 operator()(U8 v) const {
-    const hn::ScalableTag<uint8_t> d8;
-    const Halves alpha = SpreadByte<kLayout.alpha, false>(v);
-    const auto zero = hn::Zero(d8);
-    const auto result = PackBlocks(Scaled(hn::InterleaveLower(v, zero), alpha.lower),
-                                   Scaled(hn::InterleaveUpper(d8, v, zero), alpha.upper));
+    auto alpha = hn::BitCast(d, SpreadByte<kLayout.alpha, false>(v));
+    if constexpr (!kFull) alpha = Divide255(hn::Mul(alpha, level));
+    const EvenOdd channels = SplitBytes(v);
+    const auto result = JoinBytes(Scaled(channels.even, alpha, blackEven), Scaled(channels.odd, alpha, blackOdd));
     return hn::Or(result, OpaqueVector<kLayout.alpha, uint8_t>());
   }
 
  private:
-  HWY_INLINE I16 Scaled(U8 channels, I16 alpha) const {
-    auto a = hn::BitCast(d, alpha), c = hn::BitCast(d, channels);
-    if constexpr (!kFull) a = Divide255(hn::Mul(a, level));
-    if constexpr (!kLayout.vuy) return hn::BitCast(hn::ScalableTag<int16_t>(), Divide255(hn::Mul(c, a)));
+  static HWY_INLINE I16 Scaled(I16 channels, U16 alpha, U16 black) {
+    const hn::ScalableTag<int16_t> di;
+    const auto c = hn::BitCast(d, channels);
+    if constexpr (!kLayout.vuy) return hn::BitCast(di, Divide255(hn::Mul(c, alpha)));
     const auto ofBlack = hn::Mul(black, hn::Set(d, 255));
-    return hn::BitCast(hn::ScalableTag<int16_t>(), Divide255(hn::Add(hn::Mul(hn::Sub(c, black), a), ofBlack)));
+    return hn::BitCast(di, Divide255(hn::Add(hn::Mul(hn::Sub(c, black), alpha), ofBlack)));
   }
   static HWY_INLINE U16 Divide255(U16 n) { return hn::MulHigh(hn::Add(n, hn::Set(d, 128)), hn::Set(d, 257)); }
 
@@ -90,12 +89,14 @@ template <BlackLayout kLayout>
 HWY_ATTR void ToBlack8(const uint8_t* src, uint8_t* dst, size_t count, float opacity) {
   const hn::ScalableTag<uint16_t> d;
   const int opacity255 = Opacity255(opacity);
-  alignas(16) static constexpr uint16_t kBlack[8] = {128, 128, 16, 0, 128, 128, 16, 0};
-  const auto level = hn::Set(d, static_cast<uint16_t>(opacity255)), black = hn::LoadDup128(d, kBlack);
+  const EvenOdd black =
+      SplitBytes(hn::BitCast(hn::ScalableTag<uint8_t>(), hn::Set(hn::ScalableTag<uint32_t>(), kBlackVuyWord)));
+  const auto even = hn::BitCast(d, black.even), odd = hn::BitCast(d, black.odd);
+  const auto level = hn::Set(d, static_cast<uint16_t>(opacity255));
   if (opacity255 == 255)
-    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, true>{level, black});
+    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, true>{level, even, odd});
   else
-    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, false>{level, black});
+    MapInPlace<uint8_t>(src, dst, count, Darken8<kLayout, false>{level, even, odd});
 }
 
 template <BlackLayout kLayout>

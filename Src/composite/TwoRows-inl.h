@@ -20,10 +20,11 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-// Calls body(a, b, dst) for each block of kBlock bytes. The padding of the tail is zero; what is computed there is
-// thrown away.
-template <size_t kBlock, class Body>
-HWY_INLINE void TwoRowLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
+// Calls body(a, b, dst) for each block of kBlock bytes, and `last` for what is left of the row. The padding of the tail
+// is zero; what is computed there is thrown away.
+template <size_t kBlock, class Body, class Last>
+HWY_INLINE void TwoRowLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body,
+                           const Last& last) {
   size_t i = 0;
   for (; i + kBlock <= bytes; i += kBlock) body(a + i, b + i, dst + i);
   if (const size_t rest = bytes - i) {
@@ -31,9 +32,41 @@ HWY_INLINE void TwoRowLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, siz
     alignas(64) uint8_t out[kBlock];
     std::memcpy(in[0], a + i, rest);
     std::memcpy(in[1], b + i, rest);
-    body(in[0], in[1], out);
+    last(in[0], in[1], out);
     std::memcpy(dst + i, out, rest);
   }
+}
+template <size_t kBlock, class Body>
+HWY_INLINE void TwoRowLoop(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes, const Body& body) {
+  TwoRowLoop<kBlock>(a, b, dst, bytes, body, body);
+}
+
+// Writes a block's vectors, past the cache if kStream; `out` is aligned to a vector then.
+template <bool kStream>
+struct Put {
+  uint8_t* out;
+  template <class V>
+  HWY_INLINE void operator()(V v, size_t index) const {
+    const hn::ScalableTag<uint8_t> d;
+    if constexpr (kStream)
+      hn::Stream(hn::BitCast(d, v), d, out + index * HWY_MAX_BYTES);
+    else
+      StoreVector(v, out, index);
+  }
+};
+
+// The same with body(a, b, put), for a destination that may be streamed.
+template <size_t kBlock, class Body>
+HWY_INLINE void TwoRowLoop(bool stream, const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes,
+                           const Body& body) {
+  const auto put = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out)
+                       HWY_ATTR { body(inA, inB, Put<false>{out}); };
+  const auto past = [&](const uint8_t* inA, const uint8_t* inB, uint8_t* out)
+                        HWY_ATTR { body(inA, inB, Put<true>{out}); };
+  if (stream)
+    TwoRowLoop<kBlock>(a, b, dst, bytes, past, put);
+  else
+    TwoRowLoop<kBlock>(a, b, dst, bytes, put);
 }
 
 }  // namespace HWY_NAMESPACE

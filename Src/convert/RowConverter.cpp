@@ -88,11 +88,14 @@ void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
   uint8_t* const staging = mScratch + static_cast<size_t>(std::min(mStepCount - 1, 2)) * ScratchRowBytes();
   for (size_t done = 0; done < mWidth; done += unit) {
     const size_t count = std::min(unit, mWidth - done);
+    const size_t srcBytes = count / kBlockMultiple * mSrcBytesPerSixPixels;
     const uint8_t* from = src + done / kBlockMultiple * mSrcBytesPerSixPixels;
     uint8_t* to = dst + done / kBlockMultiple * mDstBytesPerSixPixels;
     RunSteps(from, mStream ? staging : to, count);
-    if (mStream)
+    if (mStream) {
+      PrefetchBlock(from + srcBytes, srcBytes);
       StreamCopy(to, staging, static_cast<size_t>(UnpaddedRowBytes(mDstFormat, static_cast<int64_t>(count))), mVariant);
+    }
   }
 }
 

@@ -38,7 +38,9 @@ void ConvertStaged(const SourceRows& src, const DestinationRows& dst, size_t uni
     for (size_t i = 0; i < units; i += piece) {
       const size_t count = std::min(piece, units - i);
       convert(from + i * src.unitBytes, stream ? staging : to, count);
-      if (stream) StreamCopy(to + i * dst.unitBytes, staging, count * dst.unitBytes, variant);
+      if (!stream) continue;
+      PrefetchBlock(from + (i + count) * src.unitBytes, count * src.unitBytes);
+      StreamCopy(to + i * dst.unitBytes, staging, count * dst.unitBytes, variant);
     }
   }
   if (stream) StreamFence();

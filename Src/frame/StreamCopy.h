@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 
 #include "frame/KernelVariant.h"
 
@@ -12,5 +13,13 @@ namespace vexel {
 // (6 to 64 KiB). Other threads may see the bytes only after StreamFence, called once by the thread that streamed.
 void StreamCopy(void* dst, const void* src, size_t bytes, KernelVariant variant) noexcept;
 void StreamFence() noexcept;
+
+// Asks for the block that is read next, before a block is streamed: meanwhile the processor does not read ahead by
+// itself. Addresses past the end of the memory do no harm.
+inline void PrefetchBlock(const uint8_t* src, size_t bytes) noexcept {
+  constexpr size_t kLine = 64;
+  const auto first = reinterpret_cast<uintptr_t>(src);
+  for (size_t i = 0; i < bytes; i += kLine) __builtin_prefetch(reinterpret_cast<const void*>(first + i));
+}
 
 }  // namespace vexel
