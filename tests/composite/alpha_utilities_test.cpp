@@ -165,7 +165,7 @@ TEST(AlphaUtilities, WholeDomains) {
           Put(src.bytes.data(), 4 * i + k, f, DomainSample(f, i, k));
           Put(dst.bytes.data(), 4 * i + k, f, DomainSample(f, i + 7, k));
         }
-      const std::vector<uint8_t> before = dst.bytes;
+      const auto before = dst.bytes;
       ASSERT_EQ(operation.run(src, dst), VX_Success) << operation.name;
       for (size_t i = 0; i < 65536; ++i) {
         double in[4], out[4];

@@ -17,7 +17,7 @@ namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
-using Bytes = std::vector<uint8_t>;
+using Bytes = decltype(Image::bytes);
 
 constexpr float kMixes[] = {1.0f / 256, 0.25f, 0.3f, 0.5f, 0.7f, 0.999f};
 

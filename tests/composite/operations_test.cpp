@@ -240,7 +240,7 @@ TEST(Operations, Arena) {
 
 // Whatever their number and the way to memory, rows come out as those of a picture of one row.
 TEST(Operations, ThreadsAndWaysToMemoryChangeNothing) {
-  constexpr int kWidth = 328, kHeight = 131;
+  constexpr int kWidth = 336, kHeight = 131;  // whole lines of the cache, not whole blocks of the kernels
   for (const Operation& o : Operations())
     for (const F format : {F::BGRA_4444_8u, F::V210_422_10u, F::XRGB_4444_32f, F::UYVY_422_8u}) {
       if (!o.takes(format)) continue;

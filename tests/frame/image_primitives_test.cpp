@@ -8,8 +8,8 @@
 #include <limits>
 #include <vector>
 
-#include "frame/Lifecycle.h"
 #include "support/Random.h"
+#include "support/SmallCache.h"
 
 namespace vexel::primitives {
 namespace {
@@ -64,18 +64,26 @@ void CheckFillsAndChannels(const T (&v)[4]) {
         [&](T old, int c) { return c == channel ? v[1] : old; });
 }
 
+// Large enough to go over several threads, with a cache that holds nothing, all but a part, and all of it.
+template <class T>
+void CheckLargeFill() {
+  std::vector<T> want(4 * 501 * 301 + 1, T(9));
+  for (size_t i = 0; i < want.size() - 1; ++i) want[i] = static_cast<T>(i % 4 + 100);
+  const size_t bytes = want.size() * sizeof(T);
+  for (const size_t cache : {size_t{1024}, bytes, 4 * bytes}) {
+    const testing::SmallCache small(static_cast<uint32_t>(cache));
+    std::vector<T> large(want.size(), T(9));
+    EXPECT_EQ(Fill4({T(100), T(101), T(102), T(103)}, large.data(), 501 * 4 * sizeof(T), 501, 301), Status::Ok);
+    EXPECT_EQ(large, want) << cache;
+  }
+}
+
 TEST(ImagePrimitives, FillsAndChannels) {
-  const CacheInfo found = UnifiedCache();
   CheckFillsAndChannels<uint8_t>({1, 250, 3, 77});
   CheckFillsAndChannels<uint16_t>({0x1234, 0x8000, 0xFFFF, 5});
   CheckFillsAndChannels<float>({0.1f, -0.0f, 1e-40f, std::numeric_limits<float>::infinity()});
-  // Large enough to go over several threads and past a (small) cache.
-  detail::gUnifiedCache.bytes = 1024;
-  std::vector<uint16_t> large(4 * 501 * 301 + 1, 9), want(large.size(), 9);
-  for (size_t i = 0; i < large.size() - 1; ++i) want[i] = static_cast<uint16_t>(i % 4 + 100);
-  EXPECT_EQ(Fill4({100, 101, 102, 103}, large.data(), 501 * 8, 501, 301), Status::Ok);
-  detail::gUnifiedCache = found;
-  EXPECT_EQ(large, want);
+  CheckLargeFill<uint16_t>();
+  CheckLargeFill<float>();
 }
 
 // All products, against exact arithmetic rounded by the processor in its default mode.

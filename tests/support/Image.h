@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <new>
 #include <string>
 #include <vector>
 
@@ -11,6 +12,16 @@
 #include "support/Random.h"
 
 namespace vexel::testing {
+
+// Memory in which rows may begin at cache lines.
+template <class T>
+struct LineAllocator {
+  using value_type = T;
+  static constexpr std::align_val_t kLine{64};
+  T* allocate(size_t n) { return static_cast<T*>(operator new(n * sizeof(T), kLine)); }
+  void deallocate(T* p, size_t) { operator delete(p, kLine); }
+  bool operator==(const LineAllocator&) const = default;
+};
 
 struct Image {
   Image(VX_PixelFormat f, int w, int h, Contents contents = Contents::Random, uint64_t seed = 1)
@@ -38,7 +49,7 @@ struct Image {
   VX_PixelFormat format;
   int width, height;
   int32_t rowBytes;
-  std::vector<uint8_t> bytes;
+  std::vector<uint8_t, LineAllocator<uint8_t>> bytes;
 };
 
 // Where the alpha of a pixel of four channels is.
