@@ -1,7 +1,5 @@
 #include "geometry/Transpose.h"
 
-#include <emmintrin.h>
-
 #include <algorithm>
 #include <array>
 #include <bit>
@@ -16,11 +14,14 @@
 namespace vexel {
 namespace {
 
-// Columns per panel: a panel's destination rows stay within reach of the TLB while the source is read downwards.
-constexpr int32_t kPanelColumns = 512;
+// Columns per panel: their destination rows, each in a page of its own, stay within reach of the TLB.
+constexpr int32_t kPanelColumns = 2048;
+// Source rows that are read side by side, and the bytes of a destination row that they fill at least. Lines that are
+// written far apart are slow even past the cache, most of all a multiple of 4,096 bytes apart; four in a row are not.
+constexpr int32_t kBlockRows = 64;
+constexpr int32_t kRunBytes = 256;
 constexpr int32_t kPlainTile = 16;
 constexpr int64_t kStreamFrom = 1 << 20;
-constexpr int kPrefetchBytes = 2 * kTileBytes;
 
 struct Job {
   const uint8_t* src;
@@ -64,44 +65,48 @@ bool CanStream(const Job& job, int elementSize) {
          reinterpret_cast<uintptr_t>(job.dst) % static_cast<unsigned>(elementSize) == 0;
 }
 
-void StreamTile(const uint8_t* tile, uint8_t* dst, ptrdiff_t dstRowBytes, int rows) {
-  for (int i = 0; i < rows; ++i, tile += kTileBytes, dst += dstRowBytes)
-    for (int j = 0; j < kTileBytes; j += 16)
-      _mm_stream_si128(reinterpret_cast<__m128i*>(dst + j), _mm_load_si128(reinterpret_cast<const __m128i*>(tile + j)));
+// Up to a tile of elements from (x, y) on, moved in a copy.
+void TransposeEdge(const Job& job, int elementSize, TransposeTile transpose, int32_t x, int32_t y, int32_t columns,
+                   int32_t rows) {
+  alignas(kTileBytes) uint8_t in[kTileBytes * kTileBytes], out[kTileBytes * kTileBytes];
+  const uint8_t* from = job.src + y * job.srcRowBytes + static_cast<ptrdiff_t>(x) * elementSize;
+  uint8_t* to = job.dst + x * job.dstRowBytes + static_cast<ptrdiff_t>(y) * elementSize;
+  for (int32_t i = 0; i < rows; ++i)
+    std::memcpy(in + i * kTileBytes, from + i * job.srcRowBytes, static_cast<size_t>(columns) * elementSize);
+  transpose(in, kTileBytes, out, kTileBytes, 1);
+  for (int32_t i = 0; i < columns; ++i)
+    std::memcpy(to + i * job.dstRowBytes, out + i * kTileBytes, static_cast<size_t>(rows) * elementSize);
 }
 
 void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
   const int sizeLog = std::countr_zero(static_cast<unsigned>(elementSize));
   const int32_t tile = kTileBytes >> sizeLog;
-  const TransposeTile transpose = kTransposeTiles[sizeLog][variant];
-  const SmallFunction small = kSmall[elementSize - 1];
   const bool stream = CanStream(job, elementSize);
+  const TransposeTile stored = kTransposeTiles[sizeLog][variant];
+  const TransposeTile transpose = stream ? kStreamTiles[sizeLog][variant] : stored;
   // When streaming, the first source rows bring the destination columns to a line's start.
   const auto misalignment = static_cast<int32_t>(reinterpret_cast<uintptr_t>(job.dst) % kTileBytes);
   const int32_t top = stream && misalignment ? std::min((kTileBytes - misalignment) >> sizeLog, job.height) : 0;
   const int32_t bottom = top + (job.height - top) / tile * tile;
-  alignas(kTileBytes) uint8_t staging[kTileBytes * kTileBytes];
+  const int32_t block = std::max(kBlockRows, kRunBytes >> sizeLog);
+  const auto edge = [&](int32_t x, int32_t columns, int32_t y, int32_t rows) {
+    if (columns > 0 && rows > 0) TransposeEdge(job, elementSize, stored, x, y, columns, rows);
+  };
 
   for (int32_t panel = 0; panel < job.width; panel += kPanelColumns) {
     const int32_t panelEnd = std::min(panel + kPanelColumns, job.width);
     const int32_t right = panel + (panelEnd - panel) / tile * tile;
-    small(job, panel, panelEnd, 0, top);
-    for (int32_t y = top; y < bottom; y += tile) {
+    for (int32_t x = panel; x < panelEnd; x += tile) edge(x, std::min(tile, panelEnd - x), 0, top);
+    for (int32_t y0 = top; y0 < bottom; y0 += block) {
+      const int32_t y1 = std::min(y0 + block, bottom);
       for (int32_t x = panel; x < right; x += tile) {
-        const uint8_t* from = job.src + y * job.srcRowBytes + (static_cast<ptrdiff_t>(x) << sizeLog);
-        uint8_t* to = job.dst + x * job.dstRowBytes + (static_cast<ptrdiff_t>(y) << sizeLog);
-        // So many rows at once are more than the hardware follows.
-        for (int32_t row = 0; row < tile; ++row) __builtin_prefetch(from + row * job.srcRowBytes + kPrefetchBytes);
-        if (stream) {
-          transpose(from, job.srcRowBytes, staging, kTileBytes);
-          StreamTile(staging, to, job.dstRowBytes, tile);
-        } else {
-          transpose(from, job.srcRowBytes, to, job.dstRowBytes);
-        }
+        transpose(job.src + y0 * job.srcRowBytes + (static_cast<ptrdiff_t>(x) << sizeLog), job.srcRowBytes,
+                  job.dst + x * job.dstRowBytes + (static_cast<ptrdiff_t>(y0) << sizeLog), job.dstRowBytes,
+                  static_cast<size_t>((y1 - y0) / tile));
       }
-      small(job, right, panelEnd, y, y + tile);
+      for (int32_t y = y0; y < y1; y += tile) edge(right, panelEnd - right, y, tile);
     }
-    small(job, panel, panelEnd, bottom, job.height);
+    for (int32_t x = panel; x < panelEnd; x += tile) edge(x, std::min(tile, panelEnd - x), bottom, job.height - bottom);
   }
   if (stream) StreamFence();
 }
@@ -123,9 +128,15 @@ int RotationPixelBytes(VX_PixelFormat format) noexcept {
   }
 }
 
+// Whether a frame copied row by row would push itself out of the cache.
+bool IsLarge(const Job& job, int pixelBytes) {
+  const size_t bytes = static_cast<size_t>(job.width) * pixelBytes * job.height;
+  return VX_GetCacheSize() != 0 && bytes >= VX_GetCacheSize() / 2;
+}
+
 void CopyRows(const Job& job, int pixelBytes, KernelVariant variant) {
   const size_t rowBytes = static_cast<size_t>(job.width) * pixelBytes;
-  const bool stream = VX_GetCacheSize() != 0 && rowBytes * job.height >= VX_GetCacheSize() / 2;
+  const bool stream = IsLarge(job, pixelBytes);
   for (int32_t y = 0; y < job.height; ++y) {
     if (stream)
       StreamCopy(job.dst + y * job.dstRowBytes, job.src + y * job.srcRowBytes, rowBytes, variant);
@@ -137,10 +148,15 @@ void CopyRows(const Job& job, int pixelBytes, KernelVariant variant) {
 
 // Rows in reverse order, each reversed.
 void HalfTurn(const Job& job, int pixelBytes, KernelVariant variant) {
-  const ReversePixels reverse = kReversePixels[std::countr_zero(static_cast<unsigned>(pixelBytes)) - 2][variant];
+  const bool isAligned =
+      (reinterpret_cast<uintptr_t>(job.dst) | static_cast<uintptr_t>(job.dstRowBytes)) % pixelBytes == 0;
+  const bool stream = isAligned && IsLarge(job, pixelBytes);
+  const auto& kernels = stream ? kStreamReversePixels : kReversePixels;
+  const ReversePixels reverse = kernels[std::countr_zero(static_cast<unsigned>(pixelBytes)) - 2][variant];
   for (int32_t y = 0; y < job.height; ++y)
     reverse(job.src + y * job.srcRowBytes, job.dst + (job.height - 1 - y) * job.dstRowBytes,
             static_cast<size_t>(job.width));
+  if (stream) StreamFence();
 }
 
 }  // namespace

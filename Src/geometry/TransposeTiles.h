@@ -10,14 +10,19 @@ namespace vexel {
 
 inline constexpr int kTileBytes = 64;
 
-// One full tile of kTileBytes / size elements each way.
-using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes);
+// `count` full tiles of kTileBytes / size elements each way, one below the other in the source.
+using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes,
+                               size_t count);
 
 // For element sizes 1, 2, 4, 8 and 16; index is the logarithm of the size.
 extern const KernelVariants<TransposeTile> kTransposeTiles[5];
+// The same past the cache; dst and dstRowBytes are multiples of kTileBytes. To be followed by StreamFence.
+extern const KernelVariants<TransposeTile> kStreamTiles[5];
 
 // Reverses the order of `count` pixels of 4, 8 or 16 bytes; index is the logarithm of the size less 2.
 using ReversePixels = void (*)(const uint8_t* src, uint8_t* dst, size_t count);
 extern const KernelVariants<ReversePixels> kReversePixels[3];
+// The same past the cache; dst is a multiple of the pixel size. To be followed by StreamFence.
+extern const KernelVariants<ReversePixels> kStreamReversePixels[3];
 
 }  // namespace vexel

@@ -35,7 +35,7 @@ void ExpectMoved(Picture dst, Picture& result, int rows, int columns, Source&& s
 TEST(Transpose, EverySizeShapeAndStride) {
   for (int size = 1; size <= 16; ++size)
     for (const auto& [width, height] :
-         {std::pair{1, 1}, {3, 2}, {1, 70}, {70, 1}, {64, 64}, {67, 130}, {530, 33}, {129, 65}})
+         {std::pair{1, 1}, {3, 2}, {1, 70}, {70, 1}, {64, 64}, {67, 130}, {530, 33}, {129, 65}, {2055, 261}})
       for (const bool upsideDown : {false, true}) {
         SCOPED_TRACE(::testing::Message() << "size " << size << " " << width << " x " << height);
         Picture src(width, height, size, 3 * size, 5, upsideDown, 1),
@@ -56,9 +56,8 @@ TEST(Transpose, StridesCountWholeElements) {
 
 // Large enough for the path past the cache, at destination offsets that begin inside a cache line.
 TEST(Transpose, PastTheCacheNothingChanges) {
-  const int width = 700;
   for (const int size : {1, 2, 4, 8, 16})
-    for (const int offset : {0, 48}) {
+    for (const auto& [width, offset] : {std::pair{700, 0}, {700, 48}, {2127, 16}}) {
       const int height = (1 << 20) / (width * size) + 37;
       const int rowBytes = (height * size + 63) / 64 * 64;
       std::vector<uint8_t> src(static_cast<size_t>(width) * size * height),
@@ -148,6 +147,21 @@ TEST(Rotate, EveryAngleFlipAndDepth) {
             }
           });
         }
+}
+
+// Large enough for the path past the cache; rows begin anywhere in a cache line, once even inside a pixel's bytes.
+TEST(Rotate, PastTheCacheAHalfTurnIsTheSame) {
+  for (const F format : {F::BGRA_4444_8u, F::ARGB_4444_15u, F::VUYP_4444_32f})
+    for (const size_t offset : {16, 3}) {
+      const int size = Depth(format) == kDepth8u ? 4 : Depth(format) == kDepth15u ? 8 : 16, width = 1003;
+      const int height = static_cast<int>(VX_GetCacheSize() / 2 / static_cast<uint32_t>(width * size)) + 2;
+      Picture src(width, height, size, size, 4, false, 1), dst(width, height, size, 3 * size, offset, true, 2),
+          result(width, height, size, 3 * size, offset, true, 2);
+      ASSERT_EQ(VX_RotateImageAndFlip(src.base(), src.rowBytes, result.base(), result.rowBytes, width, height, format,
+                                      180, false),
+                VX_Success);
+      ExpectMoved(dst, result, height, width, [&](int i, int j) { return src.Element(height - 1 - i, width - 1 - j); });
+    }
 }
 
 TEST(Transpose, RefusalsAndEmptySizes) {
