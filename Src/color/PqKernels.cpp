@@ -18,11 +18,11 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-HWY_INLINE ColorVector PqEncodingRatio(ColorVector v) {
+HWY_INLINE OneLess PqEncodingRatio(ColorVector v) {
   const ColorTag d;
+  const auto one = hn::Set(d, 1.0f);
   const auto y = hn::Abs(v);
-  return hn::Div(hn::Add(hn::Mul(y, hn::Set(d, kPqC2)), hn::Set(d, kPqC1)),
-                 hn::Add(hn::Mul(y, hn::Set(d, kPqC3)), hn::Set(d, 1.0f)));
+  return {hn::Div(hn::Mul(hn::Set(d, kPqBelowOne), hn::Sub(one, y)), hn::Add(hn::Mul(hn::Set(d, kPqC3), y), one))};
 }
 
 HWY_INLINE ColorVector PqDecodingRatio(ColorVector v) {
@@ -109,7 +109,7 @@ void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
     c = Apply(job.matrix, c);
     ForEachChannel(c, [&](float v) {
       const float y = Power(std::fabs(v) * 0.01f, kPqM1);
-      return WithSignOf(Power((kPqC2 * y + kPqC1) / (kPqC3 * y + 1.0f), kPqM2) * job.scale, v);
+      return WithSignOf(PowerOfOneLess(PqRatioBelowOne(y), kPqM2) * job.scale, v);
     });
   });
 }

@@ -83,14 +83,14 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
                                hn::Set(d, kP010ChromaRange));
     return hn::Min(hn::Max(value, hn::Set(d, -0.5f)), hn::Set(d, 0.5f));
   };
-  const auto half = [&](const uint16_t* from, ColorVector cb, ColorVector cr, float* to) HWY_ATTR {
+  const auto half = [&](const uint16_t* from, ColorVector cb, ColorVector cr, float* to) VX_COLOR_STAGE {
     const auto code = hn::TableLookupLanes(hn::PromoteTo(di, hn::LoadU(d16, from)), order);
     const auto y = hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Black))), hn::Set(d, kP010LumaRange));
     const auto one = hn::Set(d, 1.0f);
     const RgbVectors c = FromYuv(hn::Min(hn::Max(y, hn::Zero(d)), one), cb, cr);
     StorePixels(c.b, c.g, c.r, one, to);
   };
-  const auto body = [&](const uint16_t* fromLuma, const uint16_t* fromChroma, float* to) HWY_ATTR {
+  const auto body = [&](const uint16_t* fromLuma, const uint16_t* fromChroma, float* to) VX_COLOR_STAGE {
     // A pair U, V is the low and high half of 32 bits.
     const auto uv = hn::LoadU(pairs, reinterpret_cast<const uint32_t*>(fromChroma));
     const auto cb = chromaOf(hn::And(uv, hn::Set(pairs, 0xffff)));

@@ -24,6 +24,11 @@ namespace hn = hwy::HWY_NAMESPACE;
 #define VX_POWER_STEP HWY_ATTR __attribute__((always_inline))
 #endif
 
+// An argument 1 - u, as for PowerOfOneLess.
+struct OneLess {
+  hn::Vec<hn::ScalableTag<float>> u;
+};
+
 #if HWY_TARGET == HWY_SCALAR  // Compiled by foreach_target as the baseline, never chosen.
 
 namespace power_detail {
@@ -40,12 +45,19 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
   b = Power1<kCore, kSigned>(b, y);
   c = Power1<kCore, kSigned>(c, y);
 }
+template <PowerCore kCore>
+HWY_INLINE V PowerOf(V x, const PowerExponent& y) {
+  return Power1<kCore, false>(x, y);
+}
+template <PowerCore kCore>
+HWY_INLINE V PowerOf(OneLess x, const PowerExponent& y) {
+  return V(vexel::PowerOfOneLess(x.u.raw, y));
+}
 enum class Signs : uint8_t { ByFinish, Kept, Refused };
 template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
 HWY_INLINE bool PowerLoops(float* values, size_t count, float*, const PowerExponent& y, const Prepare& prepare,
                            const Finish& finish) {
-  for (size_t i = 0; i < count; ++i)
-    values[i] = finish(Power1<kCore, false>(prepare(V(values[i])), y), V(values[i])).raw;
+  for (size_t i = 0; i < count; ++i) values[i] = finish(PowerOf<kCore>(prepare(V(values[i])), y), V(values[i])).raw;
   return kSigns != Signs::Refused;
 }
 template <class Prepare, class Finish>
@@ -418,8 +430,9 @@ HWY_INLINE V MendRare(V fast, V magnitude, const PowerExponent& y) {
   const DI di;
   const auto isZero = hn::Eq(hn::BitCast(di, magnitude), hn::Zero(di));
   const auto outside = hn::AndNot(isZero, hn::Gt(AboveFirst(magnitude, y), FastSpan(y)));
-  if (HWY_UNLIKELY(!hn::AllFalse(di, outside))) return PowerAll<kCore>(magnitude, y);
-  return hn::IfThenZeroElse(hn::RebindMask(d, isZero), fast);
+  const V power = hn::IfThenZeroElse(hn::RebindMask(d, isZero), fast);
+  if (HWY_LIKELY(hn::AllFalse(di, outside))) return power;
+  return hn::IfThenElse(hn::RebindMask(d, outside), PowerAll<kCore>(magnitude, y), power);
 }
 
 // The power of NaN has no sign.
@@ -473,6 +486,14 @@ HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
 // values; false is returned, with nothing done, where they refuse them.
 enum class Signs : uint8_t { ByFinish, Kept, Refused };
 
+HWY_INLINE V ValueOf(V x) { return x; }
+HWY_INLINE V ValueOf(OneLess x) { return hn::Sub(hn::Set(D(), 1.0f), x.u); }
+// The place in a segment with what the rounding of the argument took away.
+HWY_INLINE V WithRest(V place, V, V) { return place; }
+HWY_INLINE V WithRest(V place, V rounded, OneLess x) {
+  return hn::Add(place, hn::Sub(hn::Sub(hn::Set(D(), 1.0f), rounded), x.u));
+}
+
 HWY_INLINE bool AnyNegative(const float* values, size_t count) {
   const D d;
   const DI di;
@@ -493,17 +514,18 @@ HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
     if (kSigns == Signs::Refused && AnyNegative(values, count)) return false;
     for (size_t i = 0; i < count; i += lanes) {
       const V v = hn::Load(d, values + i);
-      hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane<false>(prepare(v), y), v), v), d, values + i);
+      hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane<false>(ValueOf(prepare(v)), y), v), v), d, values + i);
     }
   } else {
     VI above = hn::Set(di, INT32_MIN);
     for (size_t i = 0; i < count; i += lanes) {
-      const Bundle<1> x{prepare(hn::Load(d, values + i))};
+      const auto argument = prepare(hn::Load(d, values + i));
+      const Bundle<1> x{ValueOf(argument)};
       above = hn::Max(above, AboveFirst(x.a, y));
       Bundle<1> eighths, place;
       PlaceOf<false, kCore>(x, y.log, eighths, place);
       hn::Store(eighths.a, d, scratch + i);
-      hn::Store(place.a, d, scratch2 + i);
+      hn::Store(WithRest(place.a, x.a, argument), d, scratch2 + i);
     }
     const bool rare = !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
     if (kSigns == Signs::Refused && HWY_UNLIKELY(rare) && AnyNegative(values, count)) return false;
@@ -521,7 +543,7 @@ HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
     } else {
       for (size_t i = 0; i < count; i += lanes) {
         const V v = hn::Load(d, values + i);
-        const V power = MendRare<kCore>(last(i), prepare(v), y);
+        const V power = MendRare<kCore>(last(i), ValueOf(prepare(v)), y);
         hn::Store(WithoutSignedNaN<kSigned>(finish(power, v), v), d, values + i);
       }
     }
@@ -639,7 +661,7 @@ HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detai
 }
 
 // `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value). `scratch`,
-// aligned too, has room for twice as many.
+// aligned too, has room for twice as many. prepare may give OneLess if the core is the long one.
 template <PowerCore kCore, class Prepare, class Finish>
 HWY_INLINE void Powers(float* values, size_t count, float* scratch, const PowerExponent& y, const Prepare& prepare,
                        const Finish& finish) {

@@ -82,21 +82,22 @@ struct LongLog {
   float large, middle, small;
 };
 
-LongLog LogLong(float x, const power::ScaledLog2& log) {
+// `rest` belongs to x; it counts where x is near 1, and is taken for small elsewhere.
+LongLog LogLong(float x, const power::ScaledLog2& log, float rest = 0.0f) {
   const SplitArgument s = Split(x);
   const int j = s.eighths & 7;
   const float k = static_cast<float>(s.eighths);
-  const float r = s.mantissa - power::kCentre[j];
+  const float r = (s.mantissa - power::kCentre[j]) + rest;
   const float top = std::bit_cast<float>(std::bit_cast<uint32_t>(r) & 0xfffff000);
   const float middle = top * log.slopes[j];
-  const float rest = (r - top) * log.slopes[j] + r * log.slopeRests[j];
-  const float w = middle + rest;
-  const float curve = rest + (w * w) * Series(log, w);
+  const float low = (r - top) * log.slopes[j] + r * log.slopeRests[j];
+  const float w = middle + low;
+  const float curve = low + (w * w) * Series(log, w);
   return {log.eighthHigh * k + log.offsetsHigh[j], middle, (log.eighthLow * k + log.offsets[j]) + curve};
 }
 
-float PowerLong(float x, const power::ScaledLog2& log) {
-  const LongLog t = LogLong(x, log);
+float PowerLong(float x, const power::ScaledLog2& log, float rest = 0.0f) {
+  const LongLog t = LogLong(x, log, rest);
   const float eighths = (((t.large + t.middle) + t.small) + kEighthsMagic) - kEighthsMagic;
   return Exp2Tail(eighths, ((t.large - eighths) + t.middle) + t.small);
 }
@@ -155,6 +156,12 @@ float Power(float x, const PowerExponent& y) noexcept {
 }
 
 float Power(float x, float y) noexcept { return Power(x, PowerExponent(y)); }
+
+float PowerOfOneLess(float u, const PowerExponent& y) noexcept {
+  const float x = 1.0f - u;
+  const uint32_t bits = std::bit_cast<uint32_t>(x);
+  return bits >= y.firstBits && bits <= y.lastBits ? PowerLong(x, y.log, (1.0f - x) - u) : Power(x, y);
+}
 
 float SignedPower(float x, const PowerExponent& y) noexcept {
   if (IsNaN(x)) return kQuietNaN;

@@ -145,6 +145,10 @@ struct PowerExponent {
 float Power(float x, const PowerExponent& y) noexcept;
 float Power(float x, float y) noexcept;
 
+// (1 - u)^y for exponents with the long core and |u| below 1/2, without the error of rounding 1 - u where that is
+// near 1.
+float PowerOfOneLess(float u, const PowerExponent& y) noexcept;
+
 // sign(x) * |x|^y: a power law kept odd-symmetric. NaN gives NaN without a sign.
 float SignedPower(float x, const PowerExponent& y) noexcept;
 
