@@ -9,6 +9,7 @@
 #include "formats/FormatBits.h"
 #include "support/Bench.h"
 #include "vexel/compositing.h"
+#include "zovcore/Threads.h"
 
 #ifdef VEXEL_PEER_PIXMAN
 #include <pixman.h>
@@ -79,6 +80,20 @@ void AddThreads(BenchCase& report, const std::function<void()>& work) {
     });
 }
 
+// What the memory itself gains by a second thread: both sources read and the destination written, half by half.
+void AddMemoryOnTwoThreads(BenchCase& report, const Frame& src, const Frame& background, const Frame& dst) {
+  report.AddThreaded("memory, two threads", [=] {
+    zovcore::threads::ExecuteCPUBoundTaskOnAllProcessors(
+        [&](int half) {
+          const auto part = [half](const Frame& frame) { return frame.data() + frame.size() / 2 * half; };
+          const size_t dstBytes = dst.size() / 4;
+          vexel::bench::FloorStreamed(part(src), src.size() / 2, part(dst), dstBytes);
+          vexel::bench::FloorStreamed(part(background), background.size() / 2, part(dst) + dstBytes, dstBytes);
+        },
+        2);
+  });
+}
+
 struct Over {
   F src, background, dst;
   Alpha sourceAlpha, backgroundAlpha;
@@ -100,6 +115,7 @@ void CompositeCase(const char* name, const Over& over, Size size) {
   });
   report.AddFloor(src.size() + background.size(), dst.size());
   AddThreads(report, work);
+  AddMemoryOnTwoThreads(report, src, background, dst);
   if (vexel::IsYuv(over.dst) || vexel::IsReversed(over.dst) || vexel::Depth(over.dst) != vexel::kDepth8u) return;
   if (over.opacity != 1) return;
   const Frame from(F::BGRP_4444_8u, size, over.sourceAlpha, 1, true);
