@@ -26,10 +26,13 @@ struct TopDown {
 constexpr int32_t kStreamPixels = 1024;
 static_assert(kStreamPixels % 2 == 0);
 
-// A destination that would take most of the cache. A smaller one is written faster through it.
-bool GoesPastCache(const TopDown& dst) noexcept {
+// Whether reading the source would push the destination, if it is not small, out of the cache before anyone looks at
+// it.
+bool GoesPastCache(const Picture420& src, const TopDown& dst) noexcept {
   const uint32_t cache = VX_GetCacheSize();
-  return cache != 0 && UnpaddedRowBytes(dst.format, dst.width) * dst.height >= int64_t{cache / 2};
+  const int64_t srcBytes = int64_t{src.width} * src.height / 2 * (HasWideSamples(src.format) ? 6 : 3);
+  const int64_t dstBytes = UnpaddedRowBytes(dst.format, dst.width) * dst.height;
+  return cache != 0 && dstBytes >= int64_t{cache / 8} && srcBytes + dstBytes >= int64_t{cache / 2};
 }
 
 // What the decoder makes for a destination: its own format if it can, else one on the way that loses least. 8-bit RGB
@@ -46,14 +49,16 @@ VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
   return dst ? VX_Success : VX_ErrNullDestination;
 }
 
-// Rows straight into the destination's memory, or by way of the cache past it.
+// Rows straight into the destination's memory, or past the cache: by way of staging where their places in memory do not
+// suit the kernels.
 void WriteRows(Rows420& rows, const TopDown& dst, uint8_t* staging) noexcept {
+  const bool aligned = ((reinterpret_cast<uintptr_t>(dst.top) | static_cast<uintptr_t>(dst.rowBytes)) & 63) == 0;
   const KernelVariant variant = ActiveKernelVariant();
   for (int32_t y = 0; y < dst.height; ++y) {
     uint8_t* const row = dst.top + y * dst.rowBytes;
     rows.BeginRow(y);
-    if (!staging) {
-      rows.Pixels(0, dst.width, row);
+    if (!staging || aligned) {
+      rows.Pixels(0, dst.width, row, staging != nullptr);
       continue;
     }
     for (int32_t x = 0; x < dst.width; x += kStreamPixels) {
@@ -86,7 +91,7 @@ VX_Result Decode(const Picture420& src, const TopDown& dst, VX_PixelFormat worki
   if (dst.width < 1 || dst.height < 1) return VX_Success;
   if (const VX_Result result = CheckPlanes(src, dst.top)) return result;
 
-  const bool streams = GoesPastCache(dst);
+  const bool streams = GoesPastCache(src, dst);
   if (streams && converts) converter.StreamOutput();
   const auto pad = [](size_t bytes) { return (bytes + 63) & ~size_t{63}; };
   const size_t rowsBytes = pad(rows.ScratchBytes()), converterBytes = converts ? pad(converter.ScratchBytes()) : 0;

@@ -46,9 +46,10 @@ class Rows420 {
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept;
 
-  // Makes the samples of a row ready, then any part of it: `count` pixels from an even `first` on.
+  // Makes the samples of a row ready, then any part of it: `count` pixels from an even `first` on. Past the cache,
+  // which takes a dst on a line of it, if `stream` says so; StreamFence (frame/StreamCopy.h) is the caller's.
   void BeginRow(int32_t row) noexcept;
-  void Pixels(int32_t first, int32_t count, uint8_t* dst) const noexcept;
+  void Pixels(int32_t first, int32_t count, uint8_t* dst, bool stream = false) noexcept;
 
  private:
   struct Tap {
@@ -75,6 +76,8 @@ class Rows420 {
   void MeanOfRows(const Plane& plane, uint64_t total) const noexcept;
   void MakeLuma(int32_t row) noexcept;
   void MakeChroma(int32_t row) noexcept;
+  void MixChroma(size_t first, size_t end) noexcept;
+  void MixChromaOf(int32_t first, int32_t count) noexcept;
   const uint16_t* ResampleLuma() noexcept;
   const uint16_t* ResampleChroma(uint16_t* samples, uint16_t* resampled) noexcept;
 
@@ -92,7 +95,7 @@ class Rows420 {
   decode420::ResampleRow mResample = nullptr;
   decode420::MakePixels mMakePixels = nullptr;
   decode420::Matrix mMatrix{};
-  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false;
+  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false, mMixesInBlocks = false;
 
   // Scratch: averaged rows, resampled ones, a row or two on their way, sums, and what is being averaged.
   uint16_t *mY = nullptr, *mU = nullptr, *mV = nullptr;

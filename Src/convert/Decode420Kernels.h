@@ -50,14 +50,20 @@ struct Matrix {
   int16_t chroma[3][2];  // of each channel, for (U, V)
 };
 
-// `count` pixels of a row. Luma is bytes, or 16-bit samples ("wide", "full"). Chroma is 16-bit samples at half the
-// resolution, the nearest ones or interpolated (which reads one sample more than there are pairs of pixels), or at the
-// pixels' own ("full"); or of a picture's own rows and nearest: bytes, or pairs of them, then all in `u`. The fourth
-// channel is written opaque.
-using MakePixels = void (*)(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst,
-                            size_t count);
+// Pixels of a row. Luma is bytes, or 16-bit samples ("wide", "full"). Chroma is 16-bit samples at half the resolution,
+// the nearest ones or interpolated (which reads one sample more than there are pairs of pixels), or at the pixels' own
+// ("full"); or of a picture's own rows and nearest: bytes, or pairs of them or of 10-bit words, then all in `u`. The
+// fourth channel is written opaque.
+struct PixelRow {
+  const uint8_t *y, *u, *v;
+  uint8_t* dst;
+  size_t count;
+  bool stream;  // past the cache; for dst on a line of it
+};
+using MakePixels = void (*)(const PixelRow& row, const Matrix& matrix);
 struct PixelKernels {
-  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full, bytes, pairs, swappedPairs;
+  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full, bytes, pairs, swappedPairs, widePairs,
+      swappedWidePairs;
 };
 extern const PixelKernels kToBgrx, kToVuyx;
 

@@ -37,7 +37,7 @@ struct Samples {
   static constexpr bool kIsShared = !kIsFull && !kIsLinear;  // by the pixels of a pair
   static constexpr size_t kLumaBytes = kWideLuma ? 2 : 1;
   // Of one or two pixels' chroma in a row.
-  static constexpr size_t kChromaBytes = kChroma == ChromaKind::Bytes ? 1 : 2;
+  static constexpr size_t kChromaBytes = kChroma == ChromaKind::Bytes ? 1 : kIsPairs ? 2 * kLumaBytes : 2;
 };
 using Nearest = Samples<false, ChromaKind::Nearest>;
 using Linear = Samples<false, ChromaKind::Linear>;
@@ -47,6 +47,11 @@ using Full = Samples<true, ChromaKind::Full>;
 using Bytes = Samples<false, ChromaKind::Bytes>;
 using Pairs = Samples<false, ChromaKind::Pairs>;
 using SwappedPairs = Samples<false, ChromaKind::SwappedPairs>;
+using WidePairs = Samples<true, ChromaKind::Pairs>;
+using SwappedWidePairs = Samples<true, ChromaKind::SwappedPairs>;
+
+// The bits of a 10-bit word that are read of chroma.
+inline constexpr uint16_t kWideBits = 0xFFC0;
 
 // Sums are in 64ths, so that a channel may run to twice its range before it is clamped.
 inline constexpr int kFractionBits = 6;
@@ -87,30 +92,64 @@ HWY_INLINE U16 DealToBlocks(U16 v) {
 #endif
 }
 
+// Every second word of two vectors, from the first or the second one on, dealt out like that.
+#if HWY_TARGET == HWY_AVX3
+struct DealtWords {
+  constexpr explicit DealtWords(uint16_t first) : order() {
+    for (uint16_t i = 0; i < 32; ++i) {
+      const uint16_t dword = i / 2 % 4 * 4 + i / 8;
+      order[i] = static_cast<uint16_t>(2 * (2 * dword + i % 2) + first);
+    }
+  }
+  alignas(64) uint16_t order[32];
+};
+#endif
+template <int kFirst>
+HWY_INLINE U16 DealAlternate(U16 low, U16 high) {
+#if HWY_TARGET == HWY_AVX3
+  static constexpr DealtWords kWords(kFirst);
+  return U16{_mm512_permutex2var_epi16(low.raw, _mm512_load_si512(kWords.order), high.raw)};
+#else
+  const ScalableTag<uint16_t> d;
+  return kFirst == 0 ? hn::ConcatEven(d, high, low) : hn::ConcatOdd(d, high, low);
+#endif
+}
+
+// Into the cache, or past it where dst is aligned.
+template <bool kStream>
+HWY_INLINE void Write(U32 v, uint8_t* dst, size_t index) {
+  const ScalableTag<uint8_t> d;
+  if constexpr (kStream)
+    hn::Stream(hn::BitCast(d, v), d, dst + index * HWY_MAX_BYTES);
+  else
+    StoreVector(v, dst, index);
+}
+
+template <bool kStream>
 HWY_INLINE void StoreBlocks(U32 v0, U32 v1, U32 v2, U32 v3, uint8_t* dst) {
 #if HWY_TARGET == HWY_AVX2
   const ScalableTag<uint32_t> d;
-  StoreVector(hn::ConcatLowerLower(d, v1, v0), dst, 0);
-  StoreVector(hn::ConcatLowerLower(d, v3, v2), dst, 1);
-  StoreVector(hn::ConcatUpperUpper(d, v1, v0), dst, 2);
-  StoreVector(hn::ConcatUpperUpper(d, v3, v2), dst, 3);
+  Write<kStream>(hn::ConcatLowerLower(d, v1, v0), dst, 0);
+  Write<kStream>(hn::ConcatLowerLower(d, v3, v2), dst, 1);
+  Write<kStream>(hn::ConcatUpperUpper(d, v1, v0), dst, 2);
+  Write<kStream>(hn::ConcatUpperUpper(d, v3, v2), dst, 3);
 #else
-  StoreVector(v0, dst, 0);
-  StoreVector(v1, dst, 1);
-  StoreVector(v2, dst, 2);
-  StoreVector(v3, dst, 3);
+  Write<kStream>(v0, dst, 0);
+  Write<kStream>(v1, dst, 1);
+  Write<kStream>(v2, dst, 2);
+  Write<kStream>(v3, dst, 3);
 #endif
 }
 
 // Luma codes times 128.
 template <class S>
 HWY_INLINE EvenOdd LoadLuma(const uint8_t* y) {
-  const ScalableTag<uint16_t> d;
   if constexpr (S::kWideLuma) {
     const U16 low = LoadVector<uint16_t>(y, 0), high = LoadVector<uint16_t>(y, 1);
-    return {Signed(DealToBlocks(hn::ShiftRight<1>(hn::ConcatEven(d, high, low)))),
-            Signed(DealToBlocks(hn::ShiftRight<1>(hn::ConcatOdd(d, high, low))))};
+    return {Signed(hn::ShiftRight<1>(DealAlternate<0>(low, high))),
+            Signed(hn::ShiftRight<1>(DealAlternate<1>(low, high)))};
   } else {
+    const ScalableTag<uint16_t> d;
     const U16 pairs = DealToBlocks(LoadVector<uint16_t>(y, 0));
     return {Signed(hn::ShiftLeft<7>(hn::And(pairs, hn::Set(d, 255)))),
             Signed(hn::And(hn::ShiftRight<1>(pairs), hn::Set(d, 255 << 7)))};
@@ -126,11 +165,9 @@ HWY_INLINE I16 AboutZero(U16 v) { return Signed(hn::Xor(v, hn::Set(ScalableTag<u
 
 template <class S>
 HWY_INLINE EvenOdd LoadPlane(const uint8_t* c) {
-  const ScalableTag<uint16_t> d;
   if constexpr (S::kIsFull) {
     const U16 low = LoadVector<uint16_t>(c, 0), high = LoadVector<uint16_t>(c, 1);
-    return {AboutZero(DealToBlocks(hn::ConcatEven(d, high, low))),
-            AboutZero(DealToBlocks(hn::ConcatOdd(d, high, low)))};
+    return {AboutZero(DealAlternate<0>(low, high)), AboutZero(DealAlternate<1>(low, high))};
   } else if constexpr (S::kChroma == ChromaKind::Bytes) {
     const I16 shared = AboutZero(hn::ShiftLeft<8>(DealToBlocks(LoadPromoted<uint16_t, uint8_t>(c))));
     return {shared, shared};
@@ -146,9 +183,17 @@ HWY_INLINE EvenOdd LoadPlane(const uint8_t* c) {
 template <class S>
 HWY_INLINE Chroma LoadChroma(const uint8_t* u, const uint8_t* v) {
   if constexpr (S::kIsPairs) {
-    const U16 pairs = DealToBlocks(LoadVector<uint16_t>(u));
-    const I16 first = AboutZero(hn::ShiftLeft<8>(pairs));
-    const I16 second = AboutZero(hn::And(pairs, hn::Set(ScalableTag<uint16_t>(), 0xFF00)));
+    const ScalableTag<uint16_t> d;
+    I16 first, second;
+    if constexpr (S::kWideLuma) {
+      const U16 low = LoadVector<uint16_t>(u, 0), high = LoadVector<uint16_t>(u, 1), bits = hn::Set(d, kWideBits);
+      first = AboutZero(hn::And(DealAlternate<0>(low, high), bits));
+      second = AboutZero(hn::And(DealAlternate<1>(low, high), bits));
+    } else {
+      const U16 pairs = DealToBlocks(LoadVector<uint16_t>(u));
+      first = AboutZero(hn::ShiftLeft<8>(pairs));
+      second = AboutZero(hn::And(pairs, hn::Set(d, 0xFF00)));
+    }
     if constexpr (S::kChroma == ChromaKind::SwappedPairs) return {{second, second}, {first, first}};
     return {{first, first}, {second, second}};
   } else {
@@ -206,6 +251,7 @@ HWY_INLINE U8 Narrow(I16 even, I16 odd) {
   return PackBlocks(hn::ShiftRight<kFractionBits>(even), hn::ShiftRight<kFractionBits>(odd));
 }
 
+template <bool kStream>
 HWY_INLINE void StorePixels(const Channels& even, const Channels& odd, uint8_t* dst) {
   const ScalableTag<uint8_t> d8;
   const ScalableTag<uint16_t> d16;
@@ -220,32 +266,27 @@ HWY_INLINE void StorePixels(const Channels& even, const Channels& odd, uint8_t* 
   const U32 even1 = hn::BitCast(d32, hn::InterleaveUpper(d16, evenLow, evenHigh));
   const U32 odd0 = hn::BitCast(d32, hn::InterleaveLower(d16, oddLow, oddHigh));
   const U32 odd1 = hn::BitCast(d32, hn::InterleaveUpper(d16, oddLow, oddHigh));
-  StoreBlocks(hn::InterleaveLower(d32, even0, odd0), hn::InterleaveUpper(d32, even0, odd0),
-              hn::InterleaveLower(d32, even1, odd1), hn::InterleaveUpper(d32, even1, odd1), dst);
+  StoreBlocks<kStream>(hn::InterleaveLower(d32, even0, odd0), hn::InterleaveUpper(d32, even0, odd0),
+                       hn::InterleaveLower(d32, even1, odd1), hn::InterleaveUpper(d32, even1, odd1), dst);
 }
 
-template <class S, class Op>
+template <class S, bool kStream, class Op>
 HWY_INLINE void Block(const uint8_t* y, const uint8_t* u, const uint8_t* v, const Op& op, uint8_t* dst) {
   const EvenOdd luma = LoadLuma<S>(y);
   const Chroma chroma = LoadChroma<S>(u, v);
   const Channels even = op.Chroma(chroma.u.even, chroma.v.even);
   if constexpr (S::kIsShared)
-    StorePixels(op.Add(luma.even, even), op.Add(luma.odd, even), dst);
+    StorePixels<kStream>(op.Add(luma.even, even), op.Add(luma.odd, even), dst);
   else
-    StorePixels(op.Add(luma.even, even), op.Add(luma.odd, op.Chroma(chroma.u.odd, chroma.v.odd)), dst);
+    StorePixels<kStream>(op.Add(luma.even, even), op.Add(luma.odd, op.Chroma(chroma.u.odd, chroma.v.odd)), dst);
 }
 
 // Rows of the picture itself are read exactly, like the destination is written; scratch rows have slack.
-template <class S, class Op>
-HWY_INLINE void Row(const void* yRow, const void* uRow, const void* vRow, const Matrix& matrix, uint8_t* dst,
-                    size_t count) {
+template <class S, bool kStream, class Op>
+HWY_INLINE void Row(const uint8_t* y, const uint8_t* u, const uint8_t* v, const Op& op, uint8_t* dst, size_t count) {
   constexpr size_t kChromaStep = (S::kIsFull ? kBlock : kPairs) * S::kChromaBytes;
-  const Op op(matrix);
-  const auto* y = static_cast<const uint8_t*>(yRow);
-  const auto* u = static_cast<const uint8_t*>(uRow);
-  const auto* v = static_cast<const uint8_t*>(vRow);
   for (; count >= kBlock; count -= kBlock) {
-    Block<S>(y, u, v, op, dst);
+    Block<S, kStream>(y, u, v, op, dst);
     y += kBlock * S::kLumaBytes, dst += kBlock * 4;
     u += kChromaStep, v += kChromaStep;
   }
@@ -260,17 +301,26 @@ HWY_INLINE void Row(const void* yRow, const void* uRow, const void* vRow, const 
     if constexpr (!S::kIsPairs) std::memcpy(tailV, v, (count + 1) / 2 * S::kChromaBytes);
     u = tailU, v = tailV;
   }
-  Block<S>(tail, u, v, op, out);
+  Block<S, false>(tail, u, v, op, out);
   std::memcpy(dst, out, count * 4);
 }
 
+template <class S, class Op>
+HWY_INLINE void Row(const PixelRow& row, const Matrix& matrix) {
+  const Op op(matrix);
+  if (row.stream)
+    Row<S, true>(row.y, row.u, row.v, op, row.dst, row.count);
+  else
+    Row<S, false>(row.y, row.u, row.v, op, row.dst, row.count);
+}
+
 template <class S>
-void ToBgrx(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst, size_t count) {
-  Row<S, BgrOp>(y, u, v, matrix, dst, count);
+void ToBgrx(const PixelRow& row, const Matrix& matrix) {
+  Row<S, BgrOp>(row, matrix);
 }
 template <class S>
-void ToVuyx(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst, size_t count) {
-  Row<S, VuyOp>(y, u, v, matrix, dst, count);
+void ToVuyx(const PixelRow& row, const Matrix& matrix) {
+  Row<S, VuyOp>(row, matrix);
 }
 
 }  // namespace
@@ -294,17 +344,19 @@ uint8_t ToByte(int32_t sum) {
 
 // Code times 128.
 template <class S>
-int32_t Luma(const void* y, size_t x) {
-  const auto* bytes = static_cast<const uint8_t*>(y);
-  if constexpr (!S::kWideLuma) return bytes[x] << 7;
-  return (bytes[2 * x] | bytes[2 * x + 1] << 8) >> 1;
+int32_t Luma(const uint8_t* y, size_t x) {
+  if constexpr (!S::kWideLuma) return y[x] << 7;
+  return (y[2 * x] | y[2 * x + 1] << 8) >> 1;
 }
 
 // Code - 128, times 256; plane 0 is U.
 template <class S>
-int32_t Chroma(const void* c, size_t x, size_t plane) {
-  const auto* bytes = static_cast<const uint8_t*>(c);
-  const auto* words = static_cast<const uint16_t*>(c);
+int32_t Chroma(const uint8_t* bytes, size_t x, size_t plane) {
+  const auto* words = reinterpret_cast<const uint16_t*>(bytes);
+  // Of a picture's pairs.
+  const auto code16 = [&](size_t i) {
+    return S::kWideLuma ? (bytes[2 * i] | bytes[2 * i + 1] << 8) & kWideBits : bytes[i] << 8;
+  };
   int32_t code = 0;
   switch (S::kChroma) {
     case ChromaKind::Full:
@@ -320,10 +372,10 @@ int32_t Chroma(const void* c, size_t x, size_t plane) {
       code = bytes[x / 2] << 8;
       break;
     case ChromaKind::Pairs:
-      code = bytes[x / 2 * 2 + plane] << 8;
+      code = code16(x / 2 * 2 + plane);
       break;
     case ChromaKind::SwappedPairs:
-      code = bytes[x / 2 * 2 + 1 - plane] << 8;
+      code = code16(x / 2 * 2 + 1 - plane);
       break;
   }
   return code - 0x8000;
@@ -331,36 +383,38 @@ int32_t Chroma(const void* c, size_t x, size_t plane) {
 
 // kLumaChannels: bit k is set if channel k has luma; the others are chroma about 128.
 template <class S, unsigned kLumaChannels>
-void Row(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst, size_t count) {
-  for (size_t x = 0; x < count; ++x) {
-    const int32_t luma = Scale(Luma<S>(y, x), matrix.luma) + matrix.lumaBias;
-    const int32_t chromaU = Chroma<S>(u, x, 0), chromaV = Chroma<S>(S::kIsPairs ? u : v, x, 1);
+void Row(const PixelRow& row, const Matrix& matrix) {
+  for (size_t x = 0; x < row.count; ++x) {
+    const int32_t luma = Scale(Luma<S>(row.y, x), matrix.luma) + matrix.lumaBias;
+    const int32_t u = Chroma<S>(row.u, x, 0), v = Chroma<S>(S::kIsPairs ? row.u : row.v, x, 1);
+    uint8_t* const pixel = row.dst + 4 * x;
     for (unsigned k = 0; k < 3; ++k) {
       const bool hasLuma = (kLumaChannels >> k & 1) != 0;
       const int32_t base = hasLuma ? luma : (128 << kFractionBits) + (1 << kFractionBits) / 2;
-      dst[4 * x + k] = ToByte(base + Scale(chromaU, matrix.chroma[k][0]) + Scale(chromaV, matrix.chroma[k][1]));
+      pixel[k] = ToByte(base + Scale(u, matrix.chroma[k][0]) + Scale(v, matrix.chroma[k][1]));
     }
-    dst[4 * x + 3] = 255;
+    pixel[3] = 255;
   }
 }
 
 template <class S>
-void ToBgrx(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst, size_t count) {
-  Row<S, 7>(y, u, v, matrix, dst, count);
+void ToBgrx(const PixelRow& row, const Matrix& matrix) {
+  Row<S, 7>(row, matrix);
 }
 template <class S>
-void ToVuyx(const void* y, const void* u, const void* v, const Matrix& matrix, uint8_t* dst, size_t count) {
-  Row<S, 4>(y, u, v, matrix, dst, count);
+void ToVuyx(const PixelRow& row, const Matrix& matrix) {
+  Row<S, 4>(row, matrix);
 }
 
 }  // namespace
 }  // namespace plain
 
-#define VX_PIXEL_KERNELS(To)                                                                              \
-  {                                                                                                       \
-    VX_KERNEL_VARIANTS(To<Nearest>), VX_KERNEL_VARIANTS(To<Linear>), VX_KERNEL_VARIANTS(To<WideNearest>), \
-        VX_KERNEL_VARIANTS(To<WideLinear>), VX_KERNEL_VARIANTS(To<Full>), VX_KERNEL_VARIANTS(To<Bytes>),  \
-        VX_KERNEL_VARIANTS(To<Pairs>), VX_KERNEL_VARIANTS(To<SwappedPairs>)                               \
+#define VX_PIXEL_KERNELS(To)                                                                                    \
+  {                                                                                                             \
+    VX_KERNEL_VARIANTS(To<Nearest>), VX_KERNEL_VARIANTS(To<Linear>), VX_KERNEL_VARIANTS(To<WideNearest>),       \
+        VX_KERNEL_VARIANTS(To<WideLinear>), VX_KERNEL_VARIANTS(To<Full>), VX_KERNEL_VARIANTS(To<Bytes>),        \
+        VX_KERNEL_VARIANTS(To<Pairs>), VX_KERNEL_VARIANTS(To<SwappedPairs>), VX_KERNEL_VARIANTS(To<WidePairs>), \
+        VX_KERNEL_VARIANTS(To<SwappedWidePairs>)                                                                \
   }
 const PixelKernels kToBgrx = VX_PIXEL_KERNELS(ToBgrx);
 const PixelKernels kToVuyx = VX_PIXEL_KERNELS(ToVuyx);

@@ -78,11 +78,9 @@ struct Mixer {
   bool add;
   explicit HWY_INLINE Mixer(const MixRows& rows)
       : weightA(Set(rows.weightA)), weightB(Set(rows.weightB)), add(rows.add) {}
-  HWY_INLINE void operator()(U16 a, U16 b, uint16_t* out) const {
-    U16 sum = hn::Add(hn::Mul(a, weightA), hn::Mul(b, weightB));
-    if (add) sum = hn::Add(sum, Load(out));
-    Store(sum, out);
-  }
+  HWY_INLINE U16 Sum(U16 a, U16 b) const { return hn::Add(hn::Mul(a, weightA), hn::Mul(b, weightB)); }
+  HWY_INLINE void Put(U16 sum, uint16_t* out) const { Store(add ? hn::Add(sum, Load(out)) : sum, out); }
+  HWY_INLINE void operator()(U16 a, U16 b, uint16_t* out) const { Put(Sum(a, b), out); }
 };
 
 HWY_INLINE U16 LowBytes(U16 v) { return hn::And(v, Set(255)); }
@@ -114,10 +112,12 @@ void MixPairs10(const MixRows& rows, uint16_t* outFirst, uint16_t* outSecond, si
   const hn::ScalableTag<uint16_t> d;
   const Mixer mix(rows);
   MixLoop<4>(rows, count, [&](const uint8_t* a, const uint8_t* b, size_t i) HWY_ATTR {
-    const U16 a0 = LoadVector<uint16_t>(a, 0), a1 = LoadVector<uint16_t>(a, 1);
-    const U16 b0 = LoadVector<uint16_t>(b, 0), b1 = LoadVector<uint16_t>(b, 1);
-    mix(hn::ShiftRight<6>(hn::ConcatEven(d, a1, a0)), hn::ShiftRight<6>(hn::ConcatEven(d, b1, b0)), outFirst + i);
-    mix(hn::ShiftRight<6>(hn::ConcatOdd(d, a1, a0)), hn::ShiftRight<6>(hn::ConcatOdd(d, b1, b0)), outSecond + i);
+    const auto sum = [&](size_t k) HWY_ATTR {
+      return mix.Sum(hn::ShiftRight<6>(LoadVector<uint16_t>(a, k)), hn::ShiftRight<6>(LoadVector<uint16_t>(b, k)));
+    };
+    const U16 low = sum(0), high = sum(1);
+    mix.Put(hn::ConcatEven(d, high, low), outFirst + i);
+    mix.Put(hn::ConcatOdd(d, high, low), outSecond + i);
   });
 }
 
@@ -167,48 +167,99 @@ HWY_INLINE void Double(const uint16_t* in, uint16_t* out, size_t count) {
 void DoubleNearest(const uint16_t* in, uint16_t* out, size_t count) { Double<false>(in, out, count); }
 void DoubleLinear(const uint16_t* in, uint16_t* out, size_t count) { Double<true>(in, out, count); }
 
-// Samples lose their lowest bit here: the products need a sign.
-HWY_INLINE I16 ToSigned(U16 v) { return hn::BitCast(hn::ScalableTag<int16_t>(), hn::ShiftRight<1>(v)); }
+// In a block of words as many whole groups of outputs as fit; `sample` is the place of each one's first input, counted
+// from two before the group's, and `weight` those of its four inputs. AVX-512 takes a whole vector for a block.
+#if HWY_TARGET == HWY_AVX3
+constexpr size_t kBlockWords = kN;
+#else
+constexpr size_t kBlockWords = 8;
+#endif
+template <size_t kIn, size_t kOut>
+struct CubicBlock {
+  static constexpr size_t kGroups = kBlockWords / kOut;
+  static constexpr size_t kInputs = kGroups * kIn, kOutputs = kGroups * kOut;
+  constexpr explicit CubicBlock(const CubicPhase (&phases)[kOut]) : weight(), sample() {
+    for (size_t i = 0; i < kN; ++i) {
+      const size_t word = i % kBlockWords < kOutputs ? i % kBlockWords : 0;
+      const CubicPhase& phase = phases[word % kOut];
+      for (size_t k = 0; k < 4; ++k) weight[k][i] = phase.taps.w[k];
+      sample[i] = static_cast<uint16_t>(word / kOut * kIn + static_cast<size_t>(phase.start + 2));
+    }
+  }
+  alignas(64) int16_t weight[4][kN];
+  alignas(64) uint16_t sample[kN];
+};
 
-// The outer pairs are summed first, so that saturation only ever meets the result. `s` begins at input sample -3 or -2.
-template <class Samples>
-HWY_INLINE U16 Cubic(const Samples& s, const CubicPhase& phase, int firstSample) {
+// The inputs of a vector of outputs, without their lowest bit: the products need a sign. (Loops over the four of them
+// would not be unrolled, and go through memory.)
+struct Taps {
+  I16 t0, t1, t2, t3;
+};
+template <class Block>
+struct CubicSamples {
+#if HWY_TARGET == HWY_AVX3
+  U16 s0, s1, s2, s3;
+  explicit HWY_INLINE CubicSamples(const Block& block)
+      : s0(Load(block.sample)), s1(hn::Add(s0, Set(1))), s2(hn::Add(s0, Set(2))), s3(hn::Add(s0, Set(3))) {}
+  HWY_INLINE Taps operator()(const uint16_t* in) const {
+    const __m512i row = hn::ShiftRight<1>(Load(in - 2)).raw;
+    return {I16{_mm512_permutexvar_epi16(s0.raw, row)}, I16{_mm512_permutexvar_epi16(s1.raw, row)},
+            I16{_mm512_permutexvar_epi16(s2.raw, row)}, I16{_mm512_permutexvar_epi16(s3.raw, row)}};
+  }
+#else
+  // Bytes of the words within a block: of the first two inputs, and two words on of the others.
+  U16 even, odd;
+  explicit HWY_INLINE CubicSamples(const Block& block)
+      : even(hn::Add(hn::Mul(Load(block.sample), Set(0x0202)), Set(0x0100))), odd(hn::Add(even, Set(0x0202))) {}
+  HWY_INLINE Taps operator()(const uint16_t* in) const {
+    const U16 first = hn::ShiftRight<1>(LoadBlocks(in - 2)), second = hn::ShiftRight<1>(LoadBlocks(in));
+    return {Look(first, even), Look(first, odd), Look(second, even), Look(second, odd)};
+  }
+  static HWY_INLINE I16 Look(U16 row, U16 bytes) {
+    return hn::BitCast(hn::ScalableTag<int16_t>(), hn::TableLookupBytes(row, bytes));
+  }
+  static HWY_INLINE U16 LoadBlocks(const uint16_t* in) {
+#if HWY_TARGET == HWY_AVX2
+    const auto* low = reinterpret_cast<const __m128i*>(in);
+    const auto* high = reinterpret_cast<const __m128i*>(in + Block::kInputs);
+    return U16{_mm256_inserti128_si256(_mm256_castsi128_si256(_mm_loadu_si128(low)), _mm_loadu_si128(high), 1)};
+#else
+    return Load(in);
+#endif
+  }
+#endif
+};
+
+// The outer pairs are summed first, so that saturation only ever meets the result.
+template <class Block>
+HWY_INLINE void Cubic(const Block& block, const uint16_t* in, uint16_t* out, size_t count) {
   const hn::ScalableTag<int16_t> d;
-  I16 terms[4];
-  for (int k = 0; k < 4; ++k)
-    terms[k] = hn::MulFixedPoint15(s[phase.start + k - firstSample], hn::Set(d, phase.taps.w[k]));
-  const I16 sum = hn::SaturatedAdd(hn::Add(terms[0], terms[1]), hn::Add(terms[2], terms[3]));
-  return hn::ShiftLeft<1>(hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Max(sum, hn::Zero(d))));
+  const CubicSamples<Block> samples(block);
+  const I16 w0 = hn::Load(d, block.weight[0]), w1 = hn::Load(d, block.weight[1]);
+  const I16 w2 = hn::Load(d, block.weight[2]), w3 = hn::Load(d, block.weight[3]);
+  constexpr size_t kBlocks = kN / kBlockWords;
+  for (size_t i = 0; i < count; i += kBlocks * Block::kOutputs, in += kBlocks * Block::kInputs) {
+    const Taps taps = samples(in);
+    const I16 sum = hn::SaturatedAdd(hn::Add(hn::MulFixedPoint15(taps.t0, w0), hn::MulFixedPoint15(taps.t1, w1)),
+                                     hn::Add(hn::MulFixedPoint15(taps.t2, w2), hn::MulFixedPoint15(taps.t3, w3)));
+    const U16 result = hn::ShiftLeft<1>(hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Max(sum, hn::Zero(d))));
+#if HWY_TARGET == HWY_AVX2
+    const hn::Half<hn::ScalableTag<uint16_t>> dHalf;
+    hn::StoreU(hn::LowerHalf(dHalf, result), dHalf, out + i);
+    hn::StoreU(hn::UpperHalf(dHalf, result), dHalf, out + i + Block::kOutputs);
+#else
+    Store(result, out + i);
+#endif
+  }
 }
 
 void FourThirds(const uint16_t* in, uint16_t* out, size_t count) {
-  const hn::ScalableTag<uint16_t> d;
-  for (size_t group = 0; 4 * group < count; group += kN) {
-    I16 s[9];
-    for (int k = 0; k < 3; ++k) {
-      U16 a, b, c;
-      hn::LoadInterleaved3(d, in + 3 * group + 3 * k - 3, a, b, c);
-      s[3 * k] = ToSigned(a), s[3 * k + 1] = ToSigned(b), s[3 * k + 2] = ToSigned(c);
-    }
-    const auto& phases = kFourThirdsPhases;
-    hn::StoreInterleaved4(Cubic(s, phases[0], -3), Cubic(s, phases[1], -3), Cubic(s, phases[2], -3),
-                          Cubic(s, phases[3], -3), d, out + 4 * group);
-  }
+  static constexpr CubicBlock<3, 4> kBlock(kFourThirdsPhases);
+  Cubic(kBlock, in, out, count);
 }
-
 void ThreeHalves(const uint16_t* in, uint16_t* out, size_t count) {
-  const hn::ScalableTag<uint16_t> d;
-  for (size_t group = 0; 3 * group < count; group += kN) {
-    I16 s[6];
-    for (int k = 0; k < 3; ++k) {
-      U16 a, b;
-      hn::LoadInterleaved2(d, in + 2 * group + 2 * k - 2, a, b);
-      s[2 * k] = ToSigned(a), s[2 * k + 1] = ToSigned(b);
-    }
-    const auto& phases = kThreeHalvesPhases;
-    hn::StoreInterleaved3(Cubic(s, phases[0], -2), Cubic(s, phases[1], -2), Cubic(s, phases[2], -2), d,
-                          out + 3 * group);
-  }
+  static constexpr CubicBlock<2, 3> kBlock(kThreeHalvesPhases);
+  Cubic(kBlock, in, out, count);
 }
 
 }  // namespace

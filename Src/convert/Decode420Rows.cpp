@@ -11,6 +11,10 @@ namespace {
 // Weights of one line's chroma rows are in eighths.
 constexpr int32_t kLineWeight = 8;
 
+// Pixels made at a time: with the samples that they are made of they stay in the first-level cache.
+constexpr int32_t kBlockPixels = 2048;
+static_assert(kBlockPixels % 2 == 0);
+
 // A block one pixel wide has no chroma bytes.
 constexpr uint16_t kNoChroma = 128 << 8;
 
@@ -73,19 +77,23 @@ void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   mLumaFromSource = mHalfChroma && mLines == 1;
   if (mRatio != HorizontalRatio::None)
     mResample = (mRatio == HorizontalRatio::FourThirds ? kFourThirds : kThreeHalves)[mVariant];
-  // The nearest bytes need no stage of their own, if none is missing.
-  mChromaFromSource = mLumaFromSource && !mLinear && !wide && ChromaWidth(mSrc) == (int64_t{mSrc.width} + 1) / 2;
+  // The nearest samples need no stage of their own, if none is missing.
+  mChromaFromSource =
+      mLumaFromSource && !mLinear && (!wide || pairs) && ChromaWidth(mSrc) == (int64_t{mSrc.width} + 1) / 2;
+  mMixesInBlocks = mLumaFromSource && mLinear;
   const bool wideLuma = wide || !mLumaFromSource;
   mLumaBytes = wideLuma ? 2 : 1;
-  mChromaBytes = mChromaFromSource && !pairs ? 1 : 2;
+  mChromaBytes = !mChromaFromSource ? 2 : (wide ? 2 : 1) * (pairs ? 2 : 1);
   const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
-  mMakePixels = (!mHalfChroma        ? pixels.full
-                 : mChromaFromSource ? !pairs                    ? pixels.bytes
-                                       : IsReversed(mSrc.format) ? pixels.swappedPairs
-                                                                 : pixels.pairs
-                 : wideLuma          ? mLinear ? pixels.wideLinear : pixels.wideNearest
-                 : mLinear           ? pixels.linear
-                                     : pixels.nearest)[mVariant];
+  const auto kernel = [&]() -> const KernelVariants<MakePixels>& {
+    if (!mHalfChroma) return pixels.full;
+    if (mChromaFromSource && !pairs) return pixels.bytes;
+    if (mChromaFromSource && IsReversed(mSrc.format)) return wide ? pixels.swappedWidePairs : pixels.swappedPairs;
+    if (mChromaFromSource) return wide ? pixels.widePairs : pixels.pairs;
+    if (mLinear) return wideLuma ? pixels.wideLinear : pixels.linear;
+    return wideLuma ? pixels.wideNearest : pixels.nearest;
+  };
+  mMakePixels = kernel()[mVariant];
   mMatrix = MakeMatrix420(mSrc.format, format);
 }
 
@@ -222,29 +230,53 @@ const uint16_t* Rows420::ResampleChroma(uint16_t* samples, uint16_t* resampled) 
 void Rows420::MakeChroma(int32_t row) noexcept {
   mTapCount = 0;
   for (int32_t i = 0; i < mLines; ++i) AddChromaTaps(LineOf(row, i));
-  const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
   if (mChromaFromSource) {
+    const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
     mRowU = mSrc.planes[1] + mTaps[0].row * mSrc.rowBytes[1];
     mRowV = pairs ? mRowU : mSrc.planes[2] + mTaps[0].row * mSrc.rowBytes[2];
     if (reversed && !pairs) std::swap(mRowU, mRowV);
     return;
   }
-  if (mLines == 1) {
+  if (mLines == 1 && !mMixesInBlocks) {
     const Tap taps[2] = {mTaps[0], mTapCount > 1 ? mTaps[1] : Tap{mTaps[0].row, 0}};
     if (std::equal(taps, taps + 2, mHeld)) return;
     std::copy(taps, taps + 2, mHeld);
   }
-  uint16_t* const out[2] = {reversed ? mV : mU, reversed ? mU : mV};
-  const auto samples = static_cast<size_t>(ChromaWidth(mSrc));
-  const uint64_t total = uint64_t{kLineWeight} * static_cast<uint64_t>(mLines);
-  if (pairs) {
-    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], out[1]}, samples}, total);
-  } else {
-    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out[0], nullptr}, samples}, total);
-    MeanOfRows({mSrc.planes[2], mSrc.rowBytes[2], mMixChroma, {out[1], nullptr}, samples}, total);
-  }
+  mRowU = reinterpret_cast<const uint8_t*>(mU);
+  mRowV = reinterpret_cast<const uint8_t*>(mV);
+  if (mMixesInBlocks) return;
+  MixChroma(0, static_cast<size_t>(ChromaWidth(mSrc)));
   mRowU = reinterpret_cast<const uint8_t*>(ResampleChroma(mU, mWideU));
   mRowV = reinterpret_cast<const uint8_t*>(ResampleChroma(mV, mWideV));
+}
+
+// The chroma samples from `first` to `end` of the rows that MakeChroma has chosen.
+void Rows420::MixChroma(size_t first, size_t end) noexcept {
+  if (first >= end) return;
+  const bool wide = HasWideSamples(mSrc.format), pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
+  const size_t offset = first * (wide ? 2 : 1) * (pairs ? 2 : 1), samples = end - first;
+  uint16_t *const out0 = (reversed ? mV : mU) + first, *const out1 = (reversed ? mU : mV) + first;
+  const uint64_t total = uint64_t{kLineWeight} * static_cast<uint64_t>(mLines);
+  if (pairs) {
+    MeanOfRows({mSrc.planes[1] + offset, mSrc.rowBytes[1], mMixChroma, {out0, out1}, samples}, total);
+  } else {
+    MeanOfRows({mSrc.planes[1] + offset, mSrc.rowBytes[1], mMixChroma, {out0, nullptr}, samples}, total);
+    MeanOfRows({mSrc.planes[2] + offset, mSrc.rowBytes[2], mMixChroma, {out1, nullptr}, samples}, total);
+  }
+}
+
+// The chroma of some pixels, with the sample behind them. Whole vectors are made, as long as there is something to
+// read: the next pixels' are made again.
+void Rows420::MixChromaOf(int32_t first, int32_t count) noexcept {
+  constexpr size_t kVector = 64;
+  const auto readable = static_cast<size_t>(ChromaWidth(mSrc));
+  const auto begin = static_cast<size_t>(first) / 2,
+             behind = (static_cast<size_t>(first) + static_cast<size_t>(count) + 1) / 2 + 1;
+  const size_t end = std::min(readable, (behind + kVector - 1) / kVector * kVector);
+  MixChroma(std::min(begin, end - std::min<size_t>(end, 1)), end);
+  if (end < readable) return;
+  ResampleChroma(mU, nullptr);
+  ResampleChroma(mV, nullptr);
 }
 
 void Rows420::BeginRow(int32_t row) noexcept {
@@ -252,9 +284,15 @@ void Rows420::BeginRow(int32_t row) noexcept {
   MakeChroma(row);
 }
 
-void Rows420::Pixels(int32_t first, int32_t count, uint8_t* dst) const noexcept {
-  const ptrdiff_t chroma = (mHalfChroma ? first / 2 : first) * mChromaBytes;
-  mMakePixels(mRowY + first * mLumaBytes, mRowU + chroma, mRowV + chroma, mMatrix, dst, static_cast<size_t>(count));
+void Rows420::Pixels(int32_t first, int32_t count, uint8_t* dst, bool stream) noexcept {
+  for (int32_t done = 0; done < count; done += kBlockPixels) {
+    const int32_t x = first + done, pixels = std::min(kBlockPixels, count - done);
+    if (mMixesInBlocks) MixChromaOf(x, pixels);
+    const ptrdiff_t chroma = (mHalfChroma ? x / 2 : x) * mChromaBytes;
+    mMakePixels({mRowY + x * mLumaBytes, mRowU + chroma, mRowV + chroma, dst + ptrdiff_t{4} * done,
+                 static_cast<size_t>(pixels), stream},
+                mMatrix);
+  }
 }
 
 }  // namespace vexel

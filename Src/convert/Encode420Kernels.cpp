@@ -165,23 +165,14 @@ class Encoder {
     mBefore = Sum(Words::Of(Dwords(pixelA)), Words::Of(Dwords(pixelB)));
   }
 
+  // (A loop over the four vectors would not be unrolled, and go through memory.)
   HWY_INLINE void Block(const uint8_t* a, const uint8_t* b, uint8_t* lumaA, uint8_t* lumaB, uint8_t* u, uint8_t* v) {
     const ScalableTag<uint8_t> d;
     const hn::Half<decltype(d)> dHalf;
-    I32 ya[4], yb[4];
-    Words pairs[4];
-    for (size_t k = 0; k < 4; ++k) {
-      const Words wordsA = Words::Of(LoadVector<uint8_t>(a, k)), wordsB = Words::Of(LoadVector<uint8_t>(b, k));
-      ya[k] = mOp.Luma(wordsA);
-      yb[k] = mOp.Luma(wordsB);
-      const Words sum = Sum(wordsA, wordsB);
-      pairs[k] = {hn::Add(sum.outer, PixelBefore(mBefore.outer, sum.outer)),
-                  hn::Add(sum.inner, PixelBefore(mBefore.inner, sum.inner))};
-      mBefore = sum;
-    }
-    StoreVector(PackTo8(ya[0], ya[1], ya[2], ya[3]), lumaA);
-    StoreVector(PackTo8(yb[0], yb[1], yb[2], yb[3]), lumaB);
-    const Words low = Filter(pairs[0], pairs[1]), high = Filter(pairs[2], pairs[3]);
+    const Step s0 = Next(a, b, 0), s1 = Next(a, b, 1), s2 = Next(a, b, 2), s3 = Next(a, b, 3);
+    StoreVector(PackTo8(s0.lumaA, s1.lumaA, s2.lumaA, s3.lumaA), lumaA);
+    StoreVector(PackTo8(s0.lumaB, s1.lumaB, s2.lumaB, s3.lumaB), lumaB);
+    const Words low = Filter(s0.pairs, s1.pairs), high = Filter(s2.pairs, s3.pairs);
     const U8 chroma = PackChroma(mOp.template U<W::kBits>(low), mOp.template U<W::kBits>(high),
                                  mOp.template V<W::kBits>(low), mOp.template V<W::kBits>(high));
     hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
@@ -189,6 +180,20 @@ class Encoder {
   }
 
  private:
+  // Of one vector of pixels of either line: luma, and their sums with those one to the left.
+  struct Step {
+    I32 lumaA, lumaB;
+    Words pairs;
+  };
+  HWY_INLINE Step Next(const uint8_t* a, const uint8_t* b, size_t index) {
+    const Words wordsA = Words::Of(LoadVector<uint8_t>(a, index)), wordsB = Words::Of(LoadVector<uint8_t>(b, index));
+    const Words sum = Sum(wordsA, wordsB), before = mBefore;
+    mBefore = sum;
+    return {mOp.Luma(wordsA),
+            mOp.Luma(wordsB),
+            {hn::Add(sum.outer, PixelBefore(before.outer, sum.outer)),
+             hn::Add(sum.inner, PixelBefore(before.inner, sum.inner))}};
+  }
   static HWY_INLINE Words Sum(const Words& a, const Words& b) {
     return {WeightedSum<W>(a.outer, b.outer), WeightedSum<W>(a.inner, b.inner)};
   }

@@ -152,7 +152,7 @@ TEST(Decode420, MatricesOverAllCodes) {
       for (int u = 0; u < 256; u += all ? 1 : 5)
         for (int v = 0; v < 256; v += all ? 1 : 5) {
           const std::vector<uint8_t> us(128, static_cast<uint8_t>(u)), vs(128, static_cast<uint8_t>(v));
-          kernels.bytes[ActiveKernelVariant()](luma.data(), us.data(), vs.data(), matrix, pixels.data(), 256);
+          kernels.bytes[ActiveKernelVariant()]({luma.data(), us.data(), vs.data(), pixels.data(), 256, false}, matrix);
           const auto black = ToCodes({0, double(u), double(v)}, src, dst), step = ToCodes({1, 128, 128}, src, dst),
                      zero = ToCodes({0, 128, 128}, src, dst);
           for (int y = 0; y < 256; ++y)
@@ -299,14 +299,20 @@ TEST(Decode420, EveryRasterFormat) {
   }
 }
 
-// Destinations larger than the cache take another way to memory.
+// Destinations that would fill the cache take another way to memory, straight or staged by how their rows lie.
 TEST(Decode420, LargeDestinations) {
-  const int width = 3001, height = static_cast<int>(VX_GetCacheSize() / 4 / width) + 3;
-  Block420 src(F::YUV_420_MPEG4_FRAME_709, width, height);
-  src.Randomize(6);
-  std::vector<uint8_t> dst(static_cast<size_t>(width) * height * 4 + 1), row(width * 4);
-  for (const F format : {F::BGRA_4444_8u, F::XRGB_4444_8u}) {
-    ASSERT_EQ(VX_Success, DecodePlanes(src, dst.data() + 1, 4 * width, width, height, format, 0, 2));
+  const struct {
+    int width;
+    size_t offset;
+    F format;
+  } cases[] = {{3001, 1, F::BGRA_4444_8u}, {3001, 1, F::XRGB_4444_8u}, {3024, 0, F::BGRA_4444_8u}};
+  for (const auto& [width, offset, format] : cases) {
+    const int height = static_cast<int>(VX_GetCacheSize() / 8 / width) + 3;
+    Block420 src(F::YUV_420_MPEG4_FRAME_709, width, height);
+    src.Randomize(6);
+    std::vector<uint8_t> memory(static_cast<size_t>(width) * height * 4 + 65), row(width * 4);
+    uint8_t* const dst = memory.data() + (-reinterpret_cast<uintptr_t>(memory.data()) & 63) + offset;
+    ASSERT_EQ(VX_Success, DecodePlanes(src, dst, 4 * width, width, height, format, 0, 2));
     Rows420 rows;
     ASSERT_EQ(VX_Success, rows.Prepare(PictureFromBlock(src.bytes.data(), src.format, width, height), F::BGRX_4444_8u,
                                        width, height, 0, 2));
@@ -318,7 +324,7 @@ TEST(Decode420, LargeDestinations) {
       if (format == F::XRGB_4444_8u)
         for (int x = 0; x < width; ++x)
           std::swap(row[4 * x], row[4 * x + 3]), std::swap(row[4 * x + 1], row[4 * x + 2]);
-      ASSERT_EQ(0, std::memcmp(row.data(), &dst[static_cast<size_t>(y) * width * 4 + 1], row.size())) << y;
+      ASSERT_EQ(0, std::memcmp(row.data(), &dst[static_cast<size_t>(y) * width * 4], row.size())) << y;
     }
   }
 }
