@@ -16,7 +16,7 @@ inline constexpr size_t kUyvy16GroupBytes = 24;
 extern const RowKernelSet kUyvy10ToV210;
 extern const RowKernelSet kV210ToUyvy10;
 
-// In pixels. The fourth DNxHD sample is not written.
+// In pixels. The fourth DNxHD sample keeps its value.
 extern const RowKernelSet kRgb10ToDnxhd16;
 extern const RowKernelSet kDnxhd16ToRgb10;
 extern const RowKernelSet kBgr16ToRgb10;
