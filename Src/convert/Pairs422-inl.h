@@ -95,8 +95,10 @@ HWY_INLINE void PairLoop(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT 
   constexpr size_t kPairs = kVectorPairs, kDstPairBytes = 2 * kDstPixelBytes;
   const size_t pairs = (count + 1) / 2;
   size_t i = 0;
-  for (; i + kPairs < pairs; i += kPairs)
+  for (; i + kPairs < pairs; i += kPairs) {
+    FetchAhead<4 * kPairs>(src + 4 * i);
     body(LoadVector<uint8_t>(src + 4 * i), LoadVector<uint8_t>(src + 4 * i + 4), dst + i * kDstPairBytes);
+  }
   if (count == 0) return;
 
   uint32_t last;

@@ -6,6 +6,7 @@
 
 #include "convert/PairOrder.h"
 #include "convert/PlainPixels.h"
+#include "convert/Vnni.h"
 #include "convert/YuvFixed8.h"
 #include "convert/YuvKernels.h"
 
@@ -23,84 +24,75 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
 
-// What the lifting works on, for each pair of a vector: the chroma words (u, v) of the even and of the odd pixel, and
-// the luma words (y0, y1), all 0..255.
+// What the lifting works on, for each pair of a vector: the chroma words (u, v) of the even and of the odd pixel, the
+// latter plus 1, and the luma words (y0, y1); all but that 1 in 0..255.
 struct PairWords {
-  I16 even, odd, luma;
+  I16 even, oddPlus1, luma;
 };
 
-// From two vectors of pixels, each a dword: chroma words (u, v), and dwords whose high word is luma.
-HWY_INLINE PairWords SplitPairs(I16 uv0, I16 uv1, I32 y0, I32 y1) {
-  const hn::ScalableTag<int32_t> d;
-  PairWords words;
-  words.even = AsI16(hn::ConcatEven(d, AsI32(uv1), AsI32(uv0)));
-  words.odd = AsI16(hn::ConcatOdd(d, AsI32(uv1), AsI32(uv0)));
-#if HWY_TARGET == HWY_AVX3
-  alignas(64) static constexpr uint16_t kHighWords[32] = {1,  3,  5,  7,  9,  11, 13, 15, 17, 19, 21,
-                                                          23, 25, 27, 29, 31, 33, 35, 37, 39, 41, 43,
-                                                          45, 47, 49, 51, 53, 55, 57, 59, 61, 63};
-  words.luma = I16{_mm512_permutex2var_epi16(y0.raw, _mm512_load_si512(kHighWords), y1.raw)};
-#else
-  words.luma = PackTo16(hn::ShiftRight<16>(y0), hn::ShiftRight<16>(y1));
-#endif
-  return words;
-}
+// The pixels of two vectors, apart.
+struct PairPixels {
+  HWY_INLINE PairPixels(U8 a, U8 b) {
+    const hn::ScalableTag<int32_t> d;
+    even = AsU8(hn::ConcatEven(d, AsI32(b), AsI32(a)));
+    odd = AsU8(hn::ConcatOdd(d, AsI32(b), AsI32(a)));
+  }
+  U8 even, odd;
+};
 
 struct FromVuyx {
   HWY_INLINE PairWords operator()(U8 a, U8 b) const {
-    const auto chroma = ByteOrder<0x8081>();
-    const auto luma = Dwords(0x00FF0000);
-    return SplitPairs(AsI16(hn::TableLookupBytes(a, chroma)), AsI16(hn::TableLookupBytes(b, chroma)),
-                      AsI32(hn::And(a, luma)), AsI32(hn::And(b, luma)));
+    const PairPixels pixels(a, b);
+    const auto chroma = ByteOrder<0x8081>(), luma = ByteOrder<0x8282>();
+    const I16 odd = AsI16(hn::TableLookupBytes(pixels.odd, chroma));
+    return {AsI16(hn::TableLookupBytes(pixels.even, chroma)), hn::Add(odd, hn::Set(hn::ScalableTag<int16_t>(), 1)),
+            hn::OddEven(AsI16(hn::TableLookupBytes(pixels.odd, luma)), AsI16(hn::TableLookupBytes(pixels.even, luma)))};
   }
 };
 
-template <bool kPremultiply>
+template <bool kPremultiply, bool kVnni>
 struct FromBgra {
+  using Matrix = VectorRgbToYuv8<kVnni>;
+  using Pixels = typename Matrix::Pixels;
+
   HWY_INLINE PairWords operator()(U8 a, U8 b) const {
+    const PairPixels pixels(a, b);
     if constexpr (kPremultiply) {
       const hn::ScalableTag<uint32_t> d;
       const auto opaque = hn::BitCast(d, Dwords(0xFF000000)), alphas = hn::And(hn::BitCast(d, hn::And(a, b)), opaque);
-      if (HWY_UNLIKELY(!hn::AllTrue(d, hn::Eq(alphas, opaque)))) {
-        const auto alpha0 = Alpha(a), alpha1 = Alpha(b);
-        return Multiply(Scale(WordBytes<0>(a), alpha0), Green(a, alpha0), Scale(WordBytes<0>(b), alpha1),
-                        Green(b, alpha1));
-      }
+      if (HWY_UNLIKELY(!hn::AllTrue(d, hn::Eq(alphas, opaque))))
+        return Multiply(Premultiplied(pixels.even), Premultiplied(pixels.odd));
     }
-    return Multiply(VectorMatrix8::OuterChannels(a), matrix.InnerChannel(a), VectorMatrix8::OuterChannels(b),
-                    matrix.InnerChannel(b));
+    return Multiply(Matrix::Split(pixels.even), Matrix::Split(pixels.odd));
   }
 
-  HWY_INLINE PairWords Multiply(I16 outer0, I16 inner0, I16 outer1, I16 inner1) const {
-    return SplitPairs(Chroma(outer0, inner0), Chroma(outer1, inner1), matrix.Sum(2, outer0, inner0),
-                      matrix.Sum(2, outer1, inner1));
-  }
-  // The high words of the sums are the results.
-  HWY_INLINE I16 Chroma(I16 outer, I16 inner) const {
-    return JoinHighWords(AsI16(matrix.Sum(1, outer, inner)), AsI16(matrix.Sum(0, outer, inner)));
+  HWY_INLINE PairWords Multiply(const Pixels& even, const Pixels& odd) const {
+    const I32 one = AsI32(Dwords(1 << 16)), oddBias = hn::Add(matrix.chromaBias, one);
+    return {JoinHighWords(AsI16(matrix.U(even, matrix.chromaBias)), AsI16(matrix.V(even, matrix.chromaBias))),
+            JoinHighWords(AsI16(matrix.U(odd, oddBias)), AsI16(matrix.V(odd, oddBias))),
+            JoinHighWords(AsI16(matrix.Y(even)), AsI16(matrix.Y(odd)))};
   }
 
-  static HWY_INLINE U16 Alpha(U8 bgra) { return AsU16(hn::TableLookupBytes(bgra, ByteOrder<0x8383>())); }
+  static HWY_INLINE Pixels Premultiplied(U8 bgra) {
+    const auto alpha = AsU16(hn::TableLookupBytes(bgra, ByteOrder<0x8383>()));
+    const I16 green = Scale(AsU16(hn::TableLookupBytes(bgra, ByteOrder<0x8181>())), alpha);
+    return {hn::Sub(Scale(WordBytes<0>(bgra), alpha), green), green};
+  }
   // c a / 255 to nearest: (t + 128) 257 >> 16 of t = c a.
   static HWY_INLINE I16 Scale(U16 channels, U16 alpha) {
     const hn::ScalableTag<uint16_t> d;
     return AsI16(hn::MulHigh(hn::Add(hn::Mul(channels, alpha), hn::Set(d, uint16_t{128})), hn::Set(d, uint16_t{257})));
   }
-  HWY_INLINE I16 Green(U8 bgra, U16 alpha) const {
-    const auto green = Scale(WordBytes<1>(bgra), alpha);
-    return matrix.InnerOfDoubled(AsU8(hn::Add(green, green)));
-  }
 
-  VectorMatrix8 matrix;
+  Matrix matrix;
 };
 
-// Pairs from their own words, the even chroma of the pairs after them, and the details d of the pairs before them.
+// Pairs from their own words, the even chroma of the pairs after them, and the details d + 1 of the pairs before them.
 HWY_INLINE void LiftPairs(const PairWords& words, I16 following, I16& details, uint8_t* out) {
-  const hn::ScalableTag<int16_t> d;
   const I16 after = ShiftLaneIn(words.even, following);
   const I16 between = AsI16(hn::AverageRound(AsU16(words.even), AsU16(after)));
-  const I16 now = hn::Sub(words.odd, between);
-  const I16 sum = hn::Add(hn::Add(ShiftLaneOut(details, now), now), hn::Set(d, int16_t{2}));
+  const I16 now = hn::Sub(words.oddPlus1, between);
+  const I16 sum = hn::Add(ShiftLaneOut(details, now), now);
   details = now;
   StorePairs<PairOrder::Uyvy>(hn::Add(words.even, hn::ShiftRight<2>(sum)), words.luma, out);
 }
@@ -122,31 +114,41 @@ HWY_INLINE void Subsample(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT
     std::memcpy(tail, src + blocks * kSrcStep, 4 * rest);
   }
 
-  const I16 zero = hn::Zero(hn::ScalableTag<int16_t>());
-  PairWords words = {zero, zero, zero};
-  I16 details = zero;
+  const I16 one = hn::Set(hn::ScalableTag<int16_t>(), 1);
+  PairWords words = {one, one, one};
+  I16 details = one;
   for (size_t i = 0; i < steps; ++i) {
     const uint8_t* p = i < blocks ? src + i * kSrcStep : tail;
+    FetchAhead<kSrcStep>(p);
     const PairWords following = source(LoadVector<uint8_t>(p, 0), LoadVector<uint8_t>(p, 1));
     if (i > 0) LiftPairs(words, following.even, details, dst + (i - 1) * kDstStep);
     words = following;
   }
-  LiftPairs(words, ShiftLaneOut(words.odd, words.odd), details, rest > 0 ? out : dst + (blocks - 1) * kDstStep);
+  LiftPairs(words, hn::Sub(ShiftLaneOut(words.oddPlus1, words.oddPlus1), one), details,
+            rest > 0 ? out : dst + (blocks - 1) * kDstStep);
   if (rest > 0) std::memcpy(dst + blocks * kDstStep, out, (rest + 1) / 2 * 4);
 }
 
 HWY_ATTR void Vuyx8ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) { Subsample(src, dst, count, FromVuyx()); }
+
+template <bool kPremultiply>
+HWY_ATTR void BgraToUyvy(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& m) {
+  if (HWY_TARGET == HWY_AVX3 && HasVnni())
+    Subsample(src, dst, count, FromBgra<kPremultiply, true>{VectorRgbToYuv8<true>(m)});
+  else
+    Subsample(src, dst, count, FromBgra<kPremultiply, false>{VectorRgbToYuv8<false>(m)});
+}
 HWY_ATTR void Bgra8ToUyvy8_601(const uint8_t* src, uint8_t* dst, size_t count) {
-  Subsample(src, dst, count, FromBgra<true>{VectorMatrix8(kRgbToYuv8_601)});
+  BgraToUyvy<true>(src, dst, count, kRgbToYuv8_601);
 }
 HWY_ATTR void Bgra8ToUyvy8_709(const uint8_t* src, uint8_t* dst, size_t count) {
-  Subsample(src, dst, count, FromBgra<true>{VectorMatrix8(kRgbToYuv8_709)});
+  BgraToUyvy<true>(src, dst, count, kRgbToYuv8_709);
 }
 HWY_ATTR void Bgrx8ToUyvy8_601(const uint8_t* src, uint8_t* dst, size_t count) {
-  Subsample(src, dst, count, FromBgra<false>{VectorMatrix8(kRgbToYuv8_601)});
+  BgraToUyvy<false>(src, dst, count, kRgbToYuv8_601);
 }
 HWY_ATTR void Bgrx8ToUyvy8_709(const uint8_t* src, uint8_t* dst, size_t count) {
-  Subsample(src, dst, count, FromBgra<false>{VectorMatrix8(kRgbToYuv8_709)});
+  BgraToUyvy<false>(src, dst, count, kRgbToYuv8_709);
 }
 
 }  // namespace

@@ -3,6 +3,7 @@
 #include <cstdint>
 
 #include "convert/PlainPixels.h"
+#include "convert/Vnni.h"
 #include "convert/YuvFixed8.h"
 #include "convert/YuvKernels.h"
 
@@ -38,11 +39,11 @@ namespace HWY_NAMESPACE {
 namespace {
 
 // No result leaves 0..255, so the sums' third bytes are the results.
-template <AlphaWrite kAlpha>
+template <AlphaWrite kAlpha, bool kVnni>
 struct RgbToYuvOp {
   HWY_INLINE U8 operator()(U8 bgra) const {
-    const I16 blueRed = VectorMatrix8::OuterChannels(bgra), green = matrix.InnerChannel(bgra);
-    const I32 v = matrix.Sum(0, blueRed, green), u = matrix.Sum(1, blueRed, green), y = matrix.Sum(2, blueRed, green);
+    const auto pixels = matrix.Split(bgra);
+    const I32 v = matrix.V(pixels, matrix.chromaBias), u = matrix.U(pixels, matrix.chromaBias), y = matrix.Y(pixels);
     const U8 alpha = kAlpha == AlphaWrite::Keep ? bgra : Dwords(0xFF000000);
 #if HWY_TARGET == HWY_AVX3
     const __m512i third = ByteOrder<0x2222>().raw;
@@ -55,7 +56,7 @@ struct RgbToYuvOp {
     return SelectBytes(Dwords(0xFF00FF00), AsU8(ua), AsU8(vy));
 #endif
   }
-  VectorMatrix8 matrix;
+  VectorRgbToYuv8<kVnni> matrix;
 };
 
 template <AlphaWrite kAlpha>
@@ -81,11 +82,28 @@ struct YuvToRgbOp {
   VectorYuvToRgb8 matrix;
 };
 
-#define VX_KERNEL(Name, Family, kCoefficients, kAlpha)                                                  \
-  HWY_ATTR void Name(const uint8_t* src, uint8_t* dst, size_t count) {                                  \
-    using Op = Family##Op<kAlpha>;                                                                      \
-    MapRow<uint8_t>(src, dst, count, EachVector<uint8_t, Op>{Op{decltype(Op::matrix)(kCoefficients)}}); \
-  }
+template <class Op, class Matrix>
+HWY_INLINE void MapPixels(const uint8_t* src, uint8_t* dst, size_t count, const Matrix& matrix) {
+  MapRow<uint8_t>(src, dst, count, EachVector<uint8_t, Op>{Op{decltype(Op::matrix)(matrix)}});
+}
+template <AlphaWrite kAlpha>
+HWY_ATTR void RgbToYuv(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& matrix) {
+  if (HWY_TARGET == HWY_AVX3 && HasVnni())
+    MapPixels<RgbToYuvOp<kAlpha, true>>(src, dst, count, matrix);
+  else
+    MapPixels<RgbToYuvOp<kAlpha, false>>(src, dst, count, matrix);
+}
+template <AlphaWrite kAlpha>
+HWY_ATTR void YuvToYuv(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& matrix) {
+  MapPixels<YuvToYuvOp<kAlpha>>(src, dst, count, matrix);
+}
+template <AlphaWrite kAlpha>
+HWY_ATTR void YuvToRgb(const uint8_t* src, uint8_t* dst, size_t count, const FixedYuvToRgb8& matrix) {
+  MapPixels<YuvToRgbOp<kAlpha>>(src, dst, count, matrix);
+}
+
+#define VX_KERNEL(Name, Family, kCoefficients, kAlpha) \
+  HWY_ATTR void Name(const uint8_t* src, uint8_t* dst, size_t count) { Family<kAlpha>(src, dst, count, kCoefficients); }
 VEXEL_CONVERT_YUVMATRIX8_KERNELS(VX_KERNEL)
 #undef VX_KERNEL
 

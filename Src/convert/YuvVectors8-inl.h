@@ -54,6 +54,31 @@ HWY_INLINE I32 MultiplyPairs(I16 a, I16 b) {
 #endif
 }
 
+// Byte 0 of each word less byte 1.
+HWY_INLINE I16 SubtractOddBytes(U8 v) {
+  const U8 factors = Dwords(0xFF01FF01);
+#if HWY_TARGET == HWY_AVX3
+  return I16{_mm512_maddubs_epi16(v.raw, factors.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return I16{_mm256_maddubs_epi16(v.raw, factors.raw)};
+#else
+  return I16{_mm_maddubs_epi16(v.raw, factors.raw)};
+#endif
+}
+
+// sum + the products of pairs. No Highway target has the single instruction without more that processors lack, so the
+// caller says whether the processor has it.
+template <bool kVnni>
+HWY_INLINE I32 AddProducts(I32 sum, I16 a, I16 b) {
+#if HWY_TARGET == HWY_AVX3
+  if constexpr (kVnni) {
+    asm("vpdpwssd %2, %1, %0" : "+v"(sum.raw) : "v"(a.raw), "v"(b.raw));
+    return sum;
+  }
+#endif
+  return hn::Add(sum, MultiplyPairs(a, b));
+}
+
 // Bytes of `yes` where the mask vector is all ones, else of `no`.
 HWY_INLINE U8 SelectBytes(U8 mask, U8 yes, U8 no) {
 #if HWY_TARGET == HWY_AVX2
@@ -143,6 +168,38 @@ struct VectorMatrix8 {
 
   I16 outer[3], inner[3];
   U8 unit;
+};
+
+// The FixedMatrix8 from BGR, by the differences of blue and red from green: the coefficients of a chroma row sum to 0,
+// and what luma lacks is green times the sum of its row, in two halves because that has 16 bits. The sums are the same.
+template <bool kVnni>
+struct VectorRgbToYuv8 {
+  // Words (b - g, r - g) and (g, g).
+  struct Pixels {
+    I16 differences, green;
+  };
+  HWY_INLINE explicit VectorRgbToYuv8(const FixedMatrix8& m)
+      : v(WordPair(m.c0[0], m.c2[0])),
+        u(WordPair(m.c0[1], m.c2[1])),
+        y(WordPair(m.c0[2], m.c2[2])),
+        green(Halves(m.c0[2] + 2 * m.c1[2] + m.c2[2])),
+        chromaBias(AsI32(Dwords(static_cast<uint32_t>(m.biasUnit * m.bias[0])))),
+        lumaBias(AsI32(Dwords(static_cast<uint32_t>(m.biasUnit * m.bias[2])))) {}
+  static HWY_INLINE I16 Halves(int sum) { return WordPair(sum / 2, sum - sum / 2); }
+
+  static HWY_INLINE Pixels Split(U8 bgra) {
+    const U8 bgrg = hn::TableLookupBytes(bgra, ByteOrder<0x1210>());
+    return {SubtractOddBytes(bgrg), AsI16(hn::ShiftRight<8>(AsU16(bgrg)))};
+  }
+  // The high words are the results.
+  HWY_INLINE I32 V(const Pixels& p, I32 bias) const { return AddProducts<kVnni>(bias, p.differences, v); }
+  HWY_INLINE I32 U(const Pixels& p, I32 bias) const { return AddProducts<kVnni>(bias, p.differences, u); }
+  HWY_INLINE I32 Y(const Pixels& p) const {
+    return AddProducts<kVnni>(AddProducts<kVnni>(lumaBias, p.differences, y), p.green, green);
+  }
+
+  I16 v, u, y, green;
+  I32 chromaBias, lumaBias;
 };
 
 // FixedYuvToRgb8 with its numbers in vectors. Words have 6 fractional bits.
