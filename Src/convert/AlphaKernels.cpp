@@ -8,6 +8,8 @@
 
 #include "convert/PlainPixels.h"
 #include "convert/RgbKernels.h"
+#include "convert/Unpremultiply512.h"
+#include "convert/Vbmi.h"
 
 #undef HWY_TARGET_INCLUDE
 #define HWY_TARGET_INCLUDE "convert/AlphaKernels.cpp"
@@ -287,6 +289,8 @@ HWY_ATTR void Premultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 template <const Layout& kLayout>
 HWY_ATTR void Unpremultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && !IsVuy(kLayout) && HasVbmi())
+    return kLayout.alpha == 3 ? UnpremultiplyLast512(src, dst, count) : UnpremultiplyFirst512(src, dst, count);
   MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Singly<Unpremultiply8<kLayout>>>());
 }
 template <const Layout& kLayout>

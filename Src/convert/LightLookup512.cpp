@@ -1,21 +1,12 @@
 #include "convert/LightLookup512.h"
 
-#include <immintrin.h>
-
 #include <cstring>
 
 #include "convert/LightCodes.h"
-
-#if defined(__GNUC__) && !defined(__clang__)
-#pragma GCC diagnostic ignored "-Wuninitialized"  // GCC 12 warns of its own intrinsics
-#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
-#endif
+#include "convert/Vbmi.h"
 
 namespace vexel {
 namespace {
-
-// No Highway target has these instructions without more that processors lack.
-#define VX_VBMI __attribute__((target("avx512f,avx512bw,avx512dq,avx512vl,avx512vbmi")))
 
 constexpr size_t kPixels = 16;
 
@@ -37,14 +28,8 @@ struct BytePlanes {
   }
 };
 
-VX_VBMI inline __m512i LookUp(const uint8_t* plane, __m512i codes) {
-  const __m512i low = _mm512_permutex2var_epi8(_mm512_load_si512(plane), codes, _mm512_load_si512(plane + 64));
-  const __m512i high = _mm512_permutex2var_epi8(_mm512_load_si512(plane + 128), codes, _mm512_load_si512(plane + 192));
-  return _mm512_mask_mov_epi8(low, _mm512_movepi8_mask(codes), high);
-}
-
 // Four pixels: their light, with alpha in place of the fourth. `which` repeats the index of each pixel four times.
-VX_VBMI inline void Finish(__m512i light, __m512i codes, __m512i which, uint8_t* dst) {
+VX_VBMI_INLINE void Finish(__m512i light, __m512i codes, __m512i which, uint8_t* dst) {
   const __m512i alpha = _mm512_srli_epi32(_mm512_permutexvar_epi32(which, codes), 24);
   const __m512 scaled = _mm512_mul_ps(_mm512_cvtepi32_ps(alpha), _mm512_set1_ps(k8uTo32f));
   _mm512_storeu_ps(dst, _mm512_mask_mov_ps(_mm512_castsi512_ps(light), 0x8888, scaled));
@@ -52,8 +37,8 @@ VX_VBMI inline void Finish(__m512i light, __m512i codes, __m512i which, uint8_t*
 
 VX_VBMI void Convert16(const uint8_t* src, uint8_t* dst, const BytePlanes& planes) {
   const __m512i codes = _mm512_loadu_si512(src);
-  const __m512i byte0 = LookUp(planes.bytes[0], codes), byte1 = LookUp(planes.bytes[1], codes),
-                byte2 = LookUp(planes.bytes[2], codes), byte3 = LookUp(planes.bytes[3], codes);
+  const __m512i byte0 = LookUpBytes(planes.bytes[0], codes), byte1 = LookUpBytes(planes.bytes[1], codes),
+                byte2 = LookUpBytes(planes.bytes[2], codes), byte3 = LookUpBytes(planes.bytes[3], codes);
   const __m512i lowHalf0 = _mm512_unpacklo_epi8(byte0, byte1), lowHalf1 = _mm512_unpackhi_epi8(byte0, byte1),
                 highHalf0 = _mm512_unpacklo_epi8(byte2, byte3), highHalf1 = _mm512_unpackhi_epi8(byte2, byte3);
   // Pixel k of each of the four lanes.
@@ -74,11 +59,6 @@ VX_VBMI void Convert16(const uint8_t* src, uint8_t* dst, const BytePlanes& plane
 }
 
 }  // namespace
-
-bool HasLightLookup512() noexcept {
-  static const bool has = __builtin_cpu_supports("avx512vbmi");
-  return has;
-}
 
 void LightLookup512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
   const BytePlanes& planes = BytePlanes::Get();

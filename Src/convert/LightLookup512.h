@@ -6,9 +6,7 @@
 
 namespace vexel {
 
-bool HasLightLookup512() noexcept;
-
-// The same bytes as kBgra8ToLinear. Only where HasLightLookup512.
+// The same bytes as kBgra8ToLinear. Only where HasVbmi (convert/Vbmi.h).
 void LightLookup512(const uint8_t* src, uint8_t* dst, size_t count) noexcept;
 
 }  // namespace vexel

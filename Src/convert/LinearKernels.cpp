@@ -13,6 +13,7 @@
 #include "convert/LightLookup512.h"
 #include "convert/PlainPixels.h"
 #include "convert/RgbKernels.h"
+#include "convert/Vbmi.h"
 
 #undef HWY_TARGET_INCLUDE
 #define HWY_TARGET_INCLUDE "convert/LinearKernels.cpp"
@@ -127,7 +128,7 @@ class LinearToBgra8Body {
 #if HWY_TARGET <= HWY_SSE4
 // A pixel is put together from the entries of its four codes, 16 bytes each.
 HWY_ATTR void Bgra8ToLinear(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  if (HWY_TARGET == HWY_AVX3 && HasLightLookup512()) return LightLookup512(src, dst, count);
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return LightLookup512(src, dst, count);
   const float* const entries = LinearCodes::Get().entries[0];
   const auto entry = [entries](uint64_t offset)
                          HWY_ATTR { return _mm_load_ps(entries + (offset & 0xFF0) / sizeof(float)); };

@@ -30,19 +30,20 @@ struct PairWords {
   I16 even, oddPlus1, luma;
 };
 
-// The pixels of two vectors, apart.
+// The even and the odd of the pixels of two vectors.
 struct PairPixels {
-  HWY_INLINE PairPixels(U8 a, U8 b) {
-    const hn::ScalableTag<int32_t> d;
-    even = AsU8(hn::ConcatEven(d, AsI32(b), AsI32(a)));
-    odd = AsU8(hn::ConcatOdd(d, AsI32(b), AsI32(a)));
-  }
   U8 even, odd;
 };
+HWY_INLINE PairPixels SplitPixels(U8 a, U8 b) {
+  const hn::ScalableTag<int32_t> d;
+  return {AsU8(hn::ConcatEven(d, AsI32(b), AsI32(a))), AsU8(hn::ConcatOdd(d, AsI32(b), AsI32(a)))};
+}
 
+// A source makes words of two vectors of pixels, in two stages.
 struct FromVuyx {
-  HWY_INLINE PairWords operator()(U8 a, U8 b) const {
-    const PairPixels pixels(a, b);
+  using Stage = PairPixels;
+  static HWY_INLINE Stage Prepare(U8 a, U8 b) { return SplitPixels(a, b); }
+  static HWY_INLINE PairWords Finish(const Stage& pixels) {
     const auto chroma = ByteOrder<0x8081>(), luma = ByteOrder<0x8282>();
     const I16 odd = AsI16(hn::TableLookupBytes(pixels.odd, chroma));
     return {AsI16(hn::TableLookupBytes(pixels.even, chroma)), hn::Add(odd, hn::Set(hn::ScalableTag<int16_t>(), 1)),
@@ -55,18 +56,23 @@ struct FromBgra {
   using Matrix = VectorRgbToYuv8<kVnni>;
   using Pixels = typename Matrix::Pixels;
 
-  HWY_INLINE PairWords operator()(U8 a, U8 b) const {
-    const PairPixels pixels(a, b);
+  struct Stage {
+    Pixels even, odd;
+  };
+
+  static HWY_INLINE Stage Prepare(U8 a, U8 b) {
+    const PairPixels pixels = SplitPixels(a, b);
     if constexpr (kPremultiply) {
       const hn::ScalableTag<uint32_t> d;
       const auto opaque = hn::BitCast(d, Dwords(0xFF000000)), alphas = hn::And(hn::BitCast(d, hn::And(a, b)), opaque);
       if (HWY_UNLIKELY(!hn::AllTrue(d, hn::Eq(alphas, opaque))))
-        return Multiply(Premultiplied(pixels.even), Premultiplied(pixels.odd));
+        return {Premultiplied(pixels.even), Premultiplied(pixels.odd)};
     }
-    return Multiply(Matrix::Split(pixels.even), Matrix::Split(pixels.odd));
+    return {Matrix::Split(pixels.even), Matrix::Split(pixels.odd)};
   }
 
-  HWY_INLINE PairWords Multiply(const Pixels& even, const Pixels& odd) const {
+  HWY_INLINE PairWords Finish(const Stage& stage) const {
+    const auto& [even, odd] = stage;
     const I32 one = AsI32(Dwords(1 << 16)), oddBias = hn::Add(matrix.chromaBias, one);
     return {JoinHighWords(AsI16(matrix.U(even, matrix.chromaBias)), AsI16(matrix.V(even, matrix.chromaBias))),
             JoinHighWords(AsI16(matrix.U(odd, oddBias)), AsI16(matrix.V(odd, oddBias))),
@@ -98,29 +104,35 @@ HWY_INLINE void LiftPairs(const PairWords& words, I16 following, I16& details, u
 }
 
 // A row of `count` pixels, a vector of pairs at a time, each written when the next one is known. What follows the row
-// is its last pixel over and over.
+// is its last pixel over and over. Where there are registers for it, the first stage is one step ahead: all in a row is
+// a longer chain than processors overlap.
 template <class Source>
 HWY_INLINE void Subsample(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count,
                           const Source& source) {
+  constexpr bool kAhead = HWY_TARGET <= HWY_AVX2;
   constexpr size_t kPixels = 2 * kVectorPairs, kSrcStep = 4 * kPixels, kDstStep = 2 * kPixels;
   if (count == 0) return;
   const size_t blocks = count / kPixels, rest = count % kPixels, steps = blocks + (rest > 0);
   alignas(64) uint8_t tail[kSrcStep], out[kDstStep];
-  if (rest > 0) {
-    uint32_t last;
-    std::memcpy(&last, src + 4 * (count - 1), 4);
-    StoreVector(Dwords(last), tail, 0);
-    StoreVector(Dwords(last), tail, 1);
-    std::memcpy(tail, src + blocks * kSrcStep, 4 * rest);
-  }
+  uint32_t last;
+  std::memcpy(&last, src + 4 * (count - 1), 4);
+  StoreVector(Dwords(last), tail, 0);
+  StoreVector(Dwords(last), tail, 1);
+  if (rest > 0) std::memcpy(tail, src + blocks * kSrcStep, 4 * rest);
 
+  const auto prepare = [&](size_t i) HWY_ATTR {
+    const uint8_t* p = i < blocks ? src + i * kSrcStep : tail;
+    FetchAhead<kSrcStep>(p);
+    return source.Prepare(LoadVector<uint8_t>(p, 0), LoadVector<uint8_t>(p, 1));
+  };
   const I16 one = hn::Set(hn::ScalableTag<int16_t>(), 1);
   PairWords words = {one, one, one};
   I16 details = one;
+  auto stage = prepare(0);
   for (size_t i = 0; i < steps; ++i) {
-    const uint8_t* p = i < blocks ? src + i * kSrcStep : tail;
-    FetchAhead<kSrcStep>(p);
-    const PairWords following = source(LoadVector<uint8_t>(p, 0), LoadVector<uint8_t>(p, 1));
+    const auto now = kAhead ? stage : prepare(i);
+    if (kAhead) stage = prepare(i + 1);
+    const PairWords following = source.Finish(now);
     if (i > 0) LiftPairs(words, following.even, details, dst + (i - 1) * kDstStep);
     words = following;
   }

@@ -1,0 +1,31 @@
+// Look-ups in tables of 256 bytes, which AVX512-VBMI makes permutations of registers. No kernel variant implies it.
+#pragma once
+
+#include <immintrin.h>
+
+#include <cstdint>
+
+#if defined(__GNUC__) && !defined(__clang__)
+#pragma GCC diagnostic ignored "-Wuninitialized"  // GCC 12 warns of its own intrinsics
+#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
+#endif
+
+// Of functions that use it. No Highway target has these instructions without more that processors lack.
+#define VX_VBMI __attribute__((target("avx512f,avx512bw,avx512dq,avx512vl,avx512vbmi")))
+#define VX_VBMI_INLINE VX_VBMI __attribute__((always_inline)) inline
+
+namespace vexel {
+
+inline bool HasVbmi() noexcept {
+  static const bool has = __builtin_cpu_supports("avx512vbmi");
+  return has;
+}
+
+// The table is two pairs of registers.
+VX_VBMI_INLINE __m512i LookUpBytes(const uint8_t* table, __m512i codes) {
+  const __m512i low = _mm512_permutex2var_epi8(_mm512_load_si512(table), codes, _mm512_load_si512(table + 64));
+  const __m512i high = _mm512_permutex2var_epi8(_mm512_load_si512(table + 128), codes, _mm512_load_si512(table + 192));
+  return _mm512_mask_mov_epi8(low, _mm512_movepi8_mask(codes), high);
+}
+
+}  // namespace vexel
