@@ -174,33 +174,65 @@ void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
       });
 }
 
-// The fourth sample is written back as it was: a masked store, or narrow ones, cost more than reading the line that has
-// to be fetched anyway.
+// The fourth sample is neither read nor written: it may be somebody else's.
+#if HWY_TARGET == HWY_AVX3
 void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
   const hn::ScalableTag<uint64_t> d;
+  const hn::ScalableTag<uint16_t> d16;
   const hn::Rebind<uint32_t, decltype(d)> dWords;
   const size_t lanes = hn::Lanes(d);
-  const auto convert = [&](const uint8_t* from, uint8_t* to) HWY_ATTR {
-    auto* pixels = reinterpret_cast<uint64_t*>(to);
-    const auto w = hn::PromoteTo(d, hn::LoadU(dWords, reinterpret_cast<const uint32_t*>(from)));
+  const auto pixels = [&](const uint32_t* words) HWY_ATTR {
+    const auto w = hn::PromoteTo(d, hn::LoadU(dWords, words));
     const auto first = hn::And(hn::ShiftLeft<4>(w), hn::Set(d, kTopTen));
     const auto second = hn::And(hn::ShiftLeft<10>(w), hn::Set(d, uint64_t{kTopTen} << 16));
     const auto third = hn::And(hn::ShiftLeft<16>(w), hn::Set(d, uint64_t{kTopTen} << 32));
-    const auto fourth = hn::And(hn::LoadU(d, pixels), hn::Set(d, uint64_t{0xFFFF} << 48));
-    hn::StoreU(hn::Or(hn::Or(first, second), hn::Or(third, fourth)), d, pixels);
+    return hn::BitCast(d16, hn::Or(hn::Or(first, second), third));
   };
+  const auto samples = [&](size_t n) HWY_ATTR {
+    const auto colour = hn::MaskFromVec(hn::BitCast(d16, hn::Set(d, 0x0000FFFFFFFFFFFF)));
+    return hn::And(colour, hn::FirstN(d16, 4 * n));
+  };
+  const auto full = samples(lanes);
   size_t i = 0;
   for (; i + lanes <= count; i += lanes) {
     FetchAhead<HWY_MAX_BYTES>(dst + 8 * i);
-    convert(src + 4 * i, dst + 8 * i);
+    hn::BlendedStore(pixels(reinterpret_cast<const uint32_t*>(src) + i), full, d16,
+                     reinterpret_cast<uint16_t*>(dst) + 4 * i);
   }
   if (i == count) return;
-  alignas(64) uint8_t words[HWY_MAX_BYTES / 2] = {}, pixels[HWY_MAX_BYTES] = {};
+  alignas(64) uint32_t words[HWY_MAX_BYTES / 8] = {};
   std::memcpy(words, src + 4 * i, 4 * (count - i));
-  std::memcpy(pixels, dst + 8 * i, 8 * (count - i));
-  convert(words, pixels);
-  std::memcpy(dst + 8 * i, pixels, 8 * (count - i));
+  hn::BlendedStore(pixels(words), samples(count - i), d16, reinterpret_cast<uint16_t*>(dst) + 4 * i);
 }
+#else
+// Without masked stores of 16-bit lanes, the fourth sample is stepped over with ordinary stores of 4 and 2 bytes, two
+// pixels being computed at once.
+void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
+  const auto both = [](uint32_t mask) { return mask * 0x100000001u; };
+  const auto store = [](uint8_t* to, uint64_t lower, uint64_t upper) {
+    const auto two = static_cast<uint32_t>(lower);
+    const auto third = static_cast<uint16_t>(upper);
+    std::memcpy(to, &two, 4);
+    std::memcpy(to + 4, &third, 2);
+  };
+  const auto pixels = [&](uint64_t w, uint8_t* to, bool isPair) {
+    const uint64_t lower = ((w << 4) & both(kTopTen)) | ((w << 10) & both(uint32_t{kTopTen} << 16));
+    const uint64_t upper = (w >> 16) & both(kTopTen);
+    store(to, lower, upper);
+    if (isPair) store(to + 8, lower >> 32, upper >> 32);
+  };
+  size_t i = 0;
+  for (; i + 2 <= count; i += 2) {
+    uint64_t two;
+    std::memcpy(&two, src + 4 * i, 8);
+    pixels(two, dst + 8 * i, true);
+  }
+  if (i == count) return;
+  uint32_t one;
+  std::memcpy(&one, src + 4 * i, 4);
+  pixels(one, dst + 8 * i, false);
+}
+#endif
 
 // The first three samples of each pixel, left-aligned 10-bit values, as a word in the lower half of its lane.
 template <class V>

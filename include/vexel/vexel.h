@@ -211,8 +211,8 @@ VX_API VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t s
                                                       int32_t dstRowBytes, int32_t width, int32_t height) VX_NOEXCEPT;
 
 /* 10-bit RGB words to and from four 16-bit samples, of which the first three hold R, G and B in their upper ten bits;
- * the lower six are written as zero and dropped when read. The fourth keeps its value and has no effect. The 16-bit
- * side has 8 bytes per pixel and no row padding. */
+ * the lower six are written as zero and dropped when read. The fourth is neither read nor written. The 16-bit side
+ * has 8 bytes per pixel and no row padding. */
 VX_API VX_Result VX_Convert_RGB_444_10u_To_DNxHD16u(const void* src, int32_t srcRowBytes, void* dst, int32_t width,
                                                     int32_t height) VX_NOEXCEPT;
 VX_API VX_Result VX_Convert_DNxHD16u_To_RGB_444_10u(const void* src, void* dst, int32_t dstRowBytes, int32_t width,
