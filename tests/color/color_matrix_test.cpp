@@ -200,21 +200,23 @@ TEST(ColorSpaces, KeepTheirLayout) {
   EXPECT_EQ(reinterpret_cast<Curve>(slots[3])(self, 0.5f), space.LinearToEOTF(0.5f));
   EXPECT_EQ(reinterpret_cast<Curve>(slots[4])(self, 0.5f), space.EOTFToLinear(0.5f));
   const float in[4] = {0.1f, 0.5f, 0.9f, 1};
-  float a[4], b[4];
-  using Convert = void (*)(const void*, const float*, float*, int, bool);
-  reinterpret_cast<Convert>(slots[5])(self, in, a, 1, true), space.ConvertPixelsFromRec709(in, b, 1, true);
-  EXPECT_EQ(std::memcmp(a, b, sizeof a), 0);
-  reinterpret_cast<Convert>(slots[6])(self, in, a, 1, true), space.ConvertPixelsToRec709(in, b, 1, true);
-  EXPECT_EQ(std::memcmp(a, b, sizeof a), 0);
-  using Compress = void (*)(const void*, const float*, float*, int, float, float, float);
-  reinterpret_cast<Compress>(slots[7])(self, in, a, 1, 1, 1.2f, 0.6f),
-      space.CompressPixelsToSDR(in, b, 1, 1, 1.2f, 0.6f);
-  EXPECT_EQ(std::memcmp(a, b, sizeof a), 0);
-  using Yuv = void (*)(const void*, const float*, float*, int);
-  reinterpret_cast<Yuv>(slots[8])(self, in, a, 1), space.ConvertPixelsFromYUVtoRGB(in, b, 1);
-  EXPECT_EQ(std::memcmp(a, b, sizeof a), 0);
-  reinterpret_cast<Yuv>(slots[9])(self, in, a, 1), space.ConvertPixelsFromRGBtoYUV(in, b, 1);
-  EXPECT_EQ(std::memcmp(a, b, sizeof a), 0);
+  const auto same = [](const auto& bySlot, const auto& byName) {
+    float a[4], b[4];
+    bySlot(a), byName(b);
+    return std::memcmp(a, b, sizeof a) == 0;
+  };
+  const auto slot = [&]<class... Arguments>(int index, Arguments... arguments) {
+    return [=](float* out) {
+      reinterpret_cast<void (*)(const void*, const float*, float*, int, Arguments...)>(slots[index])(self, in, out, 1,
+                                                                                                     arguments...);
+    };
+  };
+  EXPECT_TRUE(same(slot(5, true), [&](float* out) { space.ConvertPixelsFromRec709(in, out, 1, true); }));
+  EXPECT_TRUE(same(slot(6, true), [&](float* out) { space.ConvertPixelsToRec709(in, out, 1, true); }));
+  EXPECT_TRUE(
+      same(slot(7, 1.0f, 1.2f, 0.6f), [&](float* out) { space.CompressPixelsToSDR(in, out, 1, 1, 1.2f, 0.6f); }));
+  EXPECT_TRUE(same(slot(8), [&](float* out) { space.ConvertPixelsFromYUVtoRGB(in, out, 1); }));
+  EXPECT_TRUE(same(slot(9), [&](float* out) { space.ConvertPixelsFromRGBtoYUV(in, out, 1); }));
 #endif
 }
 

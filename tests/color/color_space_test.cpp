@@ -4,16 +4,16 @@
 #include <functional>
 #include <limits>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "color/color_reference.h"
-#include "frame/KernelVariant.h"
+#include "support/Arena.h"
 #include "support/Random.h"
 #include "support/Ulp.h"
+#include "support/Variants.h"
 #include "vexel/color_space.h"
 
 namespace vexel::testing {
@@ -261,55 +261,26 @@ TEST(ColorConversions, MatchDoublePrecision) {
   }
 }
 
-// NaNs as such, everything else in all bits.
-bool SamePixels(const float* a, const float* b, size_t floats) {
-  for (size_t i = 0; i < floats; ++i)
-    if (!SameBits(a[i], b[i]) && !(std::isnan(a[i]) && std::isnan(b[i]))) return false;
-  return true;
-}
-
-class VariantScope {
- public:
-  ~VariantScope() { LimitKernelVariant(mSaved); }
-
- private:
-  KernelVariant mSaved = ActiveKernelVariant();
-};
-
-TEST(ColorConversions, GiveTheSameBitsInEveryVariantAtEveryCountAndAlignment) {
-  constexpr size_t kCount = 531, kFloats = 4 * kCount;  // Beyond two blocks of the widest variant.
-  const float special[] = {0.0f, -0.0f,     1.0f,       -1.0f, kInfinity, -kInfinity,
-                           kNaN, 0x1p-140f, -0x1p-140f, 3e38f, 1e-20f,    70.0f};
-  Random random(11);
-  const VariantScope scope;
-  for (const Operation& operation : AllOperations()) {
-    SCOPED_TRACE(operation.name);
-    std::vector<float> in(kFloats), expected(kFloats), memory(kFloats + 32);
-    for (float& v : in) v = random.OneIn(12) ? special[random.Next() % std::size(special)] : Draw(operation, random);
-    LimitKernelVariant(KernelVariant::Plain);
-    operation.run(in.data(), expected.data(), kCount);
-    for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v) {
-      LimitKernelVariant(static_cast<KernelVariant>(v));
-      for (size_t count = 0; count <= kCount; count += count < 67 ? 1 : 116) {
-        const size_t offset = random.Next() % 16, from = random.Next() % (kCount - count + 1), floats = 4 * count;
-        std::vector<float> source(memory.size());
-        std::copy_n(in.begin() + static_cast<ptrdiff_t>(4 * from), floats, source.begin() + 3);
-        for (const bool inPlace : {false, true}) {
-          std::fill(memory.begin(), memory.end(), 123.0f);
-          float* dst = memory.data() + offset;
-          if (inPlace) std::copy_n(source.begin() + 3, floats, dst);
-          operation.run(inPlace ? dst : source.data() + 3, dst, static_cast<int>(count));
-          ASSERT_TRUE(SamePixels(dst, expected.data() + 4 * from, floats))
-              << "variant " << v << ", " << count << " pixels";
-          std::fill_n(dst, floats, 123.0f);
-          ASSERT_THAT(memory, ::testing::Each(123.0f)) << "variant " << v << ", " << count << " pixels";
-        }
-      }
+TEST(ColorConversions, StayInTheirRowsAndGiveTheSameBitsInEveryVariant) {
+  for (const Operation& operation : AllOperations())
+    for (const bool inPlace : {false, true}) {
+      ArenaCase c;
+      c.name = operation.name;
+      c.destination = VX_PixelFormat::BGRA_4444_32f;
+      c.widths = Range(1, 67);
+      c.widths.insert(c.widths.end(), {183, 299, 415, 531});  // beyond two blocks of the widest variant
+      c.heights = {1, 2};
+      c.destinationIsInput = inPlace;
+      if (!inPlace) c.sources = {c.destination};
+      c.run = [&](const ArenaFrame* sources, const ArenaFrame& to) {
+        for (int y = 0; y < to.height; ++y)
+          operation.run(reinterpret_cast<const float*>((inPlace ? to : *sources).Row(y)),
+                        reinterpret_cast<float*>(to.Row(y)), to.width);
+        for (const int none : {0, -5, std::numeric_limits<int>::min()}) operation.run(nullptr, nullptr, none);
+        return VX_Success;
+      };
+      EXPECT_TRUE(RunArena(c));
     }
-    operation.run(nullptr, nullptr, 0);
-    operation.run(nullptr, nullptr, -5);
-    operation.run(nullptr, nullptr, std::numeric_limits<int>::min());
-  }
 }
 
 // ---- Numbers of the standards and the edges ----
@@ -351,10 +322,6 @@ TEST(ColorCurves, ScalarFunctionsFollowTheStandards) {
   const VX::HLGColorSpace hlg;
   EXPECT_EQ(hlg.LinearToEOTF(-2), -2);
   EXPECT_EQ(hlg.EOTFToLinear(3), 3);
-  for (const float gamma : {0.0f, kInfinity, kNaN, -1.0f}) {
-    const VX::GammaColorSpace odd(gamma);
-    for (const float v : {0.0f, 0.5f, 1.0f, -2.0f}) (void)odd.LinearToEOTF(v), (void)odd.EOTFToLinear(v);
-  }
 }
 
 TEST(ColorCurves, PixelsFollowTheStandards) {
@@ -367,16 +334,11 @@ TEST(ColorCurves, PixelsFollowTheStandards) {
   };
   const VX::PQColorSpace pq(false, false);
   const VX::HLGColorSpace hlg;
-  EXPECT_NEAR(grey(pq, true, 1), 0.5080784, 2e-6);
-  EXPECT_NEAR(grey(pq, false, 0.5080784f), 1, 2e-3);              // One of 4,096 steps of the curve.
   EXPECT_NEAR(grey(pq, false, 1), std::pow(100, 1 / 2.4), 1e-4);  // 10,000 cd/m2
-  EXPECT_EQ(grey(pq, false, 7), grey(pq, false, 1));
-  EXPECT_NEAR(grey(hlg, true, 1), 0.6297, 1e-4);  // 0.1 of peak, inverse system gamma 1.2
+  EXPECT_NEAR(grey(hlg, true, 1), 0.6297, 1e-4);                  // 0.1 of peak, inverse system gamma 1.2
   // BT.2100: 75 % is 203 cd/m2, the peak 1,000 cd/m2.
   EXPECT_NEAR(std::pow(grey(hlg, false, 0.75f), 2.4), 2.03, 0.01);
   EXPECT_NEAR(std::pow(grey(hlg, false, 1), 2.4), 10, 1e-3);
-  // Tables have no steps in between, and hold their ends.
-  EXPECT_EQ(grey(pq, false, (1000 + 0.01f) / 4095), grey(pq, false, (1000 + 0.99f) / 4095));
   EXPECT_EQ(grey(hlg, false, kNaN), grey(hlg, false, 0));
 }
 
@@ -437,7 +399,6 @@ TEST(ColorSpaces, WithoutAToneCurveLeaveTheDestination) {
 TEST(ColorP010, DecodesAllWidthsAndCodes) {
   const VX::Rec2020ColorSpace rec2020;
   Random random(7);
-  const VariantScope scope;
   const uint16_t edges[] = {0, 4095, 4096, 4097, 32768, 60160, 60161, 61440, 65472, 65535};
   for (int width = 0; width <= 67; ++width) {
     const size_t w = static_cast<size_t>(width);
@@ -446,14 +407,13 @@ TEST(ColorP010, DecodesAllWidthsAndCodes) {
       code = random.OneIn(3) ? edges[random.Next() % std::size(edges)] : static_cast<uint16_t>(random.Bits32());
     const uint16_t *luma[2] = {codes.data(), codes.data() + w}, *chroma = codes.data() + 2 * w;
     std::vector<float> plain;
-    for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v) {
-      LimitKernelVariant(static_cast<KernelVariant>(v));
+    ForEachVariant([&](int v) {
       std::vector<float> out(8 * w + 8, 77.0f);
       rec2020.Convert2RowsFromP010toRGB(luma[0], luma[1], chroma, out.data(), out.data() + 4 * w + 4, width);
       if (v == 0) plain = out;
       ASSERT_EQ(std::memcmp(out.data(), plain.data(), out.size() * sizeof(float)), 0)
           << "variant " << v << " width " << width;
-    }
+    });
     for (size_t row = 0; row < 2; ++row) {
       const float* out = plain.data() + row * (4 * w + 4);
       EXPECT_EQ(out[4 * w], 77);
@@ -475,12 +435,10 @@ TEST(ColorP010, DecodesAllWidthsAndCodes) {
 
 TEST(ColorClamp, StaysOneRowBehind) {
   Random random(9);
-  const VariantScope scope;
   for (const int rowBytes : {-8, 0, 3, 4, 30, 100, 128, 132, 260})
     for (int rows = -1; rows <= 5; ++rows)
-      for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v)
+      ForEachVariant([&](int v) {
         for (const auto& [lo, hi] : {std::pair{0.0f, 1.0f}, {0.6f, 0.2f}, {-kInfinity, 0.5f}}) {
-          LimitKernelVariant(static_cast<KernelVariant>(v));
           std::vector<uint8_t> in(2048), out(2048, 0x55);
           for (size_t i = 0; i + 4 <= in.size(); i += 4) {
             const float value = random.OneIn(6) ? (random.OneIn(2) ? kNaN : -0.0f) : random.Float(-1, 2);
@@ -499,33 +457,7 @@ TEST(ColorClamp, StaysOneRowBehind) {
                                rowBytes, lo, hi);
           ASSERT_EQ(out, expected) << "variant " << v << ", " << rows << " rows of " << rowBytes << " bytes";
         }
-}
-
-// ---- Threads ----
-
-TEST(ColorSpaces, CachesMayBeFilledByManyThreads) {
-  for (int round = 0; round < 50; ++round) {
-    const VX::DCIP3ColorSpace p3(VX_IlluminantD60);
-    const VX::PQColorSpace pq(true, round % 2 != 0);
-    std::array<std::array<float, 40>, 8> results;
-    std::vector<std::thread> threads;
-    for (auto& result : results)
-      threads.emplace_back([&] {
-        float* out = result.data();
-        const float in[8] = {0.1f, 0.5f, 0.9f, 1, 0.8f, 0.2f, 0.3f, 0};
-        p3.ConvertPixelsFromRec709(in, out, 2, true);
-        pq.ConvertPixelsToRec709(in, out + 8, 2, false);
-        pq.ConvertPixelsFromRec709(in, out + 16, 2, false);
-        const VX::DCIP3ColorSpace copy(p3);
-        copy.ConvertPixelsToRec709(in, out + 24, 2, false);
-        std::memcpy(out + 32, p3.LuminanceCoeffs(), 12);
-        std::memcpy(out + 35, pq.LuminanceCoeffs(), 12);
-        out[38] = pq.RGBtoXYZ()[1][1];
-        out[39] = p3.XYZtoRGB()[2][0];
       });
-    for (std::thread& thread : threads) thread.join();
-    for (const auto& result : results) ASSERT_EQ(std::memcmp(result.data(), results[0].data(), sizeof result), 0);
-  }
 }
 
 }  // namespace

@@ -290,19 +290,6 @@ TEST(BlendMode, KernelsInTheArena) {
     }
 }
 
-// A picture stored bottom row first over one stored top row first.
-TEST(BlendMode, PicturesMeetUpright) {
-  constexpr F kPairs = F::UYVY_422_8u_709;
-  Image up(kBytes, 2, 5), black(kPairs, 2, 5), out(kBytes, 2, 5), pairs(kPairs, 2, 5);
-  for (int y = 0; y < 5; ++y)
-    for (int i = 0; i < 8; ++i) up.UprightRow(y)[i] = i % 4 == 3 ? 255 : static_cast<uint8_t>(40 * y + 20);
-  ASSERT_EQ(FillWith(VX_FillWithOpaqueBlack, black), VX_Success);
-  ASSERT_EQ(Blend(M::LinearDodge, up, black, out), VX_Success);
-  EXPECT_EQ(out.bytes, up.bytes);
-  ASSERT_EQ(Blend(M::LinearDodge, up, black, pairs), VX_Success);
-  for (int y = 1; y < 5; ++y) EXPECT_GT(pairs.Row(y)[1], pairs.Row(y - 1)[1]) << "brighter toward the bottom";
-}
-
 TEST(BlendMode, UnknownModesComeAfterFrames) {
   for (const int32_t mode : {27, -1, INT32_MIN})
     for (const auto& [src, expected] :

@@ -161,7 +161,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
       const bool first = repeat >= 12;
       const F src = first ? alphaFirst[pair % 5] : inputs[pair % 10];
       const F background = first ? alphaFirst[repeat / 5 % 5] : inputs[(pair / 10 + 3 * repeat) % 10];
-      SCOPED_TRACE(std::string(FormatName(src)) + " over " + FormatName(background) + " in " + FormatName(dst));
+      SCOPED_TRACE(FormatName(src) + " over " + FormatName(background) + " in " + FormatName(dst));
       const F working = WorkingByName(dst);
       // Straight inputs, unless none is and the result can do without.
       const auto isStraight = [](F format) { return AlphaKind(format) == kAlphaStraight; };

@@ -125,7 +125,7 @@ TEST(Fills, ColorIsConvertedOnceForEveryPair) {
   const uint8_t bytes[16] = {0x80, 0x40, 0xC0, 0x3E, 0x11, 0x22, 0x33, 0x3F, 0x10, 0xA0, 0xB0, 0x3D, 0x77, 0, 0, 0x3F};
   for (const F color : RasterFormats())
     for (const F format : RasterFormats()) {
-      SCOPED_TRACE(std::string(FormatName(color)) + " in " + FormatName(format));
+      SCOPED_TRACE(FormatName(color) + " in " + FormatName(format));
       const std::string name = FormatName(format);
       if (!HasAlpha(name) && name.substr(0, 4).find('X') == std::string::npos) {
         ExpectRefusal(name, VX_ErrUnsupportedFormat,

@@ -29,6 +29,10 @@ using To = const ArenaFrame&;
 
 bool IsAny(F) { return true; }
 bool IsBytes(F f) { return f == F::BGRA_4444_8u; }
+bool IsSettable(F f) {
+  return f == F::BGRA_4444_8u || f == F::VUYA_4444_8u || f == F::BGRA_4444_15u || f == F::BGRA_4444_32f ||
+         f == F::ARGB_4444_32f;
+}
 bool IsPixel(F f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
 bool IsMatted(F f) { return IsPixel(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
 bool IsAddressed(F f) { return IsPixel(f) || f == kRgb10Format; }
@@ -101,7 +105,7 @@ std::vector<Operation> Operations() {
          return VX_SetAlphaChannel(static_cast<uint32_t>(to.width), static_cast<uint32_t>(to.height), to.base,
                                    to.rowBytes, to.format, true);
        },
-       kOwn, IsBytes, true, true},
+       kOwn, IsSettable, true, true},
       {"choose by mask", 3, [](Sources s, To to) { return ChooseByMask(s[0], s[1], s[2], 3, to); }, kChoices,
        IsAddressed, false, false, 2},
       {"convert", 1, [](Sources s, To to) { return Convert(s[0], to); }, kOwn, IsAny, false, false, 0},

@@ -20,7 +20,7 @@ TEST(CompositeToBlack, EveryCodeUnderEveryAlpha) {
   for (const F format : {F::BGRA_4444_8u, F::ARGB_4444_8u, F::VUYA_4444_8u, F::VUYA_4444_8u_709})
     for (const float opacity : {1.0f, 0.999995f, 0.999f, 0.6f, 0.5f, 0.01f, 0.001f, 3.0f}) {
       if (format == F::VUYA_4444_8u_709 && opacity < 0.9999f) continue;  // goes through 601
-      SCOPED_TRACE(std::string(FormatName(format)) + " at " + std::to_string(opacity));
+      SCOPED_TRACE(FormatName(format) + " at " + std::to_string(opacity));
       const int alphaAt = static_cast<int>(AlphaAt(format));
       Image s(format, 256, 256), out(format, 256, 256);
       for (int i = 0; i < 256 * 256 * 4; ++i)
@@ -69,8 +69,8 @@ TEST(CompositeToBlack, ConvertsIntoAndOutOfTheWorkingFormat) {
     for (const F src : {F::BGRA_4444_8u, F::PRGB_4444_15u, F::V210_422_10u, F::VUYA_4444_32f_709, F::UYVY_422_8u})
       for (const float opacity : {1.0f, 0.6f})
         for (const int32_t hint : {-1, 2, 3}) {
-          SCOPED_TRACE(std::string(FormatName(src)) + " in " + FormatName(dst) + " at " + std::to_string(opacity) +
-                       ", hint " + std::to_string(hint));
+          SCOPED_TRACE(FormatName(src) + " in " + FormatName(dst) + " at " + std::to_string(opacity) + ", hint " +
+                       std::to_string(hint));
           const Image s(src, 391, 2);
           Image out(dst, 391, 2), w = s.Converted(WorkingByName(dst, opacity == 1, hint > 2), hint);
           ASSERT_EQ(ToBlack(w, w, opacity), VX_Success);
@@ -103,7 +103,7 @@ TEST(CompositeToBlack, RowsAreTestedForTheirAlpha) {
     for (const auto& c : cases)
       for (const int32_t hint : {0, 3})
         for (const int width : {1, 2, 17, 65, 400}) {
-          SCOPED_TRACE(std::string(FormatName(pair.src)) + " in " + FormatName(pair.dst) + " rows " + c.rows + " of " +
+          SCOPED_TRACE(FormatName(pair.src) + " in " + FormatName(pair.dst) + " rows " + c.rows + " of " +
                        std::to_string(width));
           const int height = static_cast<int>(std::strlen(c.rows));
           Image straight(F::BGRA_4444_32f, width, height), out(pair.dst, width, height);

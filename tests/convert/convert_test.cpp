@@ -12,7 +12,8 @@
 #include "frame/KernelVariant.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
-#include "support/Random.h"
+#include "support/Image.h"
+#include "support/SmallCache.h"
 
 namespace vexel {
 namespace {
@@ -20,51 +21,6 @@ namespace {
 using F = VX_PixelFormat;
 using testing::FormatName;
 using testing::RasterFormats;
-
-std::vector<uint8_t> RandomBytes(size_t bytes, uint64_t seed) {
-  std::vector<uint8_t> memory(bytes);
-  testing::Random(seed).Fill(memory.data(), bytes);
-  return memory;
-}
-
-TEST(Convert, SameFormatCopiesEveryByteAndKeepsRowOrder) {
-  for (F format : RasterFormats())
-    for (int width : {1, 2, 5, 6, 7, 400}) {
-      const auto rowBytes = static_cast<int32_t>(UnpaddedRowBytes(format, width));
-      const auto src = RandomBytes(static_cast<size_t>(rowBytes) * 3, Bits(format));
-      std::vector<uint8_t> dst(src.size());
-      ASSERT_EQ(VX_Convert(src.data(), rowBytes, format, dst.data(), rowBytes, format, width, 3, 2), VX_Success);
-      EXPECT_EQ(src, dst) << FormatName(format) << " width " << width;
-    }
-}
-
-// A bottom-up format and a top-down one store rows in opposite orders; negative row bytes turn a buffer around.
-TEST(Convert, OrientationFollowsTheFormats) {
-  constexpr int kWidth = 4, kHeight = 3;
-  uint8_t bgra[kHeight][kWidth * 4], uyvy[kHeight][kWidth * 2];
-  for (int y = 0; y < kHeight; ++y) std::memset(bgra[y], 60 * y + 30, sizeof bgra[y]);
-  for (auto& row : bgra)
-    for (int x = 0; x < kWidth; ++x) row[4 * x + 3] = 255;
-  const auto lumaOfRow = [&](int y) { return uyvy[y][1]; };
-
-  ASSERT_EQ(VX_Convert(bgra, sizeof bgra[0], F::BGRA_4444_8u, uyvy, sizeof uyvy[0], F::UYVY_422_8u, kWidth, kHeight, 2),
-            VX_Success);
-  EXPECT_GT(lumaOfRow(0), lumaOfRow(1));
-  EXPECT_GT(lumaOfRow(1), lumaOfRow(2));
-
-  ASSERT_EQ(VX_Convert(bgra[kHeight - 1], -static_cast<int32_t>(sizeof bgra[0]), F::BGRA_4444_8u, uyvy, sizeof uyvy[0],
-                       F::UYVY_422_8u, kWidth, kHeight, 2),
-            VX_Success);
-  EXPECT_LT(lumaOfRow(0), lumaOfRow(1));
-  EXPECT_LT(lumaOfRow(1), lumaOfRow(2));
-
-  VX_SetDebugFlag(10, 1);
-  const VX_Result result =
-      VX_Convert(bgra, sizeof bgra[0], F::BGRA_4444_8u, uyvy, sizeof uyvy[0], F::UYVY_422_8u, kWidth, kHeight, 2);
-  VX_SetDebugFlag(10, 0);
-  ASSERT_EQ(result, VX_Success);
-  EXPECT_LT(lumaOfRow(0), lumaOfRow(1));
-}
 
 TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
   const struct {
@@ -122,50 +78,18 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
   EXPECT_EQ(VX_Convert(pixel, 64, F::BGRA_4444_8u, nullptr, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullDestination);
 }
 
-// Blocks, whole rows and streamed rows give the same bytes: a wide picture equals the same picture converted in the
-// other ways.
-TEST(Convert, StreamedLargeFramesEqualSmallOnes) {
-  const struct {
-    F src, dst;
-  } pairs[] = {{F::BGRA_4444_8u, F::BGRA_4444_8u},     {F::BGRA_4444_8u, F::ARGB_4444_32f},
-               {F::UYVY_422_8u, F::BGRA_4444_32f},     {F::BGRA_4444_8u, F::V210_422_10u},
-               {F::ARGB_4444_32f, F::UYVY_422_8u_709}, {F::V210_422_10u, F::XRGB_4444_15u}};
-  constexpr int kWidth = 1001;
-  for (const auto& [src, dst] : pairs) {
-    const auto srcRow = static_cast<int32_t>(UnpaddedRowBytes(src, kWidth));
-    const auto dstRow = static_cast<int32_t>(UnpaddedRowBytes(dst, kWidth));
-    const int height = static_cast<int>(VX_GetCacheSize() / 2 / static_cast<uint32_t>(dstRow)) + 2;
-    const auto source = RandomBytes(static_cast<size_t>(srcRow), 7);
-    std::vector<uint8_t> large(static_cast<size_t>(dstRow) * height), small(static_cast<size_t>(dstRow));
-    // Row bytes 0: every row is the one source row.
-    ASSERT_EQ(VX_Convert(source.data(), 0, src, large.data(), dstRow, dst, kWidth, height, 2), VX_Success);
-    ASSERT_EQ(VX_Convert(source.data(), 0, src, small.data(), dstRow, dst, kWidth, 1, 2), VX_Success);
-    for (int y = 0; y < height; ++y)
-      ASSERT_EQ(std::memcmp(&large[static_cast<size_t>(dstRow) * y], small.data(), small.size()), 0)
-          << FormatName(src) << " to " << FormatName(dst) << " row " << y;
-  }
-}
-
 // Past the cache rows are made in blocks: no kernel looks farther than the blocks overlap, and none sees where they
-// end.
+// end. A format converted to itself keeps every byte.
 TEST(Convert, EveryPairStreamsTheSameBytes) {
-  constexpr int32_t kWidth = 2 * static_cast<int32_t>(kStreamBlock) + 7;
-  for (const F src : testing::RasterFormats())
-    for (const F dst : testing::RasterFormats()) {
-      std::vector<uint8_t> source(static_cast<size_t>(UnpaddedRowBytes(src, kWidth)));
-      testing::Random random(11);
-      testing::FillSamples(source.data(), source.size(), src, testing::Contents::Random, random);
-      const auto convert = [&](bool streams) {
-        RowConverter converter;
-        EXPECT_EQ(converter.Prepare(src, dst, 2, kWidth), VX_Success);
-        if (streams) converter.StreamOutput();
-        std::vector<uint8_t> scratch(converter.ScratchBytes() + 64),
-            row(static_cast<size_t>(UnpaddedRowBytes(dst, kWidth)));
-        converter.UseScratch(scratch.data() + (64 - reinterpret_cast<uintptr_t>(scratch.data()) % 64));
-        converter.Convert(source.data(), row.data());
-        return row;
-      };
-      ASSERT_EQ(convert(true), convert(false)) << FormatName(src) << " to " << FormatName(dst);
+  for (const F src : RasterFormats())
+    for (const F dst : RasterFormats()) {
+      const testing::Image image(src, 2 * static_cast<int>(kStreamBlock) + 7, 2);
+      const auto inCache = image.Converted(dst, 2).bytes;
+      if (src == dst) {
+        ASSERT_EQ(inCache, image.bytes) << FormatName(src);
+      }
+      const testing::SmallCache small;
+      ASSERT_EQ(image.Converted(dst, 2).bytes, inCache) << FormatName(src) << " to " << FormatName(dst);
     }
 }
 
@@ -195,21 +119,15 @@ TEST(Convert, RoundingModesGiveTheSameBytesInEveryVariant) {
 
 // Chains run in blocks, in whole rows or fused into one kernel: always the bytes of their steps one after the other.
 TEST(Convert, AChainGivesTheBytesOfItsSteps) {
-  constexpr int kWidth = 781;
   for (F src : RasterFormats())
     for (F dst : RasterFormats()) {
       F formats[9];
       int32_t count = 0;
       ASSERT_EQ(VX_ExplainConversion(src, dst, 2, formats, &count), VX_Success);
-      auto stepped = RandomBytes(static_cast<size_t>(UnpaddedRowBytes(src, kWidth)), Bits(src) + 1);
-      std::vector<uint8_t> chained(static_cast<size_t>(UnpaddedRowBytes(dst, kWidth)));
-      ASSERT_EQ(VX_Convert(stepped.data(), 0, src, chained.data(), 0, dst, kWidth, 1, 2), VX_Success);
-      for (int i = 1; i < count; ++i) {
-        std::vector<uint8_t> next(static_cast<size_t>(UnpaddedRowBytes(formats[i], kWidth)));
-        ASSERT_EQ(VX_Convert(stepped.data(), 0, formats[i - 1], next.data(), 0, formats[i], kWidth, 1, 2), VX_Success);
-        stepped.swap(next);
-      }
-      ASSERT_EQ(stepped, chained) << FormatName(src) << " to " << FormatName(dst);
+      testing::Image stepped(src, 781, 1, testing::Contents::Extremes, Bits(src) + 1);
+      const testing::Image chained = stepped.Converted(dst, 2);
+      for (int i = 1; i < count; ++i) stepped = stepped.Converted(formats[i], 2);
+      ASSERT_EQ(stepped.bytes, chained.bytes) << FormatName(src) << " to " << FormatName(dst);
     }
 }
 

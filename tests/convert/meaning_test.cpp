@@ -8,6 +8,7 @@
 #include <cstring>
 #include <vector>
 
+#include "convert/YuvReference.h"
 #include "support/Formats.h"
 
 namespace vexel {
@@ -15,6 +16,7 @@ namespace {
 
 using F = VX_PixelFormat;
 using testing::FormatName;
+using testing::Luma;
 using testing::RasterFormats;
 
 constexpr int kWidth = 12, kHeight = 2;
@@ -24,11 +26,7 @@ struct Colour {
   double r, g, b, a;
 };
 
-struct Luma {
-  double kr, kb;
-  double kg() const { return 1 - kr - kb; }
-};
-Luma LumaOf(F format) { return Colorimetry(format) == kColorimetry709 ? Luma{0.2126, 0.0722} : Luma{0.299, 0.114}; }
+Luma LumaOf(F format) { return Colorimetry(format) == kColorimetry709 ? testing::k709 : testing::k601; }
 
 using Channels = std::array<double, 4>;  // memory order of a BGRA or VUYA pixel, normalised
 
@@ -44,8 +42,8 @@ Channels ToChannels(F format, Colour c) {
     for (double* v : {&c.r, &c.g, &c.b}) *v *= c.a;
   if (!IsYuv(format)) return {c.b, c.g, c.r, c.a};
   const Luma k = LumaOf(format);
-  const double y = k.kr * c.r + k.kg() * c.g + k.kb * c.b;
-  return {(c.r - y) / (2 * (1 - k.kr)), (c.b - y) / (2 * (1 - k.kb)), y, c.a};
+  const double y = k.r * c.r + k.g() * c.g + k.b * c.b;
+  return {(c.r - y) / (2 * (1 - k.r)), (c.b - y) / (2 * (1 - k.b)), y, c.a};
 }
 
 double Code(F format, int channel, double v) {

@@ -4,65 +4,12 @@
 
 #include <climits>
 #include <cmath>
-#include <functional>
-#include <limits>
 #include <vector>
 
-#include "support/Random.h"
 #include "support/SmallCache.h"
 
 namespace vexel::primitives {
 namespace {
-
-constexpr int kPadding = 5;
-
-// A small image with padded rows, upright or upside down.
-template <class T>
-struct Image {
-  Image(int w, int h, int channels, bool negative) : width(w), height(h), pitch(w * channels + kPadding) {
-    samples.resize(static_cast<size_t>(pitch * h + 16));
-    testing::Random(7).Fill(samples.data(), samples.size() * sizeof(T));
-    for (T& s : samples)
-      if (s != s) s = T(0);
-    base = samples.data() + 3 + (negative ? pitch * (h - 1) : 0);
-    rowBytes = static_cast<ptrdiff_t>(sizeof(T)) * (negative ? -pitch : pitch);
-  }
-  int width, height, pitch;
-  std::vector<T> samples;
-  T* base;
-  ptrdiff_t rowBytes;
-};
-
-// Runs `operation` on images of many sizes and compares every sample, padding included, with expected(old, channel).
-template <class T>
-void CheckInPlace(int channels, const std::function<Status(Image<T>&)>& operation,
-                  const std::function<T(T, int)>& expected) {
-  for (const bool negative : {false, true})
-    for (const int h : {1, 2, 33, 70})
-      for (int w = 1; w <= 75; w += h < 3 ? 1 : 37) {
-        Image<T> image(w, h, channels, negative);
-        std::vector<T> want = image.samples;
-        for (int r = 0; r < h; ++r)
-          for (int i = 0; i < w * channels; ++i) {
-            T& sample = want[static_cast<size_t>(3 + r * image.pitch + i)];
-            sample = expected(sample, i % channels);
-          }
-        ASSERT_EQ(operation(image), Status::Ok);
-        ASSERT_EQ(image.samples, want) << w << " x " << h;
-      }
-}
-
-template <class T>
-void CheckFillsAndChannels(const T (&v)[4]) {
-  CheckInPlace<T>(
-      1, [&](auto& m) { return Fill(v[0], m.base, m.rowBytes, m.width, m.height); }, [&](T, int) { return v[0]; });
-  CheckInPlace<T>(
-      4, [&](auto& m) { return Fill4(v, m.base, m.rowBytes, m.width, m.height); }, [&](T, int c) { return v[c]; });
-  for (int channel = 0; channel < 4; ++channel)
-    CheckInPlace<T>(
-        4, [&](auto& m) { return SetChannel(channel, v[1], m.base, m.rowBytes, m.width, m.height); },
-        [&](T old, int c) { return c == channel ? v[1] : old; });
-}
 
 // Large enough to go over several threads, with a cache that holds nothing, all but a part, and all of it.
 template <class T>
@@ -78,10 +25,8 @@ void CheckLargeFill() {
   }
 }
 
-TEST(ImagePrimitives, FillsAndChannels) {
-  CheckFillsAndChannels<uint8_t>({1, 250, 3, 77});
-  CheckFillsAndChannels<uint16_t>({0x1234, 0x8000, 0xFFFF, 5});
-  CheckFillsAndChannels<float>({0.1f, -0.0f, 1e-40f, std::numeric_limits<float>::infinity()});
+// Fills and channels one by one: fills_test.cpp, operations_test.cpp.
+TEST(ImagePrimitives, LargeFillsInBandsPastTheCache) {
   CheckLargeFill<uint16_t>();
   CheckLargeFill<float>();
 }
@@ -103,15 +48,6 @@ TEST(ImagePrimitives, MultiplyRoundsToNearestEvenAndSaturates) {
       }
       ASSERT_EQ(dst[256], 0xEE);
     }
-  const uint8_t constants[4] = {3, 128, 255, 1};
-  CheckInPlace<uint8_t>(
-      4,
-      [&](auto& m) {
-        return MultiplyByConstants4(m.base, m.rowBytes, constants, m.base, m.rowBytes, m.width, m.height, 7);
-      },
-      [&](uint8_t old, int c) {
-        return static_cast<uint8_t>(std::min(std::nearbyint(old * constants[c] / 128.0), 255.0));
-      });
 }
 
 TEST(ImagePrimitives, BadArgumentsWriteNothing) {

@@ -164,16 +164,6 @@ TEST_F(Lifecycle, SwitchesAndProcessorChooseTheKernels) {
   VX_Terminate();
 }
 
-TEST_F(Lifecycle, CacheIsTheLargestUnifiedOne) {
-  VX_Initialize();
-  CacheInfo cache;
-  if (!platform::FindUnifiedCache(cache)) cache = FallbackCache(DetectFeatures(platform::kProcessor));
-  EXPECT_EQ(VX_GetCacheSize(), cache.bytes);
-  EXPECT_EQ(UnifiedCache().level, cache.level);
-  VX_Terminate();
-  EXPECT_EQ(VX_GetCacheSize(), cache.bytes) << "kept after the end";
-}
-
 TEST_F(Lifecycle, DvModuleIsLoadedAndClosed) {
   vexel_host::SetModulesDirectory("/nonexistent");
   VX_Initialize();

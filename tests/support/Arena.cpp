@@ -17,6 +17,7 @@
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
 #include "support/ArenaMemory.h"
+#include "support/Formats.h"
 
 namespace vexel::testing {
 namespace {
@@ -35,13 +36,6 @@ const char* ContentsName(Contents contents) {
   static constexpr const char* kNames[] = {"Random",     "Extremes",  "Zeros",      "Maximum",
                                            "ClearAlpha", "TinyAlpha", "OpaqueAlpha"};
   return kNames[static_cast<int>(contents)];
-}
-
-std::string FormatName(VX_PixelFormat format) {
-  char hex[16];
-  std::snprintf(hex, sizeof hex, "0x%X", Bits(format));
-  const std::string name = VX_PixelFormatName(format);
-  return name == "Unknown pixel format" ? hex : name;
 }
 
 class Arena {

@@ -1,6 +1,8 @@
 // The raster formats, for tests that go over all of them.
 #pragma once
 
+#include <cstdio>
+#include <string>
 #include <vector>
 
 #include "formats/FormatBits.h"
@@ -34,8 +36,12 @@ inline std::vector<VX_PixelFormat> Formats420() {
   return formats;
 }
 
-inline const char* FormatName(VX_PixelFormat format) {
-  return format == kRgb10Format ? "RGB_444_10u" : VX_PixelFormatName(format);
+// For messages: formats without a name by their value.
+inline std::string FormatName(VX_PixelFormat format) {
+  char hex[16];
+  std::snprintf(hex, sizeof hex, "0x%X", Bits(format));
+  if (format == kRgb10Format) return "RGB_444_10u";
+  return VX_PixelFormatFromName(VX_PixelFormatName(format)) == format ? VX_PixelFormatName(format) : hex;
 }
 
 }  // namespace vexel::testing

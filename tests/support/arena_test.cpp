@@ -126,33 +126,5 @@ TEST(Arena, NamesWrongCodes) {
   EXPECT_THAT(FailureOf(refused), HasSubstr("refused, but wrote"));
 }
 
-TEST(Arena, PlacesPlanes) {
-  // Every byte of every plane is there to be written, and nothing else.
-  for (const uint32_t value : {0x0A000831u, 0x0E000031u, 0x0E000A71u}) {
-    ArenaCase arenaCase;
-    arenaCase.name = "planes";
-    arenaCase.destination = FromBits(value);
-    arenaCase.widths = {2, 64, 126, 130};
-    arenaCase.heights = {2, 30, 34};
-    arenaCase.run = [](const ArenaFrame*, const ArenaFrame& frame) {
-      const int bytes = Depth(frame.format) == kDepth10u ? 2 : 1;
-      const auto fill = [](uint8_t* plane, int pitch, int rowBytes, int rows) {
-        for (int row = 0; row < rows; ++row) std::memset(plane + row * pitch, 7, static_cast<size_t>(rowBytes));
-        return plane;
-      };
-      const auto pitchOf = [&](int width) { return (width * bytes + 127) / 128 * 128; };
-      const int pitch = pitchOf(frame.width),
-                rows = IsBiplanar(frame.format) ? frame.height : (frame.height + 31) / 32 * 32;
-      uint8_t* chroma = fill(frame.Row(0), pitch, frame.width * bytes, frame.height) + rows * pitch;
-      if (IsBiplanar(frame.format)) return fill(chroma, pitch, frame.width * bytes, frame.height / 2), VX_Success;
-      const int chromaPitch = pitchOf(frame.width / 2);
-      fill(chroma, chromaPitch, frame.width / 2, frame.height / 2);
-      fill(chroma + rows / 2 * chromaPitch, chromaPitch, frame.width / 2, frame.height / 2);
-      return VX_Success;
-    };
-    EXPECT_TRUE(RunArena(arenaCase));
-  }
-}
-
 }  // namespace
 }  // namespace vexel::testing

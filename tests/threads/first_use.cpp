@@ -110,6 +110,9 @@ void UseColour(size_t start, Digest& digest) {
     add(item + 20);
     digest.Add(item + 30, &space.RGBtoXYZ()[0][0], 9 * sizeof(float));
     digest.Add(item + 40, &space.XYZtoRGB()[0][0], 9 * sizeof(float));
+    const VX::PQColorSpace copy(pq);  // while others fill its caches
+    copy.ConvertPixelsToRec709(pixels.data(), converted.data(), count, false);
+    add(item + 60);
     if (const float* luma = space.LuminanceCoeffs()) digest.Add(item + 50, luma, 3 * sizeof(float));
   }
 }
