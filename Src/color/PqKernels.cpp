@@ -108,8 +108,8 @@ void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
     ForEachChannel(c, [](float v) { return SignedPower(v, kPower2_4); });
     c = Apply(job.matrix, c);
     ForEachChannel(c, [&](float v) {
-      const float y = Power(std::fabs(v) * 0.01f, kPqM1);
-      return WithSignOf(PowerOfOneLess(PqRatioBelowOne(y), kPqM2) * job.scale, v);
+      const float light = v * 0.01f, y = Power(std::fabs(light), kPqM1);
+      return WithSignOf(PowerOfOneLess(PqRatioBelowOne(y), kPqM2) * job.scale, light);
     });
   });
 }
