@@ -183,7 +183,8 @@ TEST(Operations, RefuseInOrderBeforeTheyTouchAPixel) {
     for (int i = 0; i < Formats(o) && !o.oneFormat; ++i)
       ExpectCode(o, VX_ErrArgumentOutOfRange, with(i, kWide), INT_MAX / 8, 1, -1, true);
     if (o.takes(kWide))
-      ExpectCode(o, VX_ErrArgumentOutOfRange, std::vector<F>(good.size(), kWide), INT_MAX / 8, 1, -1, true);
+      ExpectCode(o, VX_ErrArgumentOutOfRange, o.oneFormat ? std::vector<F>(good.size(), kWide) : with(o.sources, kWide),
+                 INT_MAX / 8, 1, -1, true);
     ExpectCode(o, VX_Success, good, 0, 4, -1, true);
     ExpectCode(o, VX_Success, good, 4, 0, -1, true);
     for (int i = 0; i <= o.sources; ++i)
