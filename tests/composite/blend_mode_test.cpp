@@ -13,6 +13,7 @@
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
+#include "support/Variants.h"
 
 namespace vexel::testing {
 namespace {
@@ -226,49 +227,50 @@ TEST(BlendMode, ByteFormatsAgreeWithConversions) {
 
 TEST(Dissolve, DrawsOnlyWhereNeededRowByRow) {
   constexpr int32_t kWidth = 401;
-  for (const int32_t height : {1, 2, 64, 65, 200})
-    for (const bool inBytes : {false, true}) {
-      const auto count = static_cast<size_t>(kWidth * height);
-      Floats src(count * 4), background(count * 4, -1.0f);
-      Random random(static_cast<uint64_t>(height));
-      static constexpr float kAlphas[] = {0, 7e-6f, 9e-6f, 0.2f, 0.6f, 1, 3, -0.5f, -1e-5f, kNan};
-      for (size_t i = 0; i < count; ++i) {
-        for (size_t k = 0; k < 3; ++k) src[4 * i + k] = static_cast<float>(random.Int(0, 255)) / 255;
-        src[4 * i + 3] = inBytes ? static_cast<float>(random.Int(0, 255)) / 255 : kAlphas[random.Int(0, 9)];
-        if (inBytes) std::fill_n(&background[4 * i], 4, 0.0f);
-      }
-      constexpr float kOpacity = 0.8f;
-      SeedRuntimeRandom(height == 1 ? 99 : 12345);
-      RandomSequence sequence(height == 1 ? 99 : 1);
-      Floats out(count * 4), expected(count * 4);
-      if (inBytes) {
-        const F format = F::ARGB_4444_8u;
-        Image wide(kFloats, kWidth, height), narrow(format, kWidth, height, Contents::Zeros);
-        std::memcpy(wide.bytes.data(), src.data(), wide.bytes.size());
-        ASSERT_EQ(Blend(M::Dissolve, wide.Converted(format), narrow, narrow, kOpacity), VX_Success);
-        std::memcpy(out.data(), narrow.Converted(kFloats).bytes.data(), wide.bytes.size());
-      } else {
-        out = BlendFloats(M::Dissolve, src, background, kWidth, kOpacity);
-      }
-      for (size_t i = 0; i < count; ++i) {
-        const float p = src[4 * i + 3] * kOpacity;
-        bool fromSource = true;
-        if (std::abs(p) < 8e-6f) {
-          fromSource = false;
-          if (height > 64) sequence.Next();
-        } else if (std::isnan(p) || p * 32767 <= -1) {
-          if (height > 64) sequence.Next();
-        } else {
-          fromSource = sequence.Next() <= static_cast<int>(p * 32767);
+  for (const int32_t height : {1, 2, 64, 65, 300})
+    for (const bool inBytes : {false, true})
+      ForEachVariant([&](int) {
+        const auto count = static_cast<size_t>(kWidth * height);
+        Floats src(count * 4), background(count * 4, -1.0f);
+        Random random(static_cast<uint64_t>(height));
+        static constexpr float kAlphas[] = {0, 7e-6f, 9e-6f, 0.2f, 0.6f, 1, 3, -0.5f, -1e-5f, kNan};
+        for (size_t i = 0; i < count; ++i) {
+          for (size_t k = 0; k < 3; ++k) src[4 * i + k] = static_cast<float>(random.Int(0, 255)) / 255;
+          src[4 * i + 3] = inBytes ? static_cast<float>(random.Int(0, 255)) / 255 : kAlphas[random.Int(0, 9)];
+          if (inBytes) std::fill_n(&background[4 * i], 4, 0.0f);
         }
-        std::copy_n(&(fromSource ? src : background)[4 * i], 4, &expected[4 * i]);
-      }
-      for (size_t i = 0; i < expected.size(); ++i)
-        ASSERT_TRUE(std::abs(out[i] - expected[i]) < 1e-6f || (std::isnan(out[i]) && std::isnan(expected[i])))
-            << height << " rows, pixel " << i / 4;
-      if (height > 64) sequence = RandomSequence(1);
-      EXPECT_EQ(RuntimeRandom(), sequence.Next()) << "the thread's generator goes on behind the last draw";
-    }
+        constexpr float kOpacity = 0.8f;
+        SeedRuntimeRandom(height == 1 ? 99 : 12345);
+        RandomSequence sequence(height == 1 ? 99 : 1);
+        Floats out(count * 4), expected(count * 4);
+        if (inBytes) {
+          const F format = F::ARGB_4444_8u;
+          Image wide(kFloats, kWidth, height), narrow(format, kWidth, height, Contents::Zeros);
+          std::memcpy(wide.bytes.data(), src.data(), wide.bytes.size());
+          ASSERT_EQ(Blend(M::Dissolve, wide.Converted(format), narrow, narrow, kOpacity), VX_Success);
+          std::memcpy(out.data(), narrow.Converted(kFloats).bytes.data(), wide.bytes.size());
+        } else {
+          out = BlendFloats(M::Dissolve, src, background, kWidth, kOpacity);
+        }
+        for (size_t i = 0; i < count; ++i) {
+          const float p = src[4 * i + 3] * kOpacity;
+          bool fromSource = true;
+          if (std::abs(p) < 8e-6f) {
+            fromSource = false;
+            if (height > 64) sequence.Next();
+          } else if (std::isnan(p) || p * 32767 <= -1) {
+            if (height > 64) sequence.Next();
+          } else {
+            fromSource = sequence.Next() <= static_cast<int>(p * 32767);
+          }
+          std::copy_n(&(fromSource ? src : background)[4 * i], 4, &expected[4 * i]);
+        }
+        for (size_t i = 0; i < expected.size(); ++i)
+          ASSERT_TRUE(std::abs(out[i] - expected[i]) < 1e-6f || (std::isnan(out[i]) && std::isnan(expected[i])))
+              << height << " rows, pixel " << i / 4;
+        if (height > 64) sequence = RandomSequence(1);
+        EXPECT_EQ(RuntimeRandom(), sequence.Next()) << "the thread's generator goes on behind the last draw";
+      });
 }
 
 // ---- Formats and refusals; more in operations_test.cpp
