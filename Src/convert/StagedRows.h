@@ -30,7 +30,7 @@ void ConvertStaged(const SourceRows& src, const DestinationRows& dst, size_t uni
   if (units == 0 || height < 1) return;
   const size_t bytes = units * (src.unitBytes + dst.unitBytes);
   const bool stream = VX_GetCacheSize() != 0 && bytes * static_cast<size_t>(height) >= VX_GetCacheSize() / 2;
-  alignas(64) uint8_t staging[8192];
+  alignas(64) uint8_t staging[2048];
   const size_t piece = stream ? sizeof staging / dst.unitBytes : units;
   for (int32_t row = 0; row < height; ++row) {
     const uint8_t* from = src.base + row * src.rowBytes;
@@ -38,9 +38,7 @@ void ConvertStaged(const SourceRows& src, const DestinationRows& dst, size_t uni
     for (size_t i = 0; i < units; i += piece) {
       const size_t count = std::min(piece, units - i);
       convert(from + i * src.unitBytes, stream ? staging : to, count);
-      if (!stream) continue;
-      PrefetchBlock(from + (i + count) * src.unitBytes, count * src.unitBytes);
-      StreamCopy(to + i * dst.unitBytes, staging, count * dst.unitBytes, variant);
+      if (stream) StreamCopy(to + i * dst.unitBytes, staging, count * dst.unitBytes, variant);
     }
   }
   if (stream) StreamFence();
