@@ -94,9 +94,7 @@ HWY_INLINE void InPlaceLoop(uint8_t* row, size_t units, const Body& body) {
 // V210 groups, one to a 128-bit block, two blocks where vectors have as many.
 using DG8 = hn::CappedTag<uint8_t, 32>;
 using DG16 = hn::Repartition<uint16_t, DG8>;
-using DG64 = hn::Repartition<uint64_t, DG8>;
 using VG8 = hn::VFromD<DG8>;
-using VG64 = hn::VFromD<DG64>;
 constexpr size_t kGroups = HWY_MAX_BYTES >= 32 ? 2 : 1;
 
 HWY_INLINE VG8 ShuffleGroups(VG8 v, const uint8_t* table) {
@@ -108,13 +106,6 @@ HWY_INLINE VG8 LoadGroups(const uint8_t* HWY_RESTRICT in) {
 #else
   return hn::LoadU(DG8(), in);
 #endif
-}
-
-// Three samples at bits 0, 16 and 32 of each lane become one word in its lower half.
-HWY_INLINE VG64 PackSamples(VG64 v) {
-  const auto part = [](VG64 moved, uint64_t mask) HWY_ATTR { return hn::And(moved, hn::Set(DG64(), mask)); };
-  return hn::Or(hn::Or(part(v, 0xFFFF), part(hn::ShiftRight<6>(v), 0x03FFFC00)),
-                part(hn::ShiftRight<12>(v), 0xFFF00000));
 }
 
 #if HWY_TARGET == HWY_AVX3
@@ -137,16 +128,28 @@ void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
       });
 }
 #else
+// Of each word the first two samples side by side and the third above nothing, from samples 0 to 7 and 4 to 11.
 void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  alignas(16) static constexpr uint8_t kFirst[16] = {0, 1, 2, 3, 4, 5, Z, Z, 6, 7, 8, 9, 10, 11, Z, Z};
-  alignas(16) static constexpr uint8_t kSecond[16] = {4, 5, 6, 7, 8, 9, Z, Z, 10, 11, 12, 13, 14, 15, Z, Z};
-  alignas(16) static constexpr uint8_t kInOrder[16] = {0, 1, 2, 3, 8, 9, 10, 11, 4, 5, 6, 7, 12, 13, 14, 15};
-  RowLoop<kGroups, kUyvy16GroupBytes, kV210GroupBytes>(
-      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto first = PackSamples(hn::BitCast(DG64(), ShuffleGroups(LoadGroups(in), kFirst)));
-        const auto second = PackSamples(hn::BitCast(DG64(), ShuffleGroups(LoadGroups(in + 8), kSecond)));
-        const auto words = hn::BitCast(DG8(), hn::Or(first, hn::ShiftLeft<32>(second)));
-        hn::StoreU(ShuffleGroups(words, kInOrder), DG8(), out);
+  alignas(16) static constexpr uint8_t kTwoLower[16] = {0, 1, 2, 3, 6, 7, 8, 9, 12, 13, 14, 15, Z, Z, Z, Z};
+  alignas(16) static constexpr uint8_t kTwoUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 10, 11, 12, 13};
+  alignas(16) static constexpr uint8_t kThirdLower[16] = {Z, Z, 4, 5, Z, Z, 10, 11, Z, Z, Z, Z, Z, Z, Z, Z};
+  alignas(16) static constexpr uint8_t kThirdUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, Z, Z, 14, 15};
+  const auto pack = [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const hn::Repartition<uint32_t, DG8> d;
+    const auto lower = LoadGroups(in), upper = LoadGroups(in + 8);
+    const auto words = [&](const uint8_t* fromLower, const uint8_t* fromUpper) HWY_ATTR {
+      return hn::BitCast(d, hn::Or(ShuffleGroups(lower, fromLower), ShuffleGroups(upper, fromUpper)));
+    };
+    const auto two = words(kTwoLower, kTwoUpper);
+    const auto first = hn::And(two, hn::Set(d, 0xFFFF));
+    const auto second = hn::And(hn::ShiftRight<6>(two), hn::Set(d, 0x03FFFC00));
+    const auto third = hn::ShiftLeft<4>(words(kThirdLower, kThirdUpper));
+    hn::StoreU(hn::BitCast(DG8(), hn::Or(hn::Or(first, second), third)), DG8(), out);
+  };
+  RowLoop<2 * kGroups, kUyvy16GroupBytes, kV210GroupBytes>(
+      src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        pack(in, out);
+        pack(in + kGroups * kUyvy16GroupBytes, out + kGroups * kV210GroupBytes);
       });
 }
 #endif
