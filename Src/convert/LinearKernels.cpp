@@ -5,6 +5,7 @@
 // always (round to nearest, saturate; NaN and what int32 cannot hold give 0).
 #include <xmmintrin.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -22,7 +23,7 @@
 
 #include "convert/PixelVectors-inl.h"
 #include "frame/KernelTable.h"
-#include "frame/Power-inl.h"
+#include "frame/PixelBlock-inl.h"
 
 namespace vexel::plain {
 namespace {
@@ -36,18 +37,6 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
-
-template <const PowerExponent& kExponent, AlphaWrite kAlpha>
-struct CurveBody {
-  HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
-    const hn::ScalableTag<float> d;
-    F32 blue, green, red, alpha;
-    hn::LoadInterleaved4(d, reinterpret_cast<const float*>(in), blue, green, red, alpha);
-    SignedPower3<PowerCore::Float>(blue, green, red, kExponent);
-    if constexpr (kAlpha != AlphaWrite::Keep) alpha = hn::Set(d, 1.0f);
-    hn::StoreInterleaved4(blue, green, red, alpha, d, reinterpret_cast<float*>(out));
-  }
-};
 
 class LinearToBgra8Body {
  public:
@@ -147,7 +136,11 @@ HWY_ATTR void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) { pl
 
 template <const PowerExponent& kExponent, AlphaWrite kAlpha>
 HWY_ATTR void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
-  RowLoop<kLanes<float>, 16, 16>(src, dst, count, CurveBody<kExponent, kAlpha>());
+  const auto* from = reinterpret_cast<const float*>(src);
+  ForEachBlock(from, reinterpret_cast<float*>(dst), count, [](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowers<PowerCore::Float>(block, kExponent);
+    if constexpr (kAlpha != AlphaWrite::Keep) std::fill_n(block.alpha, block.pixels, 1.0f);
+  });
 }
 HWY_ATTR void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
   // The thresholds are those of rounding to nearest; a caller's other rounding mode takes the definition.
