@@ -51,8 +51,8 @@ struct LinearCodes {
 
 // NarrowLightTo8 as a look-up that gives exactly its results. The function rises from 0 to 255 between 2^-23 and 1,
 // at 255 thresholds, and falls back to 0 where its argument leaves the range of int32. A bucket is 1/128 of an octave
-// and holds one threshold at most, so with x the low bits of a float, the code is (entry + x) >> kLowBits for entry =
-// (code at the start << kLowBits) + (distance from the threshold to the end, or 0 without one).
+// and holds one threshold at most, so with x the bits of a float, the code is (entry + x) >> kLowBits for entry =
+// (code at the start << kLowBits) - start + (distance from the threshold to the end, or 0 without one).
 class LightCodes {
  public:
   static constexpr int kLowBits = 16;
@@ -67,9 +67,11 @@ class LightCodes {
   // From these bits on (NaN included) the code is 0.
   int32_t OverflowBits() const { return mOverflow; }
 
-  // The same function, unrounded and off by less than kMostError, between kFirst and kLast, in two factors: kScales by
-  // the low bits of the exponent, and a parabola of the rest of the mantissa (as 1 to 17/16) by its four high bits.
-  static constexpr float kMostError = 1.0f / 2048;
+  // The same function, unrounded, unlimited and up to kLast off by less than kMostError, between kFirst and kScalesEnd,
+  // in two factors: Scales by the low bits of the exponent, and a parabola of the rest of the mantissa (as 1 to 17/16)
+  // by its four high bits.
+  static constexpr float kMostError = 1.0f / 6144;
+  static constexpr int32_t kScalesEnd = kFirst + (32 << 23);
   const float* Scales() const { return mScales; }
   const float* Coefficients(int power) const { return mCoefficients[power]; }
 
@@ -78,12 +80,12 @@ class LightCodes {
     const DefaultFpMode mode;
     for (int32_t i = 0; i < kBuckets; ++i) {
       const int32_t start = kFirst + (i << kLowBits), code = CodeOfBits(start);
-      mEntries[i] = code << kLowBits;
+      mEntries[i] = (code << kLowBits) - start;
       if (CodeOfBits(start + kLowMask) == code) continue;
       const int32_t threshold = Bisect(start, start + kLowMask, [&](int32_t bits) { return CodeOfBits(bits) > code; });
       mEntries[i] += start + kLowMask + 1 - threshold;
     }
-    for (int exponent = kFirst >> 23; exponent <= kLast >> 23; ++exponent)
+    for (int exponent = kFirst >> 23; exponent < kScalesEnd >> 23; ++exponent)
       mScales[exponent & 31] = 255.0f * SignedPower(std::bit_cast<float>(exponent << 23), kFromLinear);
     for (int i = 0; i < 16; ++i) FitParabola(i);
     mOverflow = Bisect(kLast, 0x7F800000, [](int32_t bits) { return CodeOfBits(bits) == 0; });

@@ -43,13 +43,10 @@ class LinearToBgra8Body {
   explicit HWY_INLINE LinearToBgra8Body(const LightCodes& codes) : mCodes(codes), mOverflow(codes.OverflowBits()) {}
 
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
-    const hn::ScalableTag<float> d;
     F32 blue, green, red, alpha;
-    hn::LoadInterleaved4(d, reinterpret_cast<const float*>(in), blue, green, red, alpha);
+    LoadPixels(reinterpret_cast<const float*>(in), blue, green, red, alpha);
     const Codes codes = LightToCodes(blue, green, red);
-    const auto low = hn::Or(codes.blue, hn::ShiftLeft<8>(codes.green));
-    const auto high = hn::Or(hn::ShiftLeft<16>(codes.red), hn::ShiftLeft<24>(AlphaCode(alpha)));
-    StoreVector(hn::Or(low, high), out);
+    StorePixelCodes(codes, ConvertNearest(hn::Mul(alpha, hn::Set(hn::ScalableTag<float>(), 255.0f))), out);
   }
 
  private:
@@ -58,9 +55,15 @@ class LinearToBgra8Body {
     I32 blue, green, red;
   };
 
-  static HWY_INLINE I32 AlphaCode(F32 v) {
-    const auto code = ConvertNearest(hn::Mul(v, hn::Set(hn::ScalableTag<float>(), 255.0f)));
-    return hn::Min(hn::Max(code, hn::Zero(DI())), hn::Set(DI(), 255));
+  // Limits codes to 8u and brings them into the order of memory.
+  static HWY_INLINE void StorePixelCodes(const Codes& codes, I32 alpha, uint8_t* out) {
+    const hn::ScalableTag<uint8_t> d8;
+    const hn::ScalableTag<int16_t> d16;
+    const auto blueRed = hn::ReorderDemote2To(d16, codes.blue, codes.red);
+    const auto greenAlpha = hn::ReorderDemote2To(d16, codes.green, alpha);
+    alignas(16) static constexpr uint8_t kBytes[16] = {0, 8, 4, 12, 1, 9, 5, 13, 2, 10, 6, 14, 3, 11, 7, 15};
+    const auto pixels = hn::TableLookupBytes(PackBlocks(blueRed, greenAlpha), hn::LoadDup128(d8, kBytes));
+    StoreVector(OrderPacked4(pixels), out);
   }
   // The bits of floats limited to the range of the tables.
   static HWY_INLINE I32 InRange(I32 bits) {
@@ -73,37 +76,41 @@ class LinearToBgra8Body {
     const DI d;
     const auto bits = hn::BitCast(d, v), inRange = InRange(bits);
     const auto bucket = hn::ShiftRight<LightCodes::kLowBits>(hn::Sub(inRange, hn::Set(d, LightCodes::kFirst)));
-    const auto low = hn::And(inRange, hn::Set(d, (1 << LightCodes::kLowBits) - 1));
     const auto entry = hn::GatherIndex(d, mCodes.Entries(), bucket);
-    return ZeroOverflow(bits, hn::ShiftRight<LightCodes::kLowBits>(hn::Add(entry, low)));
+    return ZeroOverflow(bits, hn::ShiftRight<LightCodes::kLowBits>(hn::Add(entry, inRange)));
   }
   HWY_INLINE Codes LookUpAll(F32 blue, F32 green, F32 red) const { return {LookUp(blue), LookUp(green), LookUp(red)}; }
 
 #if HWY_TARGET == HWY_AVX3
-  // Tables of 16 and 32 floats are permutations here, which are faster than gathers. Only near a threshold does the
-  // result leave the code open.
-  HWY_INLINE I32 Estimate(F32 v, F32& farthest) const {
+  // Tables of 16 and 32 floats are permutations here, which are faster than gathers. Only near a threshold and far
+  // above white does the result leave the code open. Codes above 255 stand for 255.
+  HWY_INLINE I32 Estimate(F32 v, I32& largest, F32& farthest) const {
     const hn::ScalableTag<float> df;
-    const auto bits = hn::BitCast(DI(), v), inRange = InRange(bits);
-    const auto segment = hn::ShiftRight<19>(inRange).raw;
+    const auto bits = hn::Max(hn::BitCast(DI(), v), hn::Set(DI(), LightCodes::kFirst));
+    const auto segment = hn::ShiftRight<19>(bits).raw;
     const auto coefficient = [&](int power) HWY_ATTR {
       return F32{_mm512_permutexvar_ps(segment, _mm512_load_ps(mCodes.Coefficients(power)))};
     };
-    const auto rest = hn::Or(hn::And(inRange, hn::Set(DI(), 0x7FFFF)), hn::Set(DI(), 0x3F800000));
+    const auto rest = hn::Or(hn::And(bits, hn::Set(DI(), 0x7FFFF)), hn::Set(DI(), 0x3F800000));
     const auto x = hn::BitCast(df, rest);
     const auto parabola = hn::Add(coefficient(0), hn::Mul(x, hn::Add(coefficient(1), hn::Mul(x, coefficient(2)))));
-    const auto scale = F32{_mm512_permutex2var_ps(_mm512_load_ps(mCodes.Scales()), hn::ShiftRight<23>(inRange).raw,
+    const auto scale = F32{_mm512_permutex2var_ps(_mm512_load_ps(mCodes.Scales()), hn::ShiftRight<23>(bits).raw,
                                                   _mm512_load_ps(mCodes.Scales() + 16))};
     const auto unrounded = hn::Mul(parabola, scale);
-    const auto code = ConvertNearest(unrounded);
-    farthest = hn::Max(farthest, hn::Abs(hn::Sub(unrounded, hn::ConvertTo(df, code))));
-    return ZeroOverflow(bits, code);
+    constexpr int kToNearest = 0, kLargerMagnitude = 0b1011;
+    farthest = F32{_mm512_range_ps(farthest.raw, _mm512_reduce_ps(unrounded.raw, kToNearest), kLargerMagnitude)};
+    largest = hn::Max(largest, bits);
+    return ConvertNearest(unrounded);
   }
   HWY_INLINE Codes LightToCodes(F32 blue, F32 green, F32 red) const {
     const hn::ScalableTag<float> df;
     auto farthest = hn::Zero(df);
-    const Codes codes = {Estimate(blue, farthest), Estimate(green, farthest), Estimate(red, farthest)};
-    if (HWY_LIKELY(hn::AllTrue(df, hn::Lt(farthest, hn::Set(df, 0.5f - LightCodes::kMostError))))) return codes;
+    auto largest = hn::Zero(DI());
+    const Codes codes = {Estimate(blue, largest, farthest), Estimate(green, largest, farthest),
+                         Estimate(red, largest, farthest)};
+    const auto isClear = hn::And(hn::Lt(farthest, hn::Set(df, 0.5f - LightCodes::kMostError)),
+                                 hn::RebindMask(df, hn::Lt(largest, hn::Set(DI(), LightCodes::kScalesEnd))));
+    if (HWY_LIKELY(hn::AllTrue(df, isClear))) return codes;
     return LookUpAll(blue, green, red);
   }
 #else
