@@ -75,6 +75,8 @@ TEST(LinearKernels, LightToCodesEqualsTheWalkThroughFloat) {
   addAround(std::pow(2147483648.0 / 255, 2.4), 300, 1 << 16);
   addAround(0x1p-23, 20, 1);
   addAround(1.0, 20, 1);
+  addAround(20.0, 300, 1 << 17);  // all below 512, from where another form takes over
+  addAround(512.0, 300, 1);
   Random random(8);
   for (int i = 0; i < 200000; ++i) source.push_back(i % 2 ? random.Unit() : std::bit_cast<float>(random.Bits32()));
   source.resize(source.size() / 4 * 4);
