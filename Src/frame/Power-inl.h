@@ -39,11 +39,11 @@ template <PowerCore kCore, bool kSigned>
 HWY_INLINE V Power1(V x, const PowerExponent& y) {
   return V(kSigned ? vexel::SignedPower(x.raw, y) : vexel::Power(x.raw, y));
 }
-template <PowerCore kCore, bool kSigned>
-HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
-  a = Power1<kCore, kSigned>(a, y);
-  b = Power1<kCore, kSigned>(b, y);
-  c = Power1<kCore, kSigned>(c, y);
+template <PowerCore kCore>
+HWY_INLINE void SignedPower3(V& a, V& b, V& c, const PowerExponent& y) {
+  a = Power1<kCore, true>(a, y);
+  b = Power1<kCore, true>(b, y);
+  c = Power1<kCore, true>(c, y);
 }
 template <PowerCore kCore>
 HWY_INLINE V PowerOf(V x, const PowerExponent& y) {
@@ -459,25 +459,25 @@ HWY_INLINE V Power1(V x, const PowerExponent& y) {
   }
 }
 
-template <PowerCore kCore, bool kSigned>
-HWY_INLINE void Power3(V& a, V& b, V& c, const PowerExponent& y) {
+template <PowerCore kCore>
+HWY_INLINE void SignedPower3(V& a, V& b, V& c, const PowerExponent& y) {
   if constexpr (kCore == PowerCore::Scalar) {
-    a = PowerLaneByLane<kSigned>(a, y);
-    b = PowerLaneByLane<kSigned>(b, y);
-    c = PowerLaneByLane<kSigned>(c, y);
+    a = PowerLaneByLane<true>(a, y);
+    b = PowerLaneByLane<true>(b, y);
+    c = PowerLaneByLane<true>(c, y);
   } else {
-    const VI above = hn::Max(hn::Max(AboveFirst(Magnitude<kSigned>(a), y), AboveFirst(Magnitude<kSigned>(b), y)),
-                             AboveFirst(Magnitude<kSigned>(c), y));
+    const VI above = hn::Max(hn::Max(AboveFirst(Magnitude<true>(a), y), AboveFirst(Magnitude<true>(b), y)),
+                             AboveFirst(Magnitude<true>(c), y));
     if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Gt(above, FastSpan(y))))) {
-      a = RarePower<kCore, kSigned>(a, y);
-      b = RarePower<kCore, kSigned>(b, y);
-      c = RarePower<kCore, kSigned>(c, y);
+      a = RarePower<kCore, true>(a, y);
+      b = RarePower<kCore, true>(b, y);
+      c = RarePower<kCore, true>(c, y);
     } else {
       const Bundle<3> powers =
-          PowersOf<false, kCore>(Bundle<3>{Magnitude<kSigned>(a), Magnitude<kSigned>(b), Magnitude<kSigned>(c)}, y);
-      a = WithSign<kSigned>(powers.a, a);
-      b = WithSign<kSigned>(powers.b, b);
-      c = WithSign<kSigned>(powers.c, c);
+          PowersOf<false, kCore>(Bundle<3>{Magnitude<true>(a), Magnitude<true>(b), Magnitude<true>(c)}, y);
+      a = WithSign<true>(powers.a, a);
+      b = WithSign<true>(powers.b, b);
+      c = WithSign<true>(powers.c, c);
     }
   }
 }
@@ -652,12 +652,8 @@ HWY_INLINE power_detail::V SignedPower(power_detail::V x, const PowerExponent& y
 
 // Three vectors at once, the colour channels of pixels: a, b, c <- their powers.
 template <PowerCore kCore>
-HWY_INLINE void Power3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  power_detail::Power3<kCore, false>(a, b, c, y);
-}
-template <PowerCore kCore>
 HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  power_detail::Power3<kCore, true>(a, b, c, y);
+  power_detail::SignedPower3<kCore>(a, b, c, y);
 }
 
 // `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value). `scratch`,
@@ -705,16 +701,6 @@ HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scr
     SignedPowers<PowerCore::Long>(values, count, scratch, y, negative);
   } else {
     SignedPowers<PowerCore::Scalar>(values, count, scratch, y, negative);
-  }
-}
-HWY_NOINLINE inline void SignedPower3Any(power_detail::V& a, power_detail::V& b, power_detail::V& c,
-                                         const PowerExponent& y) {
-  if (y.core == PowerCore::Float) {
-    SignedPower3<PowerCore::Float>(a, b, c, y);
-  } else if (y.core == PowerCore::Long) {
-    SignedPower3<PowerCore::Long>(a, b, c, y);
-  } else {
-    SignedPower3<PowerCore::Scalar>(a, b, c, y);
   }
 }
 

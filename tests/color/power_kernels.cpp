@@ -17,23 +17,33 @@ namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 namespace power = vexel::HWY_NAMESPACE;
 
-// Single vectors, then three at once, then with the core found at run time.
+using Vector = hn::Vec<hn::ScalableTag<float>>;
+
+// What the loops work on.
+struct Block {
+  static constexpr size_t kCount = 3 * hn::MaxLanes(hn::ScalableTag<float>());
+  HWY_ALIGN float values[kCount];
+  HWY_ALIGN float scratch[2 * kCount];
+};
+
+// Single vectors, with the core known or not, and loops by turns.
 template <PowerCore kCore>
 void PowersOf(const float* src, float* dst, size_t count, const PowerExponent& y) {
   const hn::ScalableTag<float> d;
   const size_t n = hn::Lanes(d);
+  Block block;
   for (size_t i = 0; i < count; i += 3 * n) {
-    auto a = hn::LoadU(d, src + i), b = hn::LoadU(d, src + i + n), c = hn::LoadU(d, src + i + 2 * n);
     if (i / (3 * n) % 2 != 0) {
-      power::Power3<kCore>(a, b, c, y);
+      std::memcpy(block.values, src + i, sizeof block.values);
+      power::Powers<kCore>(
+          block.values, 3 * n, block.scratch, y, [](Vector v) VX_POWER_STEP { return v; },
+          [](Vector power, Vector) VX_POWER_STEP { return power; });
+      std::memcpy(dst + i, block.values, sizeof block.values);
     } else {
-      a = power::Power<kCore>(a, y);
-      b = power::PowerAny(b, y);
-      c = power::Power<kCore>(c, y);
+      hn::StoreU(power::Power<kCore>(hn::LoadU(d, src + i), y), d, dst + i);
+      hn::StoreU(power::PowerAny(hn::LoadU(d, src + i + n), y), d, dst + i + n);
+      hn::StoreU(power::Power<kCore>(hn::LoadU(d, src + i + 2 * n), y), d, dst + i + 2 * n);
     }
-    hn::StoreU(a, d, dst + i);
-    hn::StoreU(b, d, dst + i + n);
-    hn::StoreU(c, d, dst + i + 2 * n);
   }
 }
 
@@ -43,16 +53,32 @@ void Powers(const float* src, float* dst, size_t count, const PowerExponent& y) 
   return PowersOf<PowerCore::Scalar>(src, dst, count, y);
 }
 
-void SignedPowers(const float* src, float* dst, size_t count, const PowerExponent& y) {
+// Three vectors at once, loops that have not met a minus sign yet and loops that have, by turns.
+template <PowerCore kCore>
+void SignedPowersOf(const float* src, float* dst, size_t count, const PowerExponent& y) {
   const hn::ScalableTag<float> d;
   const size_t n = hn::Lanes(d);
-  for (size_t i = 0; i < count; i += 3 * n) {
+  Block block;
+  for (size_t i = 0, turn = 0; i < count; i += 3 * n, ++turn) {
+    if (turn % 3 != 0) {
+      bool negative = turn % 3 == 2;
+      std::memcpy(block.values, src + i, sizeof block.values);
+      power::SignedPowersAny(block.values, 3 * n, block.scratch, y, negative);
+      std::memcpy(dst + i, block.values, sizeof block.values);
+      continue;
+    }
     auto a = hn::LoadU(d, src + i), b = hn::LoadU(d, src + i + n), c = hn::LoadU(d, src + i + 2 * n);
-    power::SignedPower3Any(a, b, c, y);
+    power::SignedPower3<kCore>(a, b, c, y);
     hn::StoreU(a, d, dst + i);
     hn::StoreU(b, d, dst + i + n);
     hn::StoreU(c, d, dst + i + 2 * n);
   }
+}
+
+void SignedPowers(const float* src, float* dst, size_t count, const PowerExponent& y) {
+  if (y.core == PowerCore::Float) return SignedPowersOf<PowerCore::Float>(src, dst, count, y);
+  if (y.core == PowerCore::Long) return SignedPowersOf<PowerCore::Long>(src, dst, count, y);
+  return SignedPowersOf<PowerCore::Scalar>(src, dst, count, y);
 }
 
 #define VX_TEST_FUNCTION(name, function)                                                                             \
