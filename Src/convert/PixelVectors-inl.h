@@ -177,9 +177,6 @@ HWY_INLINE I32 Truncate(F32 v) {
 #endif
 }
 
-// int32 -> int16, saturating, in memory order.
-HWY_INLINE I16 PackTo16(I32 a, I32 b) { return OrderPacked2(hn::ReorderDemote2To(hn::ScalableTag<int16_t>(), a, b)); }
-
 // int32 -> uint16, saturating, in memory order.
 HWY_INLINE U16 PackToU16(I32 a, I32 b) { return OrderPacked2(PackBlocks(a, b)); }
 
