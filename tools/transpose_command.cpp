@@ -5,6 +5,7 @@
 #include "commands.h"
 #include "format_catalogue.h"
 #include "picture_io.h"
+#include "run_options.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -14,6 +15,7 @@ struct TurnOptions {
   std::string in, out;
   int angle = 0;
   bool flip = false;
+  RunOptions run;
 };
 
 bool HasFourChannels(VX_PixelFormat format) {
@@ -63,7 +65,11 @@ CLI::App* AddTurn(CLI::App& app, const char* name, const char* help, const std::
   CLI::App* command = app.add_subcommand(name, help);
   command->add_option("in", options->in, "A picture or video, of which the first frame is taken")->required();
   command->add_option("out", options->out, "The picture to write")->required();
-  command->callback([options, run] { run(*options); });
+  options->run.AddTo(*command);
+  command->callback([options, run] {
+    options->run.Apply();
+    run(*options);
+  });
   return command;
 }
 

@@ -39,9 +39,12 @@ run transpose noise.png t.png
 run transpose t.png back.png
 [ "$(pixels back.png)" = "$(pixels noise.png)" ] || fail "transposing twice changes the picture"
 [ "$(pixels t.png)" != "$(pixels noise.png)" ] || fail "transposing does nothing"
+run transpose noise.png plain.png --isa plain --threads 1
+[ "$(pixels plain.png)" = "$(pixels t.png)" ] || fail "plain kernels transpose otherwise"
 cp noise.png turned.png
 for _ in 1 2 3 4; do run rotate turned.png next.png --angle 90 && mv next.png turned.png; done
 [ "$(pixels turned.png)" = "$(pixels noise.png)" ] || fail "four quarter turns change the picture"
+refuses 2 '--isa' rotate noise.png x.png --angle 90 --isa neon
 refuses 2 'angle' rotate noise.png x.png --angle 45
 [ ! -e x.png ] || fail "a refused rotation writes a picture"
 
