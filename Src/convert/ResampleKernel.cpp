@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
+#include <emmintrin.h>
 
 #include "zovcore/Config.h"
 #include "zovcore/Debug.h"
@@ -17,7 +18,7 @@ constexpr double kPi = 3.14159265358979323846;
 [[noreturn]] void ContractBroken(const char* condition, const char* function, int line) {
   if (zovcore::debug::BreakAfterContractDialog(condition, "ResampleKernel.cpp", function, line) &&
       zovcore::debug::IsDebuggerAttached())
-    __builtin_trap();
+    __asm__ volatile("int3");  // the debugger may let it go on
   zovcore::config::ThrowError(
       0, "$$$/zovcore/utility/Error/Contract/InputContractViolation=An input contract violation has occurred!", 105, 25,
       true, {}, {}, {}, {});
@@ -64,7 +65,8 @@ double Lanczos8(double d) {
   return std::sin(kPi * d) / (kPi * d) * (8 * std::sin(kPi * d / 8) / (kPi * d));
 }
 
-int16_t Truncate(double weight) { return static_cast<int16_t>(static_cast<int32_t>(weight)); }
+// Sharpness from a scale that is no number, or far beyond 1, makes weights that are none either: they give 0.
+int16_t Truncate(double weight) { return static_cast<int16_t>(_mm_cvttsd_si32(_mm_set_sd(weight))); }
 
 // Fills all phases of `width` taps from filter(tap distance), each row scaled to sum to 1 before truncation.
 template <class Filter>
@@ -99,8 +101,9 @@ ResampleKernel::ResampleKernel(int32_t kernelType)
 
 void ResampleKernel::AllocateOnFirstUse() {
   if (fAllocatedWidth != 0) return;
-  fAllocatedWidth = TraitsOf(fKernelType).allocatedWidth;
-  fWeights.resize(static_cast<size_t>(fAllocatedWidth) * kPhases);
+  const int16_t width = TraitsOf(fKernelType).allocatedWidth;
+  fWeights.resize(static_cast<size_t>(width) * kPhases);
+  fAllocatedWidth = width;
 }
 
 void ResampleKernel::ScaleForDownSample(float decimatedScale, float scale) {
@@ -149,7 +152,7 @@ void ResampleKernel::ScaleCubicKernel(float s, float a) {
     lowest = std::min(lowest, i % fWidth);
     highest = std::max(highest, i % fWidth);
   }
-  TrimZeroTaps(lowest, highest);
+  if (lowest <= highest) TrimZeroTaps(lowest, highest);
 }
 
 // Drops the columns outside lowest..highest, keeping the width even so that the taps stay centred.

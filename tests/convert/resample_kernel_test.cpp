@@ -1,8 +1,12 @@
 #include "vexel/resample_kernel.h"
 
 #include <gtest/gtest.h>
+#include <sys/ptrace.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <cmath>
+#include <csignal>
 #include <functional>
 #include <string>
 #include <vector>
@@ -159,12 +163,41 @@ TEST(ResampleKernel, BrokenContractsThrowAndKeepTheTable) {
   }
   ResampleKernel lanczos(Type::kLanczos8);
   EXPECT_TRUE(breaks([&] { lanczos.ScaleForDownSample(0.39f, 0.39f); }));
+  for (const float scale : {NAN, INFINITY, 1e30f}) {  // no sharpness follows from these: a table, whatever it holds
+    ResampleKernel endless(Type::kCubicSharp);
+    EXPECT_NO_THROW(endless.ScaleForDownSample(0.5f, scale));
+    EXPECT_EQ(endless.Width(), 10);
+  }
   for (const int32_t type : {0, 8, -1}) {
     ResampleKernel unknown(type);
     EXPECT_EQ(unknown.Width(), 0);
     EXPECT_TRUE(breaks([&] { unknown.ScaleForUpSample(1); }));
     EXPECT_TRUE(breaks([&] { ResampleKernel(type).ScaleForDownSample(0.5f, 0.5f); }));
   }
+}
+
+// An attached debugger is stopped in first; when it goes on, the error is thrown.
+TEST(ResampleKernel, BrokenContractsStopInADebuggerAndGoOn) {
+  const pid_t child = fork();
+  if (child == 0) {
+    if (ptrace(PTRACE_TRACEME, 0, nullptr, nullptr) != 0) _exit(77);
+    try {
+      ResampleKernel(Type::kCubic).ScaleForUpSample(0.5f);
+    } catch (const zovcore::config::Error&) {
+      _exit(5);
+    }
+    _exit(1);
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  if (WIFEXITED(status) && WEXITSTATUS(status) == 77) GTEST_SKIP() << "nothing may be traced here";
+  const bool stopped = WIFSTOPPED(status) && WSTOPSIG(status) == SIGTRAP;
+  EXPECT_TRUE(stopped) << status;
+  if (WIFSTOPPED(status)) {
+    ptrace(stopped ? PTRACE_CONT : PTRACE_KILL, child, nullptr, nullptr);
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+  }
+  EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 5) << status;
 }
 
 }  // namespace
