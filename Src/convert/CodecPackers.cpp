@@ -28,6 +28,7 @@ VX_Result ConvertPixels(const RowKernelSet& kernels, const SourceRows& src, cons
 }
 
 VX_Result ScaleInPlace(const InPlaceKernelSet& kernels, void* base, int32_t rowBytes, int32_t width, int32_t height) {
+  const FpModeGuard guard;  // the plain kernel scales in floats
   ConvertInPlace(kernels[ActiveKernelVariant()], base, rowBytes, 4 * AtLeast0(width), height);
   return VX_Success;
 }

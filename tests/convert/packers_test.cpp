@@ -9,6 +9,7 @@
 #include <limits>
 #include <numeric>
 #include <vector>
+#include <xmmintrin.h>
 
 #include "support/Arena.h"
 #include "support/PaddedRows.h"
@@ -170,8 +171,13 @@ Samples WholeDomain() {
 TEST(Packers, WholeDomainOf15uTo16u) {
   const Samples all = WholeDomain();
   Samples native = all, swapped = all, back(all.size());
+  const unsigned callers = _mm_getcsr();
+  _mm_setcsr(0x1F80);
   VX_Convert_15u_To_16u_InPlace(native.data(), 8192, 1021, 16);
   VX_Convert_15u_To_16u_BigEndian_InPlace(swapped.data(), 8192, 1021, 16);
+  const unsigned after = _mm_getcsr();
+  _mm_setcsr(callers);
+  EXPECT_EQ(after, 0x1F80u);
   VX_Scale16uBufferTo15uSIMD(all.data(), back.data(), all.size() - 3);
   for (size_t s = 0; s < all.size(); ++s) {
     const auto expected =
