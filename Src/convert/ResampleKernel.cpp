@@ -116,8 +116,10 @@ void ResampleKernel::ScaleForDownSample(float decimatedScale, float scale) {
   const float s = served == 1.0f ? 1.0f : served / fSupportScale;
   float a = fSharpnessAtFullScale;
   if (fSharpnessAtQuarterScale != fSharpnessAtFullScale) {
-    const float q = std::max(scale, 0.25f);
-    a = fSharpnessAtFullScale + (1 - (q - 0.25f) / 0.75f) * (fSharpnessAtQuarterScale - fSharpnessAtFullScale);
+    // In double precision like the weights; in single a last bit would tip some of them.
+    const double full = fSharpnessAtFullScale, quarter = fSharpnessAtQuarterScale;
+    const double q = std::max(scale, 0.25f);
+    a = static_cast<float>(full + (1 - (q - 0.25) / 0.75) * (quarter - full));
   }
   ScaleCubicKernel(s, a);
 }

@@ -99,6 +99,8 @@ TEST(ResampleKernel, DownSamplingTables) {
       {Type::kCubic, 0.8f, 6, double(0.8f), -0.75},
       {Type::kCubicMedium, 0.25f, 20, double(0.25f / 1.15f), -1},
       {Type::kCubicSharp, 0.25f, 18, double(0.25f / 1.05f), double(-2.2f)},
+      {Type::kCubicSharp, 0.525f, 8, double(0.525f / 1.05f),
+       double(float(-1 + (1 - (double(0.525f) - 0.25) / 0.75) * (double(-2.2f) + 1)))},
       {Type::kCubicSoft, 0.5f, 10, double(0.5f / 1.2f), -0.5},
       {Type::kLanczos8, 0.5f, 8, 0.5, -0.75},
   };
