@@ -25,19 +25,13 @@ constexpr F ResultFormat(F destination) {
   return HasUsableAlpha(destination) ? FromBits(bits) : WithAlphaKind(FromBits(bits), kAlphaPremultiplied);
 }
 
-// A picture given back as it is: nothing to do where it stands in the destination already.
-template <class Image>
-VX_Result CopyPicture(const Image& image, const TargetImage& dst, int32_t width, int32_t height,
-                      int32_t renderQuality) noexcept {
-  if (image.base == dst.base && image.rowBytes == dst.rowBytes && image.format == dst.format) return VX_Success;
-  return VX_Convert(image.base, image.rowBytes, image.format, dst.base, dst.rowBytes, dst.format, width, height,
-                    renderQuality);
-}
-
 VX_Result Composite(const SourceImage& src, const SourceImage& background, const TargetImage& dst, int32_t width,
                     int32_t height, float opacity, int32_t renderQuality) noexcept {
   if (IsSpecial(src.format) || IsSpecial(background.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
+  opacity = UsableOpacity(opacity);
+  if (opacity == 0.0f) return CopyPicture(background, dst, width, height, renderQuality);
+  if (opacity == 1.0f && !HasUsableAlpha(src.format)) return CopyPicture(src, dst, width, height, renderQuality);
   F result = ResultFormat(dst.format);
   // Where everything is alpha-first RGB of one depth, three reversals are saved; the bytes are the same.
   const auto alphaFirst = [](F format) {
@@ -67,9 +61,6 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   const VX_Result check = job.CheckBuffers(&done);
   if (check != VX_Success || done) return check;
 
-  opacity = UsableOpacity(opacity);
-  if (opacity == 0.0f) return CopyPicture(background, dst, width, height, renderQuality);
-  if (opacity == 1.0f && !choice.sourceAlpha) return CopyPicture(src, dst, width, height, renderQuality);
   const bool narrow = Depth(result) == kDepth8u;
   const OverKernelSet& kernels = premultiplied ? (narrow ? OverPremultiplied8u(choice) : OverPremultiplied32f(choice))
                                                : (narrow ? Over8u(choice) : Over32f(choice));

@@ -58,6 +58,7 @@ VX_Result ToBlack(const SourceImage& src, const TargetImage& dst, int32_t width,
   if (IsSpecial(src.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
   opacity = UsableOpacity(opacity);
+  if (opacity == 0.0f) return VX_FillWithOpaqueBlack(dst.base, dst.rowBytes, width, height, dst.format);
   const F working = WorkingFormat(dst.format, opacity == 1.0f, precisionHint);
   RowJob job(width, height, precisionHint);
   if (job.AddSource(src, working)) return VX_ErrUnsupportedFormat;
@@ -65,7 +66,6 @@ VX_Result ToBlack(const SourceImage& src, const TargetImage& dst, int32_t width,
   bool done;
   const VX_Result check = job.CheckBuffers(&done);
   if (check != VX_Success || done) return check;
-  if (opacity == 0.0f) return VX_FillWithOpaqueBlack(dst.base, dst.rowBytes, width, height, dst.format);
   const ToBlackKernel toBlack = KernelsFor(working, job.Variant()).toBlack;
   return job.Run([=](const RowSpan& span) { toBlack(span.src[0], span.dst, span.count, opacity); });
 }

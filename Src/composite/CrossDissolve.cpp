@@ -10,17 +10,6 @@
 namespace vexel {
 namespace {
 
-// Where one image is all of the result.
-VX_Result CopyConverted(const SourceImage& image, const TargetImage& target, int32_t width, int32_t height,
-                        int32_t renderQuality) noexcept {
-  const bool isThere =
-      image.base && image.base == target.base && image.rowBytes == target.rowBytes && image.format == target.format;
-  const bool refused = width < 0 || height < 0;
-  const VX_Result result = VX_Convert(image.base, image.rowBytes, image.format, target.base, target.rowBytes,
-                                      target.format, width, isThere || refused ? 0 : height, renderQuality);
-  return result == VX_Success && refused ? VX_ErrArgumentOutOfRange : result;
-}
-
 VX_Result CrossDissolve(const SourceImage& a, const SourceImage& b, const TargetImage& target, int32_t width,
                         int32_t height, float mix, int32_t precisionHint) noexcept {
   if (IsSpecial(a.format) || IsSpecial(b.format)) return VX_ErrUnsupportedFormat;
@@ -56,7 +45,7 @@ VX_Result VX_CrossDissolve(const void* a, int32_t aRowBytes, VX_PixelFormat aFor
   const SourceImage imageA{a, aRowBytes, aFormat}, imageB{b, bRowBytes, bFormat};
   const TargetImage target{dst, dstRowBytes, dstFormat};
   // NaN counts as 0.
-  if (!(mix >= kWeightGuard)) return CopyConverted(imageA, target, width, height, precisionHint);
-  if (mix + kWeightGuard > 1.0f) return CopyConverted(imageB, target, width, height, precisionHint);
+  if (!(mix >= kWeightGuard)) return CopyPicture(imageA, target, width, height, precisionHint);
+  if (mix + kWeightGuard > 1.0f) return CopyPicture(imageB, target, width, height, precisionHint);
   return CrossDissolve(imageA, imageB, target, width, height, mix, precisionHint);
 }

@@ -12,6 +12,16 @@ constexpr size_t Rounded(size_t bytes) { return (bytes + 63) & ~size_t{63}; }
 
 }  // namespace
 
+VX_Result CopyPicture(const SourceImage& image, const TargetImage& target, int32_t width, int32_t height,
+                      int32_t renderQuality) noexcept {
+  const bool isThere =
+      image.base && image.base == target.base && image.rowBytes == target.rowBytes && image.format == target.format;
+  const bool refused = width < 0 || height < 0;
+  const VX_Result result = VX_Convert(image.base, image.rowBytes, image.format, target.base, target.rowBytes,
+                                      target.format, width, isThere || refused ? 0 : height, renderQuality);
+  return result == VX_Success && refused ? VX_ErrArgumentOutOfRange : result;
+}
+
 VX_Result RowJob::Prepare(Side& side, const void* base, int32_t rowBytes, VX_PixelFormat format, VX_PixelFormat from,
                           VX_PixelFormat to) noexcept {
   side.base = static_cast<uint8_t*>(const_cast<void*>(base));  // sources are only read

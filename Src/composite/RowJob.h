@@ -23,6 +23,11 @@ struct TargetImage {
   VX_PixelFormat format;
 };
 
+// Where one image is all of the result: VX_Convert, whose codes count, but for sizes as CheckBuffers has them. Nothing
+// is done where the image is the destination itself.
+VX_Result CopyPicture(const SourceImage& image, const TargetImage& target, int32_t width, int32_t height,
+                      int32_t renderQuality) noexcept;
+
 // What a row kernel gets: `count` pixels of every image in its working format. `row` counts from the destination's
 // first stored row, `column` from its first pixel. The destination may be one of the sources. `stream`: dst is the
 // destination itself, aligned to kStreamAlignment, and better written past the cache.

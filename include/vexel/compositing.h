@@ -52,7 +52,7 @@ enum {
  *
  * Opacity is clamped to 0..1; below 8e-6 and as NaN it is 0, above 1 - 8e-6 it is 1. At 0 the call converts the
  * background with VX_Convert and gives its result, at 1 the source if that has no alpha; nothing is done where that
- * picture is the destination itself.
+ * picture is the destination itself, and the other one only has to be of a raster format.
  *
  * The arithmetic is the destination's: 8u in 8 bits, anything else (10u and 15u too) in 32f, linear formats in light,
  * 4:2:2 in VUYP_4444_8u or VUYP_4444_32f, 709 formats among them. Inputs are brought to straight alpha, but stay
@@ -65,8 +65,7 @@ enum {
  *
  * `conversionOption` is the render quality of the row conversions (see VX_Convert); `flag` is reserved.
  * VX_ErrUnsupportedFormat: source or background is no raster format. VX_ErrUnsupportedDestinationFormat: likewise the
- * destination. VX_ErrFormatNotHandled: raster formats between which no conversion leads. All codes are the same at
- * every opacity, but for what VX_Convert says. */
+ * destination. VX_ErrFormatNotHandled: raster formats between which no conversion leads. */
 VX_API VX_Result VX_Composite(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, const void* background,
                               int32_t backgroundRowBytes, VX_PixelFormat backgroundFormat, void* dst,
                               int32_t dstRowBytes, VX_PixelFormat dstFormat, int32_t width, int32_t height,
@@ -97,7 +96,7 @@ VX_API VX_Result VX_CompositeWithBlendMode(const void* src, int32_t srcRowBytes,
                                            VX_PixelFormat dstFormat, int32_t width, int32_t height, float opacity,
                                            int32_t blendMode, int32_t conversionOption, bool flag) VX_NOEXCEPT;
 /* Lays the source over opaque black; the result is opaque. Opacity as in VX_Composite; 0 is VX_FillWithOpaqueBlack and
- * its result.
+ * its result, whatever raster the source is.
  *
  * Done in the destination's own format if that is BGRA, ARGB or VUYA in 8u or 32f, else in BGRA_4444 or VUYA_4444 (709
  * for 709 destinations), in 32f if the precision hint is above 2, in 8u otherwise. Below opacity 1 the 709 formats,
