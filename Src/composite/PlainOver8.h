@@ -14,9 +14,10 @@ namespace plain {
 // n / 255 to nearest; there are no ties.
 inline int Divide255(int n) { return (2 * n + 255) / 510; }
 
-// An opacity of 0..1 times 32768 * 256 / 255, held so that full weights stay below 32768.
+// An opacity of 0..1 times 32768 * 256 / 255, held so that full weights stay below 32768. Rounded up, because weights
+// are rounded down: an opaque source at one half then weighs exactly one half, and 127.5 becomes 128.
 inline uint16_t FixedOpacity(float opacity) {
-  const float scaled = opacity * (32768.0f * 256 / 255) + 0.5f;
+  const float scaled = opacity * (32768.0f * 256 / 255) + 1.0f;
   return static_cast<uint16_t>(scaled < 32896.0f ? scaled : 32896.0f);
 }
 

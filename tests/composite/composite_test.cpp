@@ -136,6 +136,25 @@ TEST(Composite, EveryFloatKernelIsTheFormula) {
         }
 }
 
+// Opaque pixels of one code over another at a share that floats hold exactly: halves of a code go up.
+TEST(Composite, OpaquePicturesAtExactShares) {
+  for (const uint32_t kind : {kAlphaStraight, kAlphaIgnored, kAlphaPremultiplied})
+    for (const float opacity : {0.5f, 0.25f, 0.75f, 0.125f}) {
+      const F format = FromBits((Bits(F::BGRA_4444_8u) & ~kAlphaMask) | kind);
+      Image s(format, 256, 256), d(format, 256, 256), out(F::BGRA_4444_8u, 256, 256);
+      for (int i = 0; i < 256 * 256; ++i)
+        for (int k = 0; k < 4; ++k) {
+          s.bytes[4 * i + k] = static_cast<uint8_t>(k == 3 ? 255 : i >> 8);
+          d.bytes[4 * i + k] = static_cast<uint8_t>(k == 3 ? 255 : i & 255);
+        }
+      ASSERT_EQ(Composite(s, d, out, opacity), VX_Success);
+      for (int i = 0; i < 4 * 256 * 256; ++i)
+        ASSERT_EQ(out.bytes[i], std::floor(s.bytes[i] * opacity + d.bytes[i] * (1 - opacity) + 0.5f))
+            << VX_PixelFormatName(format) << " at " << opacity << ": " << int{s.bytes[i]} << " over "
+            << int{d.bytes[i]};
+    }
+}
+
 // The format in which a result is computed, by the destination's name.
 F WorkingByName(F dst) {
   const std::string name = FormatName(dst);
@@ -198,6 +217,41 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
         ASSERT_EQ(out.bytes, one.bytes);
       }
     }
+}
+
+// What the result does not show is not looked at, except that frames instead of rasters are refused; then the codes are
+// those of the conversion or the fill.
+TEST(Composite, CodesWhereOnePictureIsTheResult) {
+  constexpr F kX = F::BGRX_4444_8u, kFrame = F::PALDV25, kUnknown = FromBits(0xFFF7);
+  Image image(F::BGRA_4444_8u, 4, 4), out(F::BGRA_4444_8u, 4, 4);
+  const View there(image), none(nullptr, 0, kUnknown);
+  const auto as = [](const View& view, F format) { return View(view.base, view.rowBytes, format); };
+  const struct {
+    View source, background;
+    float opacity;
+    VX_Result expected;
+  } cases[] = {{none, there, 0, VX_Success},
+               {none, as(there, kX), 0, VX_Success},
+               {as(none, kFrame), there, 0, VX_ErrUnsupportedFormat},
+               {none, as(there, kFrame), 0, VX_ErrUnsupportedFormat},
+               {none, as(there, kUnknown), 0, VX_ErrFailed},
+               {there, as(none, there.format), 0, VX_ErrNullSource},
+               {as(there, kX), none, 1, VX_Success},
+               {there, none, 1, VX_ErrFormatNotHandled},
+               {as(none, kX), there, 1, VX_ErrNullSource},
+               {none, there, 0.5f, VX_ErrFormatNotHandled}};
+  for (const auto& c : cases) EXPECT_EQ(Composite(c.source, c.background, out, c.opacity), c.expected);
+  const auto sized = [&](int32_t width, int32_t height) {
+    return Composite(none, there, {out.bytes.data(), 16, out.format, width, height}, 0);
+  };
+  EXPECT_EQ(sized(4, 0), VX_Success);
+  EXPECT_EQ(sized(4, -1), VX_ErrArgumentOutOfRange);
+  EXPECT_EQ(sized(-1, 4), VX_ErrArgumentOutOfRange);
+
+  EXPECT_EQ(ToBlack(none, out, 0), VX_Success);
+  EXPECT_EQ(ToBlack(as(none, kFrame), out, 0), VX_ErrUnsupportedFormat);
+  EXPECT_EQ(ToBlack(none, {out.bytes.data(), 16, kFrame, 4, 4}, 0), VX_ErrUnsupportedDestinationFormat);
+  EXPECT_EQ(ToBlack(none, {out.bytes.data(), 16, kUnknown, 4, 4}, 0), VX_ErrFormatNotHandled);
 }
 
 // The kernels without any conversion around them.
