@@ -1,7 +1,6 @@
 #include "blend.h"
 
 #include <algorithm>
-#include <cctype>
 #include <vector>
 
 #include "convert_picture.h"
@@ -11,11 +10,6 @@
 
 namespace tool {
 namespace {
-
-bool SameIgnoringCase(const std::string& a, const std::string& b) {
-  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
-                    [](unsigned char x, unsigned char y) { return std::tolower(x) == std::tolower(y); });
-}
 
 // The stretch of one direction in which both pictures have pixels.
 struct Overlap {
@@ -45,7 +39,7 @@ std::span<const BlendModeEntry> BlendModes() {
 VX_BlendMode ParseBlendMode(const std::string& name) {
   std::vector<std::string> names;
   for (const BlendModeEntry& entry : BlendModes()) {
-    if (SameIgnoringCase(name, entry.name)) return entry.mode;
+    if (SameName(name, entry.name)) return entry.mode;
     names.push_back(entry.name);
   }
   throw ToolError("unknown blend mode \"" + name + "\"; did you mean " + NearestNames(name, names) +

@@ -90,11 +90,9 @@ class ColorConversion {
   }
 
   void Run() {
-    SourceOptions sourceOptions;
-    sourceOptions.threads = mCommand.run.threads;
-    if (!mCommand.matrix.empty()) sourceOptions.matrix = ParseMatrix(mCommand.matrix);
-    SetRaw(sourceOptions);
-    const auto source = OpenSource(mCommand.in, sourceOptions);
+    const auto source = OpenSource(
+        mCommand.in, ParseSourceOptions(mCommand.rawFormat, mCommand.size, mCommand.matrix, mCommand.run.threads));
+    CheckContainer(ContainerOf(mCommand.out));
     SinkOptions sinkOptions;
     sinkOptions.frameRate = source->FrameRate();
     const auto sink = OpenSink(mCommand.out, sinkOptions);
@@ -103,7 +101,7 @@ class ColorConversion {
     int64_t done = 0;
     while (const Picture frame = source->Next()) {
       const Picture signal = Convert(frame, options);
-      const VX_PixelFormat storage = sink->StorageFormat(FileFormat(frame));
+      const VX_PixelFormat storage = sink->StorageFormat(FileFormat(frame), frame.Height());
       const Picture stored = ConvertPicture(signal, storage, options);
       sink->Append(stored, sink->Encode(stored));
       ++done;
@@ -116,14 +114,13 @@ class ColorConversion {
   }
 
  private:
-  void SetRaw(SourceOptions& options) const {
-    if (mCommand.rawFormat.empty()) return;
-    options.rawFormat = ParseFormat(mCommand.rawFormat);
-    char x = 0;
-    std::istringstream size(mCommand.size);
-    size >> options.width >> x >> options.height;
-    if (!size || x != 'x' || size.peek() != std::char_traits<char>::eof() || options.width < 1 || options.height < 1)
-      throw ToolError("raw frames need their size: --size WIDTHxHEIGHT");
+  void CheckContainer(Container container) const {
+    if (container == Container::Jpeg && mTo.isHdr)
+      throw ToolError(std::string("a JPEG holds 8 bits, too few for ") + mTo.name + "; write png, tiff, dpx or y4m");
+    const std::string name = mTo.name;
+    if (container == Container::Exr && name != "rec709" && name != "rec2020")
+      std::cerr << "vexel: note: an EXR holds light, taken from the signal by the power 2.4, which is not the curve of "
+                << name << "; --to rec709 or rec2020 writes true light\n";
   }
 
   // Deep files stay deep; HDR signals need more than 8 bits in any case.
@@ -161,7 +158,7 @@ void RunColor(const ColorCommand& command) {
     return;
   }
   if (command.in.empty() || command.out.empty() || command.from.empty() || command.to.empty())
-    throw ToolError("vexel color needs IN, OUT, --from and --to (or --plot)");
+    throw CLI::RequiredError("vexel color needs IN, OUT, --from and --to (or --plot)", CLI::ExitCodes::RequiredError);
   ColorConversion(command).Run();
 }
 

@@ -27,10 +27,11 @@ const std::vector<NamedColorSpace>& ColorSpaces() {
 const NamedColorSpace& ParseColorSpace(const std::string& name) {
   std::vector<std::string> names;
   for (const NamedColorSpace& space : ColorSpaces()) {
-    if (name == space.name) return space;
+    if (SameName(name, space.name)) return space;
     names.push_back(space.name);
   }
-  throw ToolError("unknown colour space \"" + name + "\"; did you mean " + NearestNames(name, names) + "?");
+  throw ToolError("unknown colour space \"" + name + "\"; did you mean " + NearestNames(name, names) +
+                  "? (\"vexel color --help\" lists all)");
 }
 
 std::string ColorSpaceNames() {

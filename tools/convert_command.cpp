@@ -50,17 +50,6 @@ FrameRange ParseFrames(const std::string& text) {
   return range;
 }
 
-SourceOptions SourceOptionsOf(const ConvertCommand& command) {
-  SourceOptions options;
-  options.threads = command.run.threads;
-  if (!command.matrix.empty()) options.matrix = ParseMatrix(command.matrix);
-  if (!command.size.empty()) std::tie(options.width, options.height) = ParseSize(command.size);
-  if (!command.rawFormat.empty()) options.rawFormat = ParseFormat(command.rawFormat);
-  if (options.width && !options.rawFormat)
-    throw ToolError("--size belongs to raw frames (--raw-format); nothing is ever scaled");
-  return options;
-}
-
 // One frame on its way: as read, as asked for, and as the file takes it.
 struct Job {
   Picture source, converted, stored;
@@ -73,7 +62,8 @@ class Conversion {
       : mCommand(command),
         mFormat(ParseFormat(command.format)),
         mRange(ParseFrames(command.frames)),
-        mSource(OpenSource(command.in, SourceOptionsOf(command))),
+        mSource(OpenSource(command.in,
+                           ParseSourceOptions(command.rawFormat, command.size, command.matrix, command.run.threads))),
         mReport(command.out == "-" ? std::cerr : std::cout) {
     SinkOptions options;
     options.frameRate = mSource->FrameRate();
@@ -147,7 +137,7 @@ class Conversion {
 
   void Encode(Job& job, const ConvertOptions& options) const {
     if (mCommand.hash) job.hashed = RawBytes(job.converted);
-    const VX_PixelFormat format = mSink->StorageFormat(mFormat);
+    const VX_PixelFormat format = mSink->StorageFormat(mFormat, job.converted.Height());
     job.stored = format == mFormat ? std::move(job.converted) : ConvertPicture(job.converted, format, options);
     job.encoded = mSink->Encode(job.stored);
   }
@@ -155,7 +145,7 @@ class Conversion {
   void Explain(const Picture& source) {
     if (!mCommand.explain) return;
     mReport << "plan: " << ExplainConversion(source.Format(), mFormat, mCommand.quality) << '\n';
-    const VX_PixelFormat stored = mSink->StorageFormat(mFormat);
+    const VX_PixelFormat stored = mSink->StorageFormat(mFormat, source.Height());
     if (stored != mFormat) mReport << "file: " << ExplainConversion(mFormat, stored, mCommand.quality) << '\n';
   }
 

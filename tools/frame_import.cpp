@@ -64,7 +64,7 @@ Matrix MatrixOf(const AVFrame& frame, Matrix wanted) {
       return Matrix::Bt2020;
     case AVCOL_SPC_UNSPECIFIED:
     case AVCOL_SPC_RESERVED:
-      return frame.height >= 720 ? Matrix::Bt709 : Matrix::Bt601;
+      return UnnamedMatrix(frame.height);
     default:
       RefuseFrame(frame, std::string("coded with the ") + av_color_space_name(frame.colorspace) +
                              " matrix (--matrix 601 or 709 treats them as such)");

@@ -39,6 +39,9 @@ enum class Matrix { FromFile, Bt601, Bt709, Bt2020 };
 // Reads "601", "709" or "2020".
 Matrix ParseMatrix(const std::string& text);
 
+// What a picture of this height is taken for that does not name its matrix.
+inline Matrix UnnamedMatrix(int height) { return height >= 720 ? Matrix::Bt709 : Matrix::Bt601; }
+
 // The library format that `frame`, decoded by `codec`, maps to. Throws ToolError, naming the property in the way, when
 // the library has none.
 VX_PixelFormat LibraryFormatOf(const AVFrame& frame, AVCodecID codec, Matrix matrix);

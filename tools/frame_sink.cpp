@@ -40,7 +40,7 @@ Container ContainerOf(const std::string& path) {
   const size_t dot = path.find_last_of("./");
   if (dot != std::string::npos && path[dot] == '.')
     if (const ContainerName* entry = FindContainer(path.substr(dot + 1))) return entry->container;
-  throw ToolError("cannot tell from its name what to write to \"" + path + "\"; use an extension of, or --container, " +
+  throw ToolError("cannot tell from its name what to write to \"" + path + "\"; its extension may be " +
                   ContainerNames());
 }
 

@@ -30,7 +30,8 @@ class FrameSink {
  public:
   virtual ~FrameSink() = default;
   // The library format, nearest to `format`, that the file can hold: with alpha, and deep enough, where the file can.
-  virtual VX_PixelFormat StorageFormat(VX_PixelFormat format) const = 0;
+  // `height` is the pictures'; it tells readers the matrix where the file does not.
+  virtual VX_PixelFormat StorageFormat(VX_PixelFormat format, int height) const = 0;
   // The bytes of one frame of a storage format. May be called from several threads at once.
   virtual std::vector<uint8_t> Encode(const Picture& picture) const = 0;
   // Writes encoded frames, in order. Throws ToolError when the file cannot be written.

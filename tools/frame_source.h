@@ -19,6 +19,10 @@ struct SourceOptions {
   int threads = 0;  // for decoding; 0 = as many as the codec likes
 };
 
+// From the texts of a command's options, empty where they are not given. A size is that of raw frames.
+SourceOptions ParseSourceOptions(const std::string& rawFormat, const std::string& size, const std::string& matrix,
+                                 int threads);
+
 class FrameSource {
  public:
   virtual ~FrameSource() = default;

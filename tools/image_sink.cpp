@@ -113,7 +113,7 @@ class ImageSink : public FrameSink {
     CollectAvMessages();
   }
 
-  VX_PixelFormat StorageFormat(VX_PixelFormat format) const override { return StorageOf(mKind, format).format; }
+  VX_PixelFormat StorageFormat(VX_PixelFormat format, int) const override { return StorageOf(mKind, format).format; }
 
   std::vector<uint8_t> Encode(const Picture& picture) const override {
     const std::string what = "cannot write \"" + mPath + "\"";

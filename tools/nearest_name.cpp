@@ -27,6 +27,11 @@ int EditDistance(const std::string& a, const std::string& b) {
 
 }  // namespace
 
+bool SameName(const std::string& a, const std::string& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](unsigned char x, unsigned char y) { return std::tolower(x) == std::tolower(y); });
+}
+
 std::string NearestNames(const std::string& name, const std::vector<std::string>& names) {
   std::vector<std::pair<int, std::string>> ranked;
   for (const std::string& candidate : names) ranked.emplace_back(EditDistance(name, candidate), candidate);

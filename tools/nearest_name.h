@@ -6,6 +6,9 @@
 
 namespace tool {
 
+// Whether two names differ in case at most.
+bool SameName(const std::string& a, const std::string& b);
+
 // The few of `names` that are nearest to `name` by edit distance, ignoring case, best first: "a, b, c".
 std::string NearestNames(const std::string& name, const std::vector<std::string>& names);
 

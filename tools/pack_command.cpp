@@ -84,7 +84,7 @@ void RunUnpack(const PackOptions& options) {
       sink->Append(frame, unpacked);
     } else {
       const Picture picture = packing.ToPicture(unpacked, frame.Width(), frame.Height());
-      const Picture stored = ConvertPicture(picture, sink->StorageFormat(picture.Format()), convert);
+      const Picture stored = ConvertPicture(picture, sink->StorageFormat(picture.Format(), picture.Height()), convert);
       sink->Append(stored, sink->Encode(stored));
     }
     ++frames;

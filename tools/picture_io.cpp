@@ -19,7 +19,7 @@ Picture LoadPictureAs(const std::string& path, VX_PixelFormat format, const Conv
 void SavePicture(const Picture& picture, const std::string& path, const ConvertOptions& convert,
                  const SinkOptions& options) {
   const std::unique_ptr<FrameSink> sink = OpenSink(path, options);
-  const VX_PixelFormat format = sink->StorageFormat(picture.Format());
+  const VX_PixelFormat format = sink->StorageFormat(picture.Format(), picture.Height());
   const auto save = [&](const Picture& stored) { sink->Append(stored, sink->Encode(stored)); };
   if (format == picture.Format())
     save(picture);

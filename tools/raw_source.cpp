@@ -3,9 +3,11 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <tuple>
 
 #include "format_catalogue.h"
 #include "frame_source.h"
+#include "parse_size.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -71,6 +73,18 @@ class RawSource : public FrameSource {
 };
 
 }  // namespace
+
+SourceOptions ParseSourceOptions(const std::string& rawFormat, const std::string& size, const std::string& matrix,
+                                 int threads) {
+  SourceOptions options;
+  options.threads = threads;
+  if (!matrix.empty()) options.matrix = ParseMatrix(matrix);
+  if (!size.empty()) std::tie(options.width, options.height) = ParseSize(size);
+  if (!rawFormat.empty()) options.rawFormat = ParseFormat(rawFormat);
+  if (options.width && !options.rawFormat)
+    throw ToolError("--size belongs to raw frames (--raw-format); nothing is ever scaled");
+  return options;
+}
 
 std::unique_ptr<FrameSource> OpenRawSource(const std::string& path, const SourceOptions& options) {
   return std::make_unique<RawSource>(path, options);

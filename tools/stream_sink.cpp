@@ -2,6 +2,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <iostream>
 
 extern "C" {
 #include <libavutil/pixdesc.h>
@@ -9,6 +10,7 @@ extern "C" {
 
 #include "format_catalogue.h"
 #include "frame_export.h"
+#include "frame_import.h"
 #include "frame_sink.h"
 #include "tool_error.h"
 
@@ -46,7 +48,7 @@ class ByteStream {
 class RawSink : public FrameSink {
  public:
   explicit RawSink(const std::string& path) : mStream(path) {}
-  VX_PixelFormat StorageFormat(VX_PixelFormat format) const override { return format; }
+  VX_PixelFormat StorageFormat(VX_PixelFormat format, int) const override { return format; }
   std::vector<uint8_t> Encode(const Picture& picture) const override { return RawBytes(picture); }
   void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
     mStream.Write(encoded.data(), encoded.size());
@@ -77,10 +79,12 @@ class Y4mSink : public FrameSink {
  public:
   Y4mSink(const std::string& path, std::pair<int, int> frameRate) : mStream(path), mFrameRate(frameRate) {}
 
-  // RGB goes to BT.709. Y4M has no straight or premultiplied alpha beyond 8 bits.
-  VX_PixelFormat StorageFormat(VX_PixelFormat format) const override {
+  // Y4M has no straight or premultiplied alpha beyond 8 bits, and does not name its matrix: RGB takes the one that
+  // readers assume.
+  VX_PixelFormat StorageFormat(VX_PixelFormat format, int height) const override {
     if (Is420(format) && !IsBiplanar420(format)) return format;
-    const uint32_t matrix = !IsYuv(format) || (Bits(format) & 0x600) ? 0x200 : 0;
+    const bool is709 = IsYuv(format) ? (Bits(format) & 0x600) != 0 : UnnamedMatrix(height) == Matrix::Bt709;
+    const uint32_t matrix = is709 ? 0x200 : 0;
     const auto with = [&](VX_PixelFormat base) { return static_cast<VX_PixelFormat>(Bits(base) | matrix); };
     if (Is420(format)) return with(Is8Bit(format) ? VX_PixelFormat::VUYX_4444_8u : VX_PixelFormat::V210_422_10u);
     if (!IsRaster(format)) return with(VX_PixelFormat::UYVY_422_8u);
@@ -124,6 +128,10 @@ class Y4mSink : public FrameSink {
                                      picture.Width(), picture.Height(), mFrameRate.first, mFrameRate.second,
                                      field ? 't' : 'p', Y4mCodingOf(picture.Format()).name, range);
     mStream.Write(header, static_cast<size_t>(length));
+    const bool is709 = (Bits(picture.Format()) & 0x600) != 0;
+    if (is709 != (UnnamedMatrix(picture.Height()) == Matrix::Bt709))
+      std::cerr << "vexel: note: Y4M does not name its matrix; read this one with --matrix " << (is709 ? "709" : "601")
+                << '\n';
     mHeaderWritten = true;
   }
 

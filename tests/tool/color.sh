@@ -60,8 +60,10 @@ refuses 1 'did you mean srgb' color two.png x.png --from sgrb --to pq
 refuses 1 'standard range' color two.png x.png --from srgb --to pq --tone 1,1.2,0.6
 refuses 1 'no tone curve' color two.png x.png --from srgb --to srgb --tone 1,0.5,0.6
 refuses 1 'no tone curve' color two.png x.png --from srgb --to srgb --tone 1,1.2
-refuses 1 'needs IN' color two.png x.png --from srgb
+refuses 2 'needs IN' color two.png x.png --from srgb
+refuses 1 'a JPEG holds 8 bits' color two.png x.jpg --from srgb --to PQ
+refuses 1 '--size belongs to raw frames' color two.png x.png --from srgb --to pq --size 2x1
 refuses 1 'cannot write' color --plot nowhere
 refuses 1 'size' color p010.raw x.png --raw-format BGRA_4444_8u --size 2 --from srgb --to pq
-[ ! -e x.png ] || fail "a refused command wrote a file"
+[ ! -e x.png ] && [ ! -e x.jpg ] || fail "a refused command wrote a file"
 exit $failed

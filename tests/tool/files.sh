@@ -45,6 +45,17 @@ returns YUYV_422_8u_709 m.y4m held --matrix 709
 convert "$clip422" n.jpg --format BGRX_4444_8u
 "$vexel" info n.jpg | grep -q 'library format VUYX_4444_32f' || fail "JPEG 4:4:4: $("$vexel" info n.jpg)"
 
+# Y4M does not name its matrix: RGB is written with the one that readers assume, and a note says where YUV is not.
+convert "$clip422" there.raw --format BGRX_4444_8u --frames 3
+convert "$clip422" o.y4m --format BGRX_4444_8u --frames 3
+! grep -q note log || fail "RGB to Y4M: $(cat log)"
+convert o.y4m back.raw --format BGRX_4444_8u
+worst=$(paste <(od -An -v -tu1 -w1 there.raw) <(od -An -v -tu1 -w1 back.raw) |
+  awk '{ d = $1 - $2; d = d < 0 ? -d : d; if (d > w) w = d } END { print w + 0 }')
+[ "$worst" -le 3 ] || fail "RGB through Y4M is $worst codes away"
+convert "$clip422" o.y4m --format UYVY_422_8u_709 --frames 3
+grep -q 'note: .*--matrix 709' log || fail "709 to Y4M: $(cat log)"
+
 # The pictures of the examples are what they say.
 "$vexel" info "$clip420" >info || fail "info"
 grep -q '480x270, 12 frames/s, 24 frames' info || fail "info: $(cat info)"
