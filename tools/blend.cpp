@@ -39,7 +39,7 @@ std::span<const BlendModeEntry> BlendModes() {
 VX_BlendMode ParseBlendMode(const std::string& name) {
   std::vector<std::string> names;
   for (const BlendModeEntry& entry : BlendModes()) {
-    if (SameName(name, entry.name)) return entry.mode;
+    if (SameName(name, entry.name) || name == std::to_string(static_cast<int>(entry.mode))) return entry.mode;
     names.push_back(entry.name);
   }
   throw ToolError("unknown blend mode \"" + name + "\"; did you mean " + NearestNames(name, names) +

@@ -17,7 +17,7 @@ struct BlendModeEntry {
 // In the order of the modes' numbers.
 std::span<const BlendModeEntry> BlendModes();
 
-// The mode of a name, case ignored. Throws ToolError, with the nearest names, when there is none.
+// The mode of a name, case ignored, or of a number. Throws ToolError, with the nearest names, when there is none.
 VX_BlendMode ParseBlendMode(const std::string& name);
 
 struct BlendOptions {

@@ -129,7 +129,7 @@ void AddCompositeCommand(CLI::App& app) {
       AddBlend(app, "composite", "Lay one picture over another, through a blend mode", RunComposite, options);
   std::string names;
   for (const BlendModeEntry& entry : BlendModes()) names += (names.empty() ? "" : ", ") + std::string(entry.name);
-  command->add_option("--mode", options->mode, names + " (default Normal)");
+  command->add_option("--mode", options->mode, names + " (default Normal), or its number");
 }
 
 void AddBlendSheetCommand(CLI::App& app) {

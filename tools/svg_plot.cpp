@@ -1,8 +1,10 @@
 #include "svg_plot.h"
 
+#include <cerrno>
 #include <cmath>
 #include <cstdarg>
 #include <cstdio>
+#include <cstring>
 #include <fstream>
 
 #include "tool_error.h"
@@ -70,6 +72,7 @@ void SvgPlot::Mark(const std::string& label, double x, double y) {
 
 void SvgPlot::Write(const std::string& path) const {
   std::ofstream out(path);
+  if (!out) throw ToolError("cannot write \"" + path + "\": " + std::strerror(errno));
   const int right = mWidth - kRight, bottom = mHeight - kBottom;
   out << Text(
              "<svg xmlns='http://www.w3.org/2000/svg' width='%d' height='%d' font-family='sans-serif' "

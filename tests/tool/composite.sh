@@ -26,6 +26,7 @@ grey front.png 2x1 377 063                 # 255 and 51
 gives "100 100 100 200 200 200" back.png front.png --opacity 0
 gives "255 51 100 200 200 200" back.png front.png
 gives "100 20 100 200 200 200" back.png front.png --mode multiply --offset 0,0
+gives "100 20 100 200 200 200" back.png front.png --mode 17
 gives "100 100 100 200 255 51" back.png front.png --offset 1,1
 gives "51 100 100 200 200 200" back.png front.png --offset -1,0
 gives "100 100 255 200 200 200" back.png front.png --offset 2,0
