@@ -2,26 +2,16 @@
 #pragma once
 
 #include <cstdint>
-#include <new>
 #include <string>
 #include <vector>
 
 #include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/Operations.h"
+#include "support/PaddedRows.h"
 #include "support/Random.h"
 
 namespace vexel::testing {
-
-// Memory in which rows may begin at cache lines.
-template <class T>
-struct LineAllocator {
-  using value_type = T;
-  static constexpr std::align_val_t kLine{64};
-  T* allocate(size_t n) { return static_cast<T*>(operator new(n * sizeof(T), kLine)); }
-  void deallocate(T* p, size_t) { operator delete(p, kLine); }
-  bool operator==(const LineAllocator&) const = default;
-};
 
 struct Image {
   Image(VX_PixelFormat f, int w, int h, Contents contents = Contents::Random, uint64_t seed = 1)
@@ -49,7 +39,7 @@ struct Image {
   VX_PixelFormat format;
   int width, height;
   int32_t rowBytes;
-  std::vector<uint8_t, LineAllocator<uint8_t>> bytes;
+  LineBytes bytes;
 };
 
 // Where the alpha of a pixel of four channels is.

@@ -1,13 +1,25 @@
-// Rows of any bytes, of either direction, inside a larger block whose rest must stay as it was.
+// Rows of any bytes, of either direction, inside a larger block at a cache line, whose rest must stay as it was.
 #pragma once
 
 #include <cstdint>
 #include <cstring>
+#include <new>
 #include <vector>
 
 #include "support/Random.h"
 
 namespace vexel::testing {
+
+// Memory in which rows may begin at cache lines.
+template <class T>
+struct LineAllocator {
+  using value_type = T;
+  static constexpr std::align_val_t kLine{64};
+  T* allocate(size_t n) { return static_cast<T*>(operator new(n * sizeof(T), kLine)); }
+  void deallocate(T* p, size_t) { operator delete(p, kLine); }
+  bool operator==(const LineAllocator&) const = default;
+};
+using LineBytes = std::vector<uint8_t, LineAllocator<uint8_t>>;
 
 struct PaddedRows {
   PaddedRows(size_t bytes, int height, int padding, bool upsideDown, uint64_t seed, size_t offset = 3)
@@ -32,7 +44,7 @@ struct PaddedRows {
     std::memcpy(memory.data() + At(row) + index * sizeof(T), &v, sizeof(T));
   }
 
-  std::vector<uint8_t> memory;
+  LineBytes memory;
   size_t first;
   int rowBytes;
 };
