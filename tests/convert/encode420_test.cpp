@@ -7,11 +7,8 @@
 #include <vector>
 
 #include "convert/Planar420.h"
-#include "frame/KernelVariant.h"
 #include "support/Arena.h"
-#include "support/FailingAllocations.h"
 #include "support/Formats.h"
-#include "support/Image.h"
 #include "support/Reference420.h"
 
 namespace vexel::testing {
@@ -106,21 +103,6 @@ TEST(Encode420, Colours) {
   }
 }
 
-// Other rasters are converted on the way.
-TEST(Encode420, EveryRasterFormat) {
-  const int width = 37, height = 6;
-  for (const F format : {F::YUV_420_MPEG4_FIELD_709, F::YUV_420_MPEG2_FRAME_FullRange})
-    for (const F srcFormat : RasterFormats()) {
-      const Image src(srcFormat, width, height, Bits(srcFormat)), pixels = src.Converted(InputOf(format), 2);
-      Block420 dst(format, width, height), expected(format, width, height);
-      ASSERT_EQ(VX_Success,
-                Encode420(src.bytes.data(), src.rowBytes, srcFormat, dst.bytes.data(), format, width, height));
-      ASSERT_EQ(VX_Success, Encode420(pixels.bytes.data(), 4 * width, InputOf(format), expected.bytes.data(), format,
-                                      width, height));
-      EXPECT_EQ(dst.bytes, expected.bytes) << FormatName(srcFormat);
-    }
-}
-
 TEST(Encode420, Refuses) {
   const struct {
     F src, dst;
@@ -142,16 +124,6 @@ TEST(Encode420, Refuses) {
   const F dst = F::YUV_420_MPEG2_FRAME_709;
   EXPECT_EQ(VX_ErrNullSource, Encode420(nullptr, 4, F::BGRX_4444_8u, memory, dst, 1, 1));
   EXPECT_EQ(VX_ErrNullDestination, Encode420(memory, 4, F::BGRX_4444_8u, nullptr, dst, 1, 1));
-}
-
-TEST(Encode420, SurvivesFailingAllocations) {
-  const int width = 70000;
-  Raster src(width, 1);
-  Block420 dst(F::YUV_420_MPEG2_FRAME_709, width, 1);
-  const auto encode = [&] {
-    return Encode420(src.bytes.data(), 4 * width, F::BGRX_4444_8u, dst.bytes.data(), dst.format, width, 1);
-  };
-  EXPECT_GT(ExpectSurvivesFailingAllocations("encode 4:2:0", encode), 0);
 }
 
 }  // namespace
