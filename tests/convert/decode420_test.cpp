@@ -125,8 +125,10 @@ TEST(Decode420, EveryFormatAndBranch) {
       {96, 8, 128, 4},  {192, 3, 256, 3}, {16, 5, 24, 5},  {48, 9, 72, 4}, {80, 2, 120, 1},
   };
   const F destinations[] = {F::BGRA_4444_8u, F::VUYX_4444_8u, F::VUYP_4444_8u_709};
+  std::vector<F> formats = Formats420();
+  formats.push_back(FromBits(0x0A001831));  // V before U
   int turn = 0;
-  for (const F format : Formats420())
+  for (const F format : formats)
     for (const Sizes& s : sizes) {
       Block420 src(format, s.width, s.height);
       src.Randomize(static_cast<uint64_t>(turn));
@@ -331,7 +333,8 @@ TEST(Decode420, Refuses) {
   }
   EXPECT_EQ(VX_ErrNullSource, VX::DecompressYUV_420_8u(nullptr, nullptr, 1, 1, mpeg, memory, 4, 1, 1, bgra,
                                                        FieldType::Whole, RenderQuality::Low));
-  EXPECT_EQ(VX_ErrNullSource, Decode420(nullptr, mpeg, 1, 1, memory, 4, bgra, 2));
+  for (const int size : {1, 0, -1})
+    EXPECT_EQ(VX_ErrNullSource, Decode420(nullptr, mpeg, size, 1, memory, 4, bgra, 2)) << size;
   EXPECT_EQ(VX_ErrNullDestination, Decode420(memory, mpeg, 1, 1, nullptr, 4, bgra, 2));
 }
 
