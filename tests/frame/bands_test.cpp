@@ -75,6 +75,16 @@ TEST(Bands, FewRowsNeedNoTask) {
   });
   EXPECT_EQ(firsts, (std::vector<int>{32, 33, 0, 32}));
   EXPECT_EQ(executor->calls, 1);
+  struct OnePiece final : Task {
+    int PieceCount() override { return 1; }
+    void ExecutePiece(int) override { ++done; }
+    int done = 0;
+  } task;
+  EXPECT_TRUE(RunTask(task));
+  EXPECT_EQ(executor->calls, 1) << "nor does one piece";
+  for (const int count : {-1, 0, 1})
+    zovcore::threads::ExecuteCPUBoundTaskOnAllProcessors([&](int) { ++task.done; }, count);
+  EXPECT_EQ(task.done, 2);
   vexel_host::SetExecutor(nullptr);
 }
 

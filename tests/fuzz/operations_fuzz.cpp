@@ -46,75 +46,43 @@ struct Operation {
   bool turns = false;  // width and height change places
 };
 
-Operation AnyConversion(Input& input) {
-  const F src = input.Raster(), dst = input.Raster();
-  const int quality = input.ConsumeIntegralInRange(-1, 6);
-  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) { return Convert(*from, to, quality); }};
+Operation AnyOperation(Input& input) {
+  static constexpr Fill kFills[] = {VX_FillWithOpaqueBlack, VX_FillWithTransparentBlack, VX_FillWithOpaqueWhite,
+                                    VX_FillWithTransparentWhite};
+  using Sources = const ArenaFrame*;
+  using To = const ArenaFrame&;
+  const int kind = input.ConsumeIntegralInRange(0, 7), option = input.ConsumeIntegralInRange(-1, 6);
+  const int choice = input.ConsumeIntegralInRange(-1, 27), angle = choice % 4 * 90;
+  const bool other = input.ConsumeBool();
+  const F a = input.Raster(), b = input.Raster(), c = input.Raster(), to = input.Raster();
+  const float x = input.Fraction(), y = input.Fraction(), z = input.Fraction();
+  switch (kind) {
+    case 0:
+      return {{a}, to, [=](Sources s, To d) { return Convert(*s, d, option); }};
+    case 1:
+      return {{to},
+              to,
+              [=](Sources s, To d) { return Rotate(*s, d, other ? -angle : angle, option > 2); },
+              angle % 180 != 0};
+    case 2:
+      return {{a, b}, to, [=](Sources s, To d) {
+                return Blend(static_cast<VX_BlendMode>(choice), s[0], s[1], d, x, option);
+              }};
+    case 3:
+      return {{a}, to, [=](Sources s, To d) {
+                int32_t state;
+                return other ? ToBlackTested(*s, d, &state, option) : ToBlack(*s, d, x, option);
+              }};
+    case 4:
+      return {{a, b}, to, [=](Sources s, To d) { return Dissolve(s[0], s[1], d, x, option); }};
+    case 5:
+      return {{a}, to, [=](Sources s, To d) { return AlphaGain(*s, d, x, option); }};
+    case 6:
+      return {{a, b, c}, to, [=](Sources s, To d) { return Accumulate({s[0], s[1], s[2]}, d, {x, y, z}); }};
+    default:
+      return {{}, to, [=](Sources, To d) { return FillWith(kFills[choice & 3], d); }};
+  }
 }
-
-Operation AnyRotation(Input& input) {
-  const F format = input.Raster();
-  const int angle = 90 * input.ConsumeIntegralInRange(-3, 3);
-  const bool flip = input.ConsumeBool();
-  const auto rotate = [=](const ArenaFrame* from, const ArenaFrame& to) { return Rotate(*from, to, angle, flip); };
-  return {{format}, format, rotate, angle % 180 != 0};
-}
-
-Operation AnyComposite(Input& input) {
-  const auto mode = static_cast<VX_BlendMode>(input.ConsumeIntegralInRange(-1, 27));
-  const int option = input.ConsumeIntegralInRange(-1, 6);
-  const float opacity = input.Fraction();
-  const F src = input.Raster(), background = input.Raster(), dst = input.Raster();
-  return {{src, background}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return Blend(mode, from[0], from[1], to, opacity, option);
-          }};
-}
-
-Operation AnyToBlack(Input& input) {
-  const int hint = input.ConsumeIntegralInRange(0, 4);
-  const float opacity = input.Fraction();
-  const bool test = input.ConsumeBool();
-  const F src = input.Raster(), dst = input.Raster();
-  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            int32_t state;
-            return test ? ToBlackTested(*from, to, &state, hint) : ToBlack(*from, to, opacity, hint);
-          }};
-}
-
-Operation AnyDissolve(Input& input) {
-  const int hint = input.ConsumeIntegralInRange(0, 4);
-  const float mix = input.Fraction();
-  const F a = input.Raster(), b = input.Raster(), dst = input.Raster();
-  return {{a, b}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return Dissolve(from[0], from[1], to, mix, hint);
-          }};
-}
-
-Operation AnyGain(Input& input) {
-  const int hint = input.ConsumeIntegralInRange(0, 4);
-  const float gain = input.Fraction();
-  const F src = input.Raster(), dst = input.Raster();
-  return {{src}, dst, [=](const ArenaFrame* from, const ArenaFrame& to) { return AlphaGain(*from, to, gain, hint); }};
-}
-
-Operation AnySum(Input& input) {
-  const std::vector<float> weights = {input.Fraction(), input.Fraction(), input.Fraction()};
-  const std::vector<F> sources = {input.Raster(), input.Raster(), input.Raster()};
-  const F dst = input.Raster();
-  return {sources, dst, [=](const ArenaFrame* from, const ArenaFrame& to) {
-            return Accumulate({from[0], from[1], from[2]}, to, weights);
-          }};
-}
-
-Operation AnyFill(Input& input) {
-  static constexpr auto kFills = {VX_FillWithOpaqueBlack, VX_FillWithTransparentBlack, VX_FillWithOpaqueWhite,
-                                  VX_FillWithTransparentWhite};
-  const auto fill = kFills.begin()[input.ConsumeIntegralInRange(0, 3)];
-  return {{}, input.Raster(), [fill](const ArenaFrame*, const ArenaFrame& to) { return FillWith(fill, to); }};
-}
-
-constexpr Operation (*kOperations[])(Input&) = {AnyConversion, AnyRotation, AnyComposite, AnyToBlack,
-                                                AnyDissolve,   AnyGain,     AnySum,       AnyFill};
 
 // A refusal depends on formats and arguments only, not on the buffers.
 VX_Result Verdict(const Operation& operation) {
@@ -126,7 +94,7 @@ VX_Result Verdict(const Operation& operation) {
 void Run(Input& input) {
   const auto variant =
       static_cast<KernelVariant>(input.ConsumeIntegralInRange(0, static_cast<int>(ProcessorVariant())));
-  const Operation operation = kOperations[input.ConsumeIntegralInRange<size_t>(0, std::size(kOperations) - 1)](input);
+  const Operation operation = AnyOperation(input);
 
   ArenaCase arenaCase;
   arenaCase.name = "fuzzed";
