@@ -56,7 +56,8 @@ TEST(ColorMatrix, InvertsUnlessTheDeterminantIsBelowTheLimit) {
   const Matrix m{3, 0.5, -1, 2, 4, 0.25, -0.5, 1, 2};
   ExpectNear(FromArray(m).Inverted(&ok), Inverse(m), 1e-6);
   EXPECT_TRUE(ok);
-  for (const auto& [determinant, regular] : {std::pair{5e-7f, false}, {-5e-7f, false}, {1e-6f, true}, {0.0f, false}}) {
+  for (const auto& [determinant, regular] :
+       {std::pair{5e-7f, false}, {-5e-7f, false}, {1e-6f, true}, {-1.0f, true}, {0.0f, false}}) {
     ok = !regular;
     const CSMatrix diagonal(1, 0, 0, 0, 1, 0, 0, 0, determinant);
     EXPECT_EQ(diagonal.Inverted(&ok).IsUnity(), !regular) << determinant;
@@ -172,6 +173,7 @@ struct PqLayout : VX::PQColorSpace {
 };
 struct P3Layout : VX::DCIP3ColorSpace {
   using DCIP3ColorSpace::DCIP3ColorSpace;
+  using DCIP3ColorSpace::mIlluminant;
   static bool MembersInOrder() {
     const P3Layout p(VX_IlluminantD65);
     const void* members[] = {&p.mMatricesValid, &p.mGamma,           &p.mIlluminant,    p.mLumaCoeffs, &p.mFromRec709,
@@ -232,6 +234,10 @@ TEST(ColorSpaces, CopiesCarryTheirCaches) {
     space->ConvertPixelsFromRec709(in, got, 1, false);
     EXPECT_EQ(std::memcmp(got, expected, sizeof got), 0);
   }
+  const P3Layout d60(VX_IlluminantD60);
+  P3Layout other(VX_IlluminantD65);
+  other = d60;
+  EXPECT_EQ(other.mIlluminant, VX_IlluminantD60);
   pq.ConvertPixelsToRec709(in, expected, 1, false);
   const VX::PQColorSpace pqCopy(pq);
   pqCopy.ConvertPixelsToRec709(in, got, 1, false);

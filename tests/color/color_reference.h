@@ -129,17 +129,22 @@ struct HlgCurve {
   static double Luma(const Rgb& c) { return 0.2627 * c[0] + 0.678 * c[1] + 0.0593 * c[2]; }
 };
 
+inline double SrgbDecode(double v) {
+  const double m = std::abs(v);
+  return std::copysign(m > 0.04045 ? std::pow((m + 0.055) / 1.055, 2.4) : m / 12.92, v);
+}
+inline double SrgbEncode(double v) {
+  const double m = std::abs(v);
+  return std::copysign(m > 0.0031308 ? 1.055 * std::pow(m, 1 / 2.4) - 0.055 : 12.92 * m, v);
+}
+
 struct ToneReference {
-  double threshold, scale, offset, decodeExponent, slope;
-  double encodeThreshold, encodeScale, encodeOffset, encodeExponent, encodeSlope;
+  std::function<double(double)> decode, encode;
   Matrix toXyz, fromXyz;
   double whiteX, whiteY;
 
   Rgb operator()(const Rgb& in, double a, double b, double c, Noise& noise) const {
-    const Rgb light = Each(in, noise, [&](double v) {
-      const double m = std::abs(v);
-      return std::copysign(m > threshold ? std::pow((m + offset) * scale, decodeExponent) : m * slope, v);
-    });
+    const Rgb light = Each(in, noise, decode);
     const Rgb xyz = Times(toXyz, light, noise);
     const double sum = noise(xyz[0] + xyz[1] + xyz[2]);
     const double x = sum > 1e-6 ? noise(xyz[0] / sum) : whiteX, y = sum > 1e-6 ? noise(xyz[1] / sum) : whiteY;
@@ -150,11 +155,7 @@ struct ToneReference {
     w = noise(std::copysign(w, t));
     const double luminance = noise((noise(std::pow(10, noise(w + 1))) - 1) * 0.01010101);
     const Rgb out = Times(fromXyz, noise({x * luminance / y, luminance, noise(1 - x - y) * luminance / y}), noise);
-    return Each(out, noise, [&](double v) {
-      const double m = std::abs(v);
-      return std::copysign(
-          m > encodeThreshold ? std::pow(m, encodeExponent) * encodeScale + encodeOffset : m * encodeSlope, v);
-    });
+    return Each(out, noise, encode);
   }
 };
 
