@@ -13,7 +13,7 @@
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
-#include "support/Variants.h"
+#include "support/Processor.h"
 
 namespace vexel::testing {
 namespace {

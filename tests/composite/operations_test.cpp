@@ -18,7 +18,7 @@
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
-#include "support/SmallCache.h"
+#include "support/Processor.h"
 
 namespace vexel::testing {
 namespace {

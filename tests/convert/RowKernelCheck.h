@@ -1,4 +1,4 @@
-// Runs of row kernels over typed rows. Variants, tails and memory are for convert_arena_test.cpp.
+// Runs of row kernels over typed rows. Variants, tails and memory are for ConvertArena.
 #pragma once
 
 #include <cstddef>

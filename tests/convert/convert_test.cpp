@@ -1,26 +1,146 @@
-#include <gtest/gtest.h>
-#include <xmmintrin.h>
-
+// Conversions of pictures: their plans, every pair of formats, every direct kernel in the armed arena.
+#include <algorithm>
 #include <climits>
 #include <cstring>
 #include <string>
 #include <vector>
+#include <xmmintrin.h>
+
+#include <gtest/gtest.h>
 
 #include "convert/Planar420.h"
+#include "convert/Planner.h"
+#include "convert/RgbKernels.h"
 #include "convert/RowConverter.h"
+#include "convert/StepGraph.h"
+#include "convert/YuvKernels.h"
 #include "formats/FormatBits.h"
 #include "frame/KernelVariant.h"
 #include "support/Arena.h"
+#include "support/FailingAllocations.h"
 #include "support/Formats.h"
 #include "support/Image.h"
-#include "support/SmallCache.h"
+#include "support/Operations.h"
+#include "support/Processor.h"
 
-namespace vexel {
+namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
-using testing::FormatName;
-using testing::RasterFormats;
+
+std::string Chain(F src, F dst) {
+  F formats[9];
+  int32_t count = 0;
+  if (VX_ExplainConversion(src, dst, 2, formats, &count) != VX_Success) return "none";
+  std::string text;
+  for (int i = 0; i < count; ++i) text += (i ? " > " : "") + FormatName(formats[i]);
+  return text;
+}
+
+int DepthRank(F format) {
+  const uint32_t depth = Depth(format);
+  return depth == kDepth8u ? 8 : depth == kDepth10u ? 10 : depth == kDepth15u ? 15 : 32;
+}
+
+TEST(Planner, EveryPairWalksAlongStepsOfTheGraph) {
+  for (F src : RasterFormats())
+    for (F dst : RasterFormats()) {
+      Plan plan;
+      ASSERT_EQ(MakePlan(src, dst, 2, &plan), VX_Success) << FormatName(src) << " to " << FormatName(dst);
+      ASSERT_GE(plan.stepCount, 1);
+      ASSERT_LE(plan.stepCount, kMaxSteps);
+      F current = src;
+      for (int i = 0; i < plan.stepCount; ++i) {
+        const auto isStep = [&](const Step& step) { return step.from == current && step.to == plan.steps[i].to; };
+        ASSERT_TRUE(src == dst || std::ranges::any_of(AllSteps(), isStep)) << Chain(src, dst);
+        current = plan.steps[i].to;
+      }
+      ASSERT_EQ(current, dst);
+    }
+}
+
+TEST(Planner, DirectStepsAreTaken) {
+  for (const Step& step : AllSteps()) {
+    if (AlphaKind(step.from) == kAlphaNone && Layout(step.from) == kLayout4444 && step.from != kRgb10Format) continue;
+    Plan plan;
+    ASSERT_EQ(MakePlan(step.from, step.to, 2, &plan), VX_Success);
+    const bool needsSimd =
+        step.to == F::BGRA_4444_8u && (step.from == F::VUYX_4444_8u || step.from == F::VUYX_4444_8u_709);
+    const bool hasSimd = ActiveKernelVariant() != KernelVariant::Plain;
+    EXPECT_EQ(plan.stepCount, needsSimd && !hasSimd ? 2 : 1) << Chain(step.from, step.to);
+  }
+}
+
+// What both ends keep is kept in between: depth, alpha, and straight colour where alpha is 0.
+TEST(Planner, NothingIsLostOnTheWay) {
+  const auto carriesAlpha = [](F f) { return AlphaKind(f) == kAlphaStraight || AlphaKind(f) == kAlphaPremultiplied; };
+  for (F src : RasterFormats())
+    for (F dst : RasterFormats()) {
+      Plan plan;
+      ASSERT_EQ(MakePlan(src, dst, 2, &plan), VX_Success);
+      for (int i = 0; i + 1 < plan.stepCount; ++i) {
+        const F through = plan.steps[i].to;
+        EXPECT_GE(DepthRank(through), std::min(DepthRank(src), DepthRank(dst))) << Chain(src, dst);
+        if (carriesAlpha(src) && carriesAlpha(dst)) {
+          EXPECT_TRUE(carriesAlpha(through)) << Chain(src, dst);
+        }
+        if (Layout(src) == kLayout4444 && Layout(dst) == kLayout4444) {
+          EXPECT_EQ(Layout(through), kLayout4444) << Chain(src, dst);
+        }
+        if (AlphaKind(src) == kAlphaStraight && AlphaKind(dst) == kAlphaStraight) {
+          EXPECT_EQ(AlphaKind(through), kAlphaStraight) << Chain(src, dst);
+        }
+      }
+    }
+}
+
+TEST(Planner, FixedAndTellingChains) {
+  EXPECT_EQ(Chain(F::BGRA_4444_8u, F::BGRA_4444_32f), "BGRA_4444_8u > BGRA_4444_32f");
+  EXPECT_EQ(Chain(F::BGRA_4444_8u, F::VUYA_4444_8u), "BGRA_4444_8u > VUYA_4444_8u");
+  EXPECT_EQ(Chain(F::XRGB_4444_8u, F::PRGB_4444_32f_Linear),
+            "XRGB_4444_8u > PRGB_4444_8u > BGRP_4444_8u > BGRP_4444_32f > BGRA_4444_32f > BGRA_4444_32f_Linear > "
+            "ARGB_4444_32f_Linear > PRGB_4444_32f_Linear");
+  EXPECT_EQ(Chain(F::VUYA_4444_8u, F::VUYX_4444_32f), "VUYA_4444_8u > VUYA_4444_32f > VUYP_4444_32f > VUYX_4444_32f");
+  EXPECT_EQ(Chain(F::BGRA_4444_8u, F::Invalid), "BGRA_4444_8u > BGRP_4444_8u > Invalid");
+  EXPECT_EQ(Chain(F::BGRA_4444_8u, F::UYVY_422_8u), "BGRA_4444_8u > BGRP_4444_8u > VUYP_4444_8u > UYVY_422_8u");
+  EXPECT_EQ(Chain(F::V210_422_10u, F::BGRA_4444_15u),
+            "V210_422_10u > UYVY_422_32f > VUYA_4444_32f > BGRA_4444_32f > BGRA_4444_15u");
+}
+
+TEST(Planner, ExplainsSpecialEnds) {
+  EXPECT_EQ(Chain(F::YUV_420_MPEG4_FRAME_709, F::VUYX_4444_8u_709), "YUV_420_MPEG4_FRAME_709 > VUYX_4444_8u_709");
+  EXPECT_EQ(Chain(F::YUV_420_MPEG2_FIELD_FullRange, F::BGRX_4444_15u),
+            "YUV_420_MPEG2_FIELD_FullRange > BGRX_4444_8u > BGRX_4444_15u");
+  EXPECT_EQ(Chain(F::VUYA_4444_8u, F::YUV_420_MPEG4_FRAME_FullRange),
+            "VUYA_4444_8u > BGRA_4444_8u > BGRP_4444_8u > BGRX_4444_8u > YUV_420_MPEG4_FRAME_FullRange");
+  EXPECT_EQ(Chain(F::V210_422_10u_709, F::YUV_420_MPEG2_FRAME_709), "V210_422_10u_709 > YUV_420_MPEG2_FRAME_709");
+  EXPECT_EQ(Chain(F::YUV_420_MPEG4_FRAME_FullRange, F::YUV_420_MPEG4_FRAME_FullRange),
+            "YUV_420_MPEG4_FRAME_FullRange > BGRX_4444_8u > YUV_420_MPEG4_FRAME_FullRange");
+  // Every chain fits: the 4:2:0 end and at most nine rasters would not.
+  for (F src : {F::YUV_420_MPEG4_FRAME, F::YUV_420_MPEG4_FRAME_709, F::YUV_420_MPEG2_FIELD_FullRange})
+    for (F dst : RasterFormats()) EXPECT_NE(Chain(src, dst), "none") << FormatName(src) << " to " << FormatName(dst);
+  F formats[9];
+  int32_t count = 0;
+  EXPECT_EQ(VX_ExplainConversion(F::PALDV25, F::BGRA_4444_8u, 2, formats, &count), VX_ErrUnsupportedFormat);
+  EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::PALDV25, 2, formats, &count), VX_ErrFormatNotHandled);
+  EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME, 2, formats, &count), VX_ErrFormatNotHandled);
+}
+
+TEST(Planner, RefusesSpecialAndUnknownFormats) {
+  Plan plan;
+  EXPECT_EQ(MakePlan(F::PALDV25, F::BGRA_4444_8u, 2, &plan), VX_ErrUnsupportedFormat);
+  EXPECT_EQ(MakePlan(F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, 2, &plan), VX_ErrUnsupportedDestinationFormat);
+  EXPECT_EQ(MakePlan(FromBits(0x105), F::BGRA_4444_8u, 2, &plan), VX_ErrFailed);
+  EXPECT_EQ(MakePlan(F::BGRA_4444_8u, FromBits(0x00FFFFFF), 2, &plan), VX_ErrFailed);
+}
+
+TEST(Planner, RenderQualityPicksTheChromaKernelOnly) {
+  Plan low, high;
+  ASSERT_EQ(MakePlan(F::UYVY_422_32f, F::VUYA_4444_32f, 1, &low), VX_Success);
+  ASSERT_EQ(MakePlan(F::UYVY_422_32f, F::VUYA_4444_32f, 2, &high), VX_Success);
+  EXPECT_EQ(low.steps[0].kernel, &kUyvy32fToVuyx32fNearest);
+  EXPECT_EQ(high.steps[0].kernel, &kUyvy32fToVuyx32f);
+}
 
 TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
   const struct {
@@ -70,7 +190,7 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
       {F::YUV_420_MPEG2_FRAME_709, F::YUV_420_MPEG2_FRAME_709, 64, 64, VX_ErrFormatNotHandled},
   };
   for (const auto& c : cases)
-    testing::ExpectRefusal("case " + std::to_string(&c - cases), c.expected, [&](void* memory) {
+    ExpectRefusal("case " + std::to_string(&c - cases), c.expected, [&](void* memory) {
       return VX_Convert(memory, 64, c.src, memory, -64, c.dst, c.width, c.height, 2);
     });
   uint8_t pixel[64] = {};
@@ -83,12 +203,12 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
 TEST(Convert, EveryPairStreamsTheSameBytes) {
   for (const F src : RasterFormats())
     for (const F dst : RasterFormats()) {
-      const testing::Image image(src, 2 * static_cast<int>(kStreamBlock) + 7, 2);
+      const Image image(src, 2 * static_cast<int>(kStreamBlock) + 7, 2);
       const auto inCache = image.Converted(dst, 2).bytes;
       if (src == dst) {
         ASSERT_EQ(inCache, image.bytes) << FormatName(src);
       }
-      const testing::SmallCache small;
+      const SmallCache small;
       ASSERT_EQ(image.Converted(dst, 2).bytes, inCache) << FormatName(src) << " to " << FormatName(dst);
     }
 }
@@ -97,7 +217,7 @@ TEST(Convert, EveryPairStreamsTheSameBytes) {
 TEST(Convert, RoundingModesGiveTheSameBytesInEveryVariant) {
   constexpr int kWidth = 259;
   std::vector<float> light(4 * kWidth);
-  testing::Random random(5);
+  Random random(5);
   for (float& v : light) v = random.Unit();
   const KernelVariant most = ActiveKernelVariant();
   for (const uint32_t mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
@@ -124,8 +244,8 @@ TEST(Convert, AChainGivesTheBytesOfItsSteps) {
       F formats[9];
       int32_t count = 0;
       ASSERT_EQ(VX_ExplainConversion(src, dst, 2, formats, &count), VX_Success);
-      testing::Image stepped(src, 781, 1, testing::Contents::Extremes, Bits(src) + 1);
-      const testing::Image chained = stepped.Converted(dst, 2);
+      Image stepped(src, 781, 1, Contents::Extremes, Bits(src) + 1);
+      const Image chained = stepped.Converted(dst, 2);
       for (int i = 1; i < count; ++i) stepped = stepped.Converted(formats[i], 2);
       ASSERT_EQ(stepped.bytes, chained.bytes) << FormatName(src) << " to " << FormatName(dst);
     }
@@ -172,7 +292,7 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
     int32_t width, height;
   };
   const Size sizes[] = {{1061, 5}, {1, 1}, {34, 6}};
-  std::vector<F> all = testing::Formats420();
+  std::vector<F> all = Formats420();
   const std::vector<F> rasters = RasterFormats();
   all.insert(all.end(), rasters.begin(), rasters.end());
   int turn = 0, reached = 0;
@@ -186,8 +306,8 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
       if (Is420(from) && HasWideSamples(from) && !IsBiplanar(from)) continue;
       const Size size = sizes[turn++ % 3];
       Picture src(from, size.width, size.height);
-      testing::Random random(static_cast<uint64_t>(turn));
-      testing::FillSamples(src.bytes.data(), src.bytes.size(), from, testing::Contents::Random, random);
+      Random random(static_cast<uint64_t>(turn));
+      FillSamples(src.bytes.data(), src.bytes.size(), from, Contents::Random, random);
       Picture turned = src.Turned(), dst(to, size.width, size.height), dstTurned = dst.Turned();
       ASSERT_EQ(Convert(src, dst, quality), VX_Success) << FormatName(from) << " to " << FormatName(to);
       ASSERT_EQ(Convert(turned, dstTurned, quality), VX_Success);
@@ -200,8 +320,8 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
       ASSERT_EQ(stepped.bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to) << " " << size.width;
       ASSERT_EQ(dstTurned.Turned().bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to);
       // Past the cache straight or staged, by how rows lie in its lines.
-      const testing::SmallCache small;
-      testing::LineBytes memory(dst.bytes.size() + 16);
+      const SmallCache small;
+      LineBytes memory(dst.bytes.size() + 16);
       uint8_t* const past = memory.data() + turn % 2 * 16;
       ASSERT_EQ(
           VX_Convert(src.Base(), src.RowBytes(), from, past, dst.RowBytes(), to, size.width, size.height, quality),
@@ -212,5 +332,116 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
   EXPECT_GT(reached, 2000);
 }
 
+// ---- Every direct kernel and every pair of raster formats in the armed arena
+
+ArenaCase ConvertCase(F src, F dst, int32_t quality) {
+  ArenaCase arenaCase;
+  arenaCase.name = "VX_Convert at quality " + std::to_string(quality);
+  arenaCase.sources = {src};
+  arenaCase.destination = dst;
+  arenaCase.run = [=](const ArenaFrame* from, const ArenaFrame& to) { return Convert(*from, to, quality); };
+  return arenaCase;
+}
+
+// Between steps, unnamed Y'CbCr rasters without alpha are packed 4:2:2 pairs.
+F StoredAs(F format) {
+  if (!IsYuv(format) || Layout(format) != kLayout4444 || AlphaKind(format) != kAlphaNone) return format;
+  return FromBits(Bits(format) | kLayout422);
+}
+
+// Rows around the runs that stay in the cache too, and none at all.
+void ExpectStaysInItsRows(const std::string& name, const RowKernelSet& kernel, F src, F dst) {
+  auto* const unreadable = static_cast<uint8_t*>(UnreadableMemory());
+  kernel[ActiveKernelVariant()](unreadable, unreadable, 0);
+  ArenaCase arenaCase;
+  arenaCase.name = name;
+  arenaCase.sources = {src};
+  arenaCase.destination = dst;
+  arenaCase.everyContents = true;
+  for (const int width : {131, 132, 133, 191, 192, 193, 197, 198, 255, 256, 257, 258, 383, 384, 389, 640, 720})
+    arenaCase.widths.push_back(width);
+  arenaCase.run = RunRows(kernel);
+  EXPECT_TRUE(RunArena(arenaCase));
+}
+
+TEST(ConvertArena, EveryDirectKernel) {
+  for (const Step& step : AllSteps())
+    ExpectStaysInItsRows(std::string("direct ") + FormatName(step.from) + " to " + FormatName(step.to), *step.kernel,
+                         StoredAs(step.from), StoredAs(step.to));
+  ExpectStaysInItsRows("nearest chroma", kUyvy32fToVuyx32fNearest, F::UYVY_422_32f, F::VUYX_4444_32f);
+  const struct {
+    const RowKernelSet& kernel;
+    F format;
+  } copies[] = {{kCopy4, F::BGRA_4444_8u},     {kCopy8, F::BGRA_4444_15u},      {kCopy16, F::BGRA_4444_32f},
+                {kCopy422_8u, F::UYVY_422_8u}, {kCopy422_32f, F::UYVY_422_32f}, {kCopyV210, F::V210_422_10u}};
+  for (const auto& copy : copies) ExpectStaysInItsRows("copy", copy.kernel, copy.format, copy.format);
+}
+
+// Longer rows than the blocks in which chains run, and what lies around the widths of vectors.
+TEST(ConvertArena, EveryPair) {
+  int32_t quality = 0;
+  for (const F src : RasterFormats())
+    for (const F dst : RasterFormats()) {
+      ArenaCase arenaCase = ConvertCase(src, dst, quality++ % 6);
+      arenaCase.widths = {1,  2,  3,  4,  5,  6,  7,  8,  9,  10, 11, 12, 13,  14,  15,  16,  17,  18,
+                          19, 23, 24, 25, 31, 32, 33, 47, 48, 63, 64, 65, 127, 128, 129, 383, 385, 773};
+      arenaCase.seed = static_cast<uint64_t>(quality);
+      EXPECT_TRUE(RunArena(arenaCase));
+    }
+}
+
+TEST(ConvertArena, Planar420) {
+  const std::vector<F> pictures = Formats420();
+  ASSERT_EQ(pictures.size(), 38u);
+  for (const F picture : pictures)
+    for (const F raster : {F::BGRA_4444_8u, F::BGRX_4444_8u, F::VUYX_4444_8u_709, F::UYVY_422_8u, F::PRGB_4444_32f}) {
+      ArenaCase decode = ConvertCase(picture, raster, 3), encode = ConvertCase(raster, picture, 3);
+      decode.widths = {1, 2, 3, 4, 7, 15, 16, 17, 30, 33, 62, 64, 65, 66, 127, 128, 129, 130, 131};
+      decode.heights = encode.heights = {1, 2, 3, 4, 5, 6, 7, 8, 33, 34};
+      if (IsBiplanar(picture) || (IsVideoRange(picture) && Colorimetry(picture) != kColorimetry709))
+        encode.expected = VX_ErrFormatNotHandled;
+      EXPECT_TRUE(RunArena(decode));
+      EXPECT_TRUE(RunArena(encode));
+    }
+}
+
+TEST(ConvertArena, InvalidIsEightBitWithoutAlpha) {
+  int reached = 0;
+  for (const F format : RasterFormats()) {
+    ArenaCase from = ConvertCase(F::Invalid, format, 3), to = ConvertCase(format, F::Invalid, 3);
+    from.widths = to.widths = {1, 2, 7, 33, 130, 500};
+    const bool reaches = Depth(format) == kDepth8u && (IsYuv(format) || !IsReversed(format));
+    if (!reaches) from.expected = VX_ErrFailed;
+    reached += reaches;
+    EXPECT_TRUE(RunArena(from));
+    EXPECT_TRUE(RunArena(to));
+  }
+  EXPECT_EQ(reached, 13);
+  ArenaCase neither = ConvertCase(F::Invalid, F::Invalid, 3);
+  neither.expected = VX_ErrFailed;
+  EXPECT_TRUE(RunArena(neither));
+}
+
+// Rows whose chain does not fit on the stack.
+TEST(ConvertArena, FailingAllocations) {
+  constexpr int32_t kWidth = 48000;
+  std::vector<uint8_t> in(4 * kWidth * 16), out(4 * kWidth * 16);  // room for pictures of 32 rows
+  const struct {
+    F src, dst;
+  } cases[] = {{F::YUV_420_MPEG4_FRAME_709, F::BGRA_4444_32f},
+               {F::BGRA_4444_8u, F::YUV_420_MPEG4_FIELD_FullRange},
+               {F::YUV_420_MPEG4_FIELD_FullRange, F::YUV_420_MPEG4_FRAME_709},
+               {F::BGRA_4444_8u, F::VUYA_4444_8u},
+               {F::UYVY_422_32f, F::BGRA_4444_32f},
+               {F::XRGB_4444_8u, F::PRGB_4444_32f_Linear},
+               {F::V210_422_10u, F::PRGB_4444_15u}};
+  for (const auto& c : cases)
+    EXPECT_GT(
+        ExpectSurvivesFailingAllocations(
+            FormatName(c.src) + " to " + FormatName(c.dst),
+            [&] { return VX_Convert(in.data(), kWidth * 16, c.src, out.data(), kWidth * 16, c.dst, kWidth, 2, 3); }),
+        Is420(c.src) || Is420(c.dst) ? 0 : -1);
+}
+
 }  // namespace
-}  // namespace vexel
+}  // namespace vexel::testing

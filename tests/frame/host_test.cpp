@@ -164,7 +164,7 @@ TEST(Recycler, MayBeReplaced) {
   EXPECT_TRUE(vexel_host::SetAllocator(nullptr));
 }
 
-// Where blocks are placed: pixel_buffer_test.cpp.
+// Where blocks are placed: PixelBuffers.
 TEST(TransientMemory, RefusesOverflow) {
   for (const size_t bytes : {size_t{0}, SIZE_MAX, SIZE_MAX - 14, SIZE_MAX - 8080}) {
     size_t rawSize = 1;

@@ -9,7 +9,7 @@
 #include "support/Arena.h"
 #include "support/Operations.h"
 #include "support/PaddedRows.h"
-#include "support/SmallCache.h"
+#include "support/Processor.h"
 
 namespace vexel::testing {
 namespace {

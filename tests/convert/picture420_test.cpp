@@ -1,17 +1,20 @@
-// 4:2:0 decoding against its definition, over formats, sizes, fields and qualities.
-#include "convert/Decode420.h"
-
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
+// 4:2:0 pictures: layouts, copies and plans; decoding and encoding against their definitions.
 #include <climits>
+#include <cmath>
 #include <cstring>
 #include <string>
 #include <vector>
 
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "convert/Decode420.h"
+#include "convert/Planar420.h"
+#include "frame/Features.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/PaddedRows.h"
+#include "support/Random.h"
 #include "support/Reference420.h"
 #include "vexel/host_types.h"
 #include "vexel_host/host.h"
@@ -20,11 +23,206 @@ namespace vexel::testing {
 namespace {
 
 using F = VX_PixelFormat;
+
+struct LayoutCase {
+  F format;
+  int width, height;
+  ptrdiff_t chroma, second;  // offsets of the chroma planes, -1 for none
+  int32_t rowBytes[3];
+};
+
+TEST(Planar420, Layouts) {
+  const F biplanar = FromBits(0x0E000A31), biplanar10 = FromBits(0x0D000A71);
+  const LayoutCase cases[] = {
+      {F::YUV_420_MPEG2_FRAME, 720, 480, 368640, 368640 + 92160, {768, 384, 384}},
+      {F::YUV_420_MPEG4_FIELD_FullRange_709, 1920, 1080, 1920 * 1088, 1920 * 1088 + 544 * 1024, {1920, 1024, 1024}},
+      {F::YUV_420_MPEG2_FRAME, 257, 1, 384 * 32, 384 * 32 + 128 * 16, {384, 128, 128}},
+      {F::YUV_420_MPEG2_FRAME, 1, 33, 128 * 64, 128 * 64, {128, 0, 0}},
+      {biplanar, 1920, 1080, 1920 * 1080, -1, {1920, 1920, 1024}},
+      {biplanar, 129, 3, 256 * 3, -1, {256, 256, 128}},
+      {biplanar10, 1920, 1080, 3840 * 1080, -1, {3840, 3840, 3840}},
+      {biplanar10, 65, 3, 256 * 3, -1, {256, 256, 256}},
+  };
+  std::vector<uint8_t> memory(16);
+  for (const LayoutCase& c : cases) {
+    void* planes[3];
+    int32_t rowBytes[3];
+    ASSERT_EQ(VX_Success, VX_GetPlanarBuffers(memory.data(), c.format, c.width, c.height, planes, rowBytes));
+    const auto* base = memory.data();
+    EXPECT_EQ(planes[0], base);
+    EXPECT_EQ(planes[1], base + c.chroma);
+    EXPECT_EQ(planes[2], c.second < 0 ? nullptr : base + c.second) << c.width;
+    for (int i = 0; i < 3; ++i) EXPECT_EQ(rowBytes[i], c.rowBytes[i]) << c.width << " plane " << i;
+    if (IsBiplanar(c.format) && Depth(c.format) == kDepth8u) {
+      ASSERT_EQ(VX_Success, VX_GetBiPlanarBuffers(memory.data(), F::Invalid, c.width, c.height, planes, rowBytes));
+      EXPECT_EQ(planes[0], base);
+      EXPECT_EQ(planes[1], base + c.chroma);
+      EXPECT_EQ(rowBytes[0], c.rowBytes[0]);
+      EXPECT_EQ(rowBytes[1], c.rowBytes[1]);
+    }
+  }
+}
+
+// Everything that a layout addresses lies inside the block of VX_PixelFormatSize, whatever the size.
+TEST(Planar420, PlanesLieInTheBlock) {
+  for (const F format : Formats420())
+    for (const int width : {1, 2, 3, 63, 64, 65, 127, 128, 129, 255, 256, 257, 1919})
+      for (const int height : {1, 2, 3, 31, 32, 33, 1079}) {
+        const int64_t size = VX_PixelFormatSize(format, width, height);
+        const Picture420 picture = PictureFromBlock(nullptr, format, width, height);
+        const int64_t bytes = HasWideSamples(format) ? 2 : 1, channels = IsBiplanar(format) ? 2 : 1;
+        for (int i = 0; i < (IsBiplanar(format) ? 2 : 3); ++i) {
+          const int64_t rows = i == 0 ? height : ChromaHeight(picture);
+          const int64_t used = i == 0 ? width * bytes : ChromaWidth(picture) * bytes * channels;
+          const auto offset = reinterpret_cast<intptr_t>(picture.planes[i]);
+          EXPECT_LE(offset + (rows - 1) * picture.rowBytes[i] + used, size) << std::hex << Bits(format) << width;
+        }
+      }
+}
+
+TEST(Planar420, CopiesPlanes) {
+  for (const bool tight : {false, true})
+    for (const int width : {1, 2, 7, 16, 33})
+      for (const int height : {1, 2, 5, 8}) {
+        const int chroma = width / 2, gap = tight ? 0 : 5;
+        // Three planes each way, with the gaps and the ends filled differently.
+        std::vector<uint8_t> src(3 * 64 * 16), dst(src.size(), 0xEE), expected(dst);
+        Random(static_cast<uint64_t>(width)).Fill(src.data(), src.size());
+        const int32_t srcRowBytes[3] = {width + gap, chroma + gap, chroma + gap};
+        const int32_t dstRowBytes[3] = {width + 2 * gap, chroma + 2 * gap, chroma + 2 * gap};
+        const int32_t srcPairs[2] = {width + gap, width + gap}, dstPairs[2] = {width + 2 * gap, width + 2 * gap};
+        const void* from[3];
+        void* to[3];
+        for (int i = 0; i < 3; ++i) from[i] = &src[i * 1024], to[i] = &dst[i * 1024];
+        const auto copy = [&](int plane, int rows, int bytes, int fromStep, int toStep) {
+          for (int row = 0; row < rows; ++row)
+            std::memcpy(&expected[plane * 1024 + row * toStep], &src[plane * 1024 + row * fromStep], bytes);
+        };
+        const int odd = width * height / 4 - height / 2 * chroma;  // copied on, where rows have no gaps
+        copy(0, height, width, srcRowBytes[0], dstRowBytes[0]);
+        for (int i = 1; i < 3; ++i) {
+          copy(i, height / 2, chroma, srcRowBytes[i], dstRowBytes[i]);
+          if (tight) copy(i, 1, height / 2 * chroma + odd, 0, 0);
+        }
+        EXPECT_EQ(VX_Success, VX_CopyPlanar_8u(from, srcRowBytes, to, dstRowBytes, width, height));
+        EXPECT_EQ(dst, expected) << width << " x " << height << " tight " << tight;
+
+        std::fill(dst.begin(), dst.end(), 0xEE);
+        std::fill(expected.begin(), expected.end(), 0xEE);
+        copy(0, height, width, srcPairs[0], dstPairs[0]);
+        copy(1, height / 2, width, srcPairs[1], dstPairs[1]);
+        if (tight) copy(1, 1, width * height / 2, 0, 0);
+        EXPECT_EQ(VX_Success, VX_CopyBiPlanar_8u(from, srcPairs, to, dstPairs, width, height));
+        EXPECT_EQ(dst, expected) << width << " x " << height << " tight " << tight;
+      }
+  for (const int bad : {0, -1, INT_MIN}) {
+    const int32_t rowBytes[3] = {bad, bad, bad};
+    const void* const none[3] = {};
+    void* const nowhere[3] = {};
+    EXPECT_EQ(VX_Success, VX_CopyPlanar_8u(none, rowBytes, nowhere, rowBytes, bad, 1));
+    EXPECT_EQ(VX_Success, VX_CopyBiPlanar_8u(none, rowBytes, nowhere, rowBytes, bad, 1));
+  }
+}
+
+TEST(Planar420, CopiesFields) {
+  for (const F format : Formats420())
+    for (const int field : {0, 1, 2}) {
+      Block420 src(format, 39, 11), dst(format, 39, 5);
+      src.Randomize(1);
+      CopyField420(src.bytes.data(), format, 39, 11, field, dst.bytes.data());
+      for (int row = 0; row < 5; ++row)
+        for (int x = 0; x < 39; ++x)
+          ASSERT_EQ(dst.Code(0, x, row), src.Code(0, x, 2 * row + (field == 2))) << std::hex << Bits(format);
+      for (int plane = 1; plane < 3; ++plane)
+        for (int row = 0; row < 2; ++row)
+          for (int x = 0; x < 19; ++x) ASSERT_EQ(dst.Code(plane, x, row), src.Code(plane, x, 2 * row));
+    }
+}
+
+struct PlanCase {
+  int width, height, dstWidth, dstHeight, quality;
+  int plannedWidth, plannedHeight;
+  bool needsSse2 = false;
+};
+
+TEST(Plan420, Sizes) {
+  const PlanCase cases[] = {
+      {1440, 1080, 1920, 1080, 0, 1920, 1080, true},  // 4/3
+      {1440, 1080, 1920, 540, 5, 1920, 540, true},
+      {1440, 1080, 1920, 541, 0, 1440, 1080},
+      {1056, 576, 1408, 576, 0, 1408, 576, true},
+      {1280, 1080, 1920, 1080, 0, 1920, 1080, true},  // 3/2
+      {1280, 720, 1920, 360, 4, 1920, 360, true},
+      {1288, 720, 1932, 720, 0, 1288, 720},   // not a multiple of 16
+      {1488, 720, 1984, 720, 0, 1488, 720},   // 4/3, but no multiple of 96
+      {1920, 1080, 1920, 540, 5, 1920, 540},  // a field
+      {1920, 1081, 1920, 540, 0, 1920, 540},
+      {1920, 1080, 1280, 720, 0, 1920, 1080},
+      {1920, 1080, 480, 541, 0, 1920, 1080},
+      {1920, 1080, 480, 270, 0, 480, 270},  // reductions
+      {1920, 1080, 480, 270, 2, 480, 270},
+      {1920, 1080, 480, 270, 3, 1920, 1080},
+      {1920, 1080, 640, 360, 0, 960, 540},  // the height ratio is odd
+      {1920, 1080, 640, 180, 0, 960, 540},  // the width ratio is 3
+      {1920, 1080, 240, 108, 0, 240, 108},
+      {1920, 1080, 120, 90, 0, 960, 540},
+      {1920, 1080, 1920, 270, 0, 1920, 270},
+      {1920, 1080, 1000, 270, 0, 1920, 540},
+      {1919, 1080, 480, 270, 0, 1919, 1080},
+      {960, 540, 480, 270, 0, 480, 270},
+      {960, 541, 480, 270, 0, 480, 270},  // half of both by the general rule
+      {INT_MAX, INT_MAX, INT_MAX, INT_MAX, 0, INT_MAX, INT_MAX},
+      {INT_MAX - 15, 16, INT_MAX, 16, 0, INT_MAX - 15, 16},
+      {1920, 1080, 0, 0, 0, 960, 540},  // nothing divides by zero
+      {1920, 1080, 1920, 0, 0, 1920, 540},
+      {1920, 0, 1920, 0, 0, 1920, 0},
+      {0, 0, 0, 0, 0, 0, 0},
+      {1, 1, 1, 1, 0, 1, 1},
+      {1, 1, 1, 0, 0, 1, 0},
+  };
+  for (const bool hasSse2 : {true, false}) {
+    VX_SetDebugFlag(3, hasSse2);
+    for (const PlanCase& c : cases) {
+      const DecodePlan plan =
+          PlanDecode420(F::YUV_420_MPEG2_FRAME, c.width, c.height, F::BGRA_4444_8u, c.dstWidth, c.dstHeight, c.quality);
+      const bool full = c.needsSse2 && !hasSse2;
+      const int height = full && 2 * c.dstHeight <= c.height && c.quality < 3 ? c.height / 2 : c.height;
+      EXPECT_EQ(plan.width, full ? c.width : c.plannedWidth) << c.width << " to " << c.dstWidth;
+      EXPECT_EQ(plan.height, full ? height : c.plannedHeight) << c.height << " to " << c.dstHeight;
+    }
+  }
+  VX_SetDebugFlag(3, 1);
+}
+
+TEST(Plan420, Formats) {
+  const F rgb = F::BGRX_4444_8u, yuv = F::VUYX_4444_8u, yuv709 = F::VUYX_4444_8u_709;
+  const struct {
+    F src, dst, planned;
+  } cases[] = {
+      {F::YUV_420_MPEG2_FRAME_FullRange, F::UYVY_422_8u, rgb},
+      {F::YUV_420_MPEG4_FIELD_FullRange_709, F::BGRA_4444_32f, rgb},
+      {FromBits(0x0E001231), F::VUYA_4444_8u_709, rgb},  // full range, biplanar
+      {F::YUV_420_MPEG2_FRAME, F::BGRA_4444_8u, yuv},
+      {F::YUV_420_MPEG2_FRAME_709, F::BGRA_4444_8u, yuv709},
+      {F::YUV_420_MPEG2_FRAME_709, F::UYVY_422_8u, yuv},  // the destination decides
+      {F::YUV_420_MPEG2_FRAME, F::UYVY_422_8u_709, yuv709},
+      {F::YUV_420_MPEG2_FRAME, F::V210_422_10u_709, yuv},  // not 8 bits: the source decides
+      {F::YUV_420_MPEG2_FRAME_709, F::VUYA_4444_32f, yuv709},
+      {FromBits(0x0E000C71), F::BGRA_4444_15u, yuv709},
+      {FromBits(0x0E000E71), F::UYVY_422_8u, yuv},
+  };
+  for (const auto& c : cases)
+    EXPECT_EQ(PlanDecode420(c.src, 16, 16, c.dst, 16, 16, 0).format, c.planned)
+        << VX_PixelFormatName(c.src) << " to " << VX_PixelFormatName(c.dst);
+}
+
+// ---- 4:2:0 decoding against its definition, over formats, sizes, fields and qualities
+
 using zovmediatypes::FieldType;
 using zovmediatypes::RenderQuality;
 
 // Half a code of rounding, and what the fixed-point sums may stray.
-constexpr double kTolerance = 0.5 + 0.07;
+constexpr double kDecodeTolerance = 0.5 + 0.07;
 
 struct Sizes {
   int width, height, dstWidth, dstHeight;
@@ -113,7 +311,8 @@ void ExpectDecodes(const Block420& src, const Sizes& s, F format, int field, int
       const uint8_t* pixel = &dst[4 * (static_cast<size_t>(row) * s.dstWidth + x)];
       ASSERT_EQ(pixel[3], 255);
       for (int k = 0; k < 3; ++k)
-        ASSERT_NEAR(pixel[k], std::clamp(codes[k], 0.0, 255.0), kTolerance) << "x " << x << " row " << row << " " << k;
+        ASSERT_NEAR(pixel[k], std::clamp(codes[k], 0.0, 255.0), kDecodeTolerance)
+            << "x " << x << " row " << row << " " << k;
     }
 }
 
@@ -166,7 +365,7 @@ TEST(Decode420, MatricesOverAllCodes) {
               ASSERT_TRUE(IsVideoRange(src) == all || pixels[4 * y + 2] == y) << "of one range the code itself, " << y;
             }
         }
-      EXPECT_LT(worst, kTolerance) << std::hex << Bits(src) << " to " << Bits(dst);
+      EXPECT_LT(worst, kDecodeTolerance) << std::hex << Bits(src) << " to " << Bits(dst);
     }
 }
 
@@ -352,6 +551,120 @@ TEST(Decode420, TracesFullSizeDecodes) {
   DecodePlanes(deep, dst.data(), 32, 8, 8, F::BGRA_4444_8u, 0, 2);
   EXPECT_THAT(lines, ::testing::HasSubstr(": TODO for BiPlanar 10u\n"));
   vexel_host::SetTraceSink({});
+}
+
+// ---- 4:2:0 encoding against its definition
+
+constexpr double kEncodeTolerance = 0.5 + 0.03;
+
+std::vector<F> Destinations() {
+  std::vector<F> formats;
+  for (const F format : Formats420())
+    if (!IsBiplanar(format) && (!IsVideoRange(format) || Colorimetry(format) == kColorimetry709))
+      formats.push_back(format);
+  return formats;
+}
+
+F InputOf(F dst) { return IsVideoRange(dst) ? F::VUYX_4444_8u_709 : F::BGRX_4444_8u; }
+
+// A raster of four 8-bit channels without padding, bottom line first.
+struct Raster {
+  int width, height;
+  std::vector<uint8_t> bytes;
+  Raster(int w, int h) : width(w), height(h), bytes(static_cast<size_t>(w) * h * 4) {}
+  uint8_t* Pixel(int x, int line) { return &bytes[(static_cast<size_t>(height - 1 - line) * width + x) * 4]; }
+};
+
+// Codes of the destination for a pixel.
+Ycc YccOf(const uint8_t* pixel, F dst) {
+  if (IsVideoRange(dst)) return {double(pixel[2]), double(pixel[1]), double(pixel[0])};
+  return FromBgr({double(pixel[0]), double(pixel[1]), double(pixel[2])}, dst);
+}
+
+// The chroma at column 2 i of a line: the tent over the columns beside it.
+double ChromaAcross(Raster& src, int i, int line, int plane, F dst) {
+  const auto at = [&](int x) { return YccOf(src.Pixel(std::clamp(x, 0, src.width - 1), line), dst)[plane]; };
+  return (at(2 * i - 1) + 2 * at(2 * i) + at(2 * i + 1)) / 4;
+}
+
+// A chroma row is where its position falls between the two lines that it covers, of the picture or of its field.
+double ChromaOf(Raster& src, int i, int row, int plane, F dst) {
+  const bool fields = FrameKind(dst) % 2 == 1;
+  const double position = 2 * row + 0.5;  // in lines of the picture, in field pictures too
+  const int first = fields ? row / 2 * 4 + row % 2 : 2 * row, spacing = fields ? 2 : 1;
+  const int second = first + spacing < src.height ? first + spacing : first;
+  const double t = (position - first) / spacing;
+  return (1 - t) * ChromaAcross(src, i, first, plane, dst) + t * ChromaAcross(src, i, second, plane, dst);
+}
+
+TEST(Encode420, EveryFormatAndOddSizes) {
+  const int sizes[][2] = {{1, 1}, {2, 2}, {3, 3}, {5, 6}, {8, 4}, {17, 5}, {33, 10}, {64, 2}, {131, 7}, {257, 3}};
+  Random random;
+  for (const F format : Destinations())
+    for (const auto& [width, height] : sizes) {
+      Raster src(width, height);
+      random.Fill(src.bytes.data(), src.bytes.size());
+      Block420 dst(format, width, height);
+      ASSERT_EQ(VX_Success,
+                Encode420(src.bytes.data(), 4 * width, InputOf(format), dst.bytes.data(), format, width, height));
+      SCOPED_TRACE(::testing::Message() << VX_PixelFormatName(format) << " " << width << "x" << height);
+      for (int line = 0; line < height; ++line)
+        for (int x = 0; x < width; ++x)
+          ASSERT_NEAR(dst.Code(0, x, line), YccOf(src.Pixel(x, line), format)[0], kEncodeTolerance);
+      const int columns = std::min((width + 1) / 2, dst.rowBytes[1]);
+      for (int plane = 1; plane < 3; ++plane)
+        for (int row = 0; row < (height + 1) / 2; ++row)
+          for (int i = 0; i < columns; ++i)
+            ASSERT_NEAR(dst.Code(plane, i, row), std::min(ChromaOf(src, i, row, plane, format), 255.0),
+                        kEncodeTolerance)
+                << "plane " << plane << " row " << row << " column " << i;
+    }
+}
+
+// The whole RGB cube in steps: luma and chroma of flat pictures, and grey without chroma.
+TEST(Encode420, Colours) {
+  for (const F format : {F::YUV_420_MPEG2_FRAME_FullRange, F::YUV_420_MPEG4_FIELD_FullRange_709}) {
+    Block420 dst(format, 2, 2);
+    Raster src(2, 2);
+    for (int b = 0; b < 256; b += 5)
+      for (int g = 0; g < 256; g += 5)
+        for (int r = 0; r < 256; r += 5) {
+          for (int i = 0; i < 4; ++i) {
+            const uint8_t pixel[4] = {static_cast<uint8_t>(b), static_cast<uint8_t>(g), static_cast<uint8_t>(r), 9};
+            std::memcpy(&src.bytes[4 * i], pixel, 4);
+          }
+          ASSERT_EQ(VX_Success, Encode420(src.bytes.data(), 8, F::BGRX_4444_8u, dst.bytes.data(), format, 2, 2));
+          const Ycc exact = FromBgr({double(b), double(g), double(r)}, format);
+          for (int plane = 0; plane < 3; ++plane)
+            ASSERT_NEAR(dst.Code(plane, 0, 0), std::min(exact[plane], 255.0), kEncodeTolerance)
+                << b << " " << g << " " << r;
+          const bool isGrey = b == g && g == r;
+          ASSERT_TRUE(!isGrey || (dst.Code(0, 1, 1) == g && dst.Code(1, 0, 0) == 128 && dst.Code(2, 0, 0) == 128)) << g;
+        }
+  }
+}
+
+TEST(Encode420, Refuses) {
+  const struct {
+    F src, dst;
+    int width, height;
+    VX_Result expected;
+  } cases[] = {
+      {F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, 16, 16, VX_ErrFormatNotHandled},  // video range, BT.601
+      {F::BGRX_4444_8u, FromBits(0x0E000A31), 16, 16, VX_ErrFormatNotHandled},
+      {F::BGRX_4444_8u, FromBits(0x0A000A71), 16, 16, VX_ErrFormatNotHandled},
+      {F::BGRX_4444_8u, F::BGRX_4444_8u, 16, 16, VX_ErrFormatNotHandled},
+      {F::YUV_420_MPEG2_FRAME_709, F::YUV_420_MPEG4_FRAME_709, 16, 16, VX_ErrFormatNotHandled},
+      {F::BGRX_4444_8u, F::YUV_420_MPEG2_FRAME_709, 16, 0, VX_Success},
+      {F::BGRX_4444_8u, F::YUV_420_MPEG2_FRAME_709, -1, 16, VX_Success},
+  };
+  for (const auto& c : cases)
+    ExpectRefusal(VX_PixelFormatName(c.dst), c.expected,
+                  [&](void* memory) { return Encode420(memory, 64, c.src, memory, c.dst, c.width, c.height); });
+  uint8_t memory[16] = {};
+  const F dst = F::YUV_420_MPEG2_FRAME_709;
+  EXPECT_EQ(VX_ErrNullSource, Encode420(nullptr, 4, F::BGRX_4444_8u, memory, dst, 1, 1));
+  EXPECT_EQ(VX_ErrNullDestination, Encode420(memory, 4, F::BGRX_4444_8u, nullptr, dst, 1, 1));
 }
 
 }  // namespace
