@@ -6,7 +6,7 @@
 
 #include "convert/PairOrder.h"
 #include "convert/PlainPixels.h"
-#include "convert/Vnni.h"
+#include "convert/Subsample512.h"
 #include "convert/YuvFixed8.h"
 #include "convert/YuvKernels.h"
 
@@ -51,9 +51,9 @@ struct FromVuyx {
   }
 };
 
-template <bool kPremultiply, bool kVnni>
+template <bool kPremultiply>
 struct FromBgra {
-  using Matrix = VectorRgbToYuv8<kVnni>;
+  using Matrix = VectorRgbToYuv8<false>;
   using Pixels = typename Matrix::Pixels;
 
   struct Stage {
@@ -145,10 +145,9 @@ HWY_ATTR void Vuyx8ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) { Sub
 
 template <bool kPremultiply>
 HWY_ATTR void BgraToUyvy(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& m) {
-  if (HWY_TARGET == HWY_AVX3 && HasVnni())
-    Subsample(src, dst, count, FromBgra<kPremultiply, true>{VectorRgbToYuv8<true>(m)});
-  else
-    Subsample(src, dst, count, FromBgra<kPremultiply, false>{VectorRgbToYuv8<false>(m)});
+  if (HWY_TARGET == HWY_AVX3 && HasSubsample512())
+    return kPremultiply ? Bgra8ToUyvy512(src, dst, count, m) : Bgrx8ToUyvy512(src, dst, count, m);
+  Subsample(src, dst, count, FromBgra<kPremultiply>{VectorRgbToYuv8<false>(m)});
 }
 HWY_ATTR void Bgra8ToUyvy8_601(const uint8_t* src, uint8_t* dst, size_t count) {
   BgraToUyvy<true>(src, dst, count, kRgbToYuv8_601);

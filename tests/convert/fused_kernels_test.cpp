@@ -102,14 +102,17 @@ TEST(FusedKernels, EqualTheirSteps) {
       {kYuyv32fTo8, {&kSwap422_32f, &kUyvy32fTo8, &kSwap422_8u}, kPairs32, kPairs8},
   };
   for (const auto& kernel : kernels)
-    for (size_t count = 1; count <= 262; count += count < 72 ? 1 : 19) {
+    for (size_t count = 1; count <= 1100; count += count < 72 ? 1 : count < 262 ? 19 : 73) {
       Random random(count);
       const auto rowBytes = [count](F f) {
         return static_cast<size_t>(UnpaddedRowBytes(f, static_cast<int64_t>(count)));
       };
       std::vector<uint8_t> source(rowBytes(kernel.from)), steps = source;
       FillSamples(source.data(), source.size(), kernel.from, static_cast<Contents>(count % kContentsCount), random);
-      if (kernel.from == k8) source[count / 2 * 4 + 3] = 77;  // one pixel that is not opaque
+      if (kernel.from == k8) {  // one pixel that is not opaque
+        for (size_t i = 0; count % 3 == 0 && i < count; ++i) source[4 * i + 3] = 255;
+        source[count / 2 * 4 + 3] = 77;
+      }
       const auto fused = RunKernel<uint8_t>(kernel.fused, source, count, rowBytes(kernel.to));
       steps = source;
       for (const RowKernelSet* step : kernel.steps) steps = RunKernel<uint8_t>(*step, steps, count, 16 * count + 16);
