@@ -16,10 +16,6 @@ namespace {
 
 // Columns per panel: their destination rows, each in a page of its own, stay within reach of the TLB.
 constexpr int32_t kPanelColumns = 2048;
-// Source rows that are read side by side, and the bytes of a destination row that they fill at least. Lines that are
-// written far apart are slow even past the cache, most of all a multiple of 4,096 bytes apart; four in a row are not.
-constexpr int32_t kBlockRows = 64;
-constexpr int32_t kRunBytes = 256;
 constexpr int32_t kPlainTile = 16;
 constexpr int64_t kStreamFrom = 1 << 20;
 
@@ -44,9 +40,18 @@ void TransposeSmall(const Job& job, int32_t x0, int32_t x1, int32_t y0, int32_t 
 
 using SmallFunction = void (*)(const Job&, int32_t, int32_t, int32_t, int32_t);
 
+// Powers of two go by vector tiles.
+template <int kSize>
+constexpr SmallFunction Small() {
+  if constexpr (std::has_single_bit(static_cast<unsigned>(kSize)))
+    return nullptr;
+  else
+    return &TransposeSmall<kSize>;
+}
+
 template <int... kSizes>
 constexpr auto SmallTable(std::integer_sequence<int, kSizes...>) {
-  return std::array<SmallFunction, sizeof...(kSizes)>{&TransposeSmall<kSizes + 1>...};
+  return std::array<SmallFunction, sizeof...(kSizes)>{Small<kSizes + 1>()...};
 }
 constexpr auto kSmall = SmallTable(std::make_integer_sequence<int, 16>{});
 
@@ -73,7 +78,7 @@ void TransposeEdge(const Job& job, int elementSize, TransposeTile transpose, int
   uint8_t* to = job.dst + x * job.dstRowBytes + static_cast<ptrdiff_t>(y) * elementSize;
   for (int32_t i = 0; i < rows; ++i)
     std::memcpy(in + i * kTileBytes, from + i * job.srcRowBytes, static_cast<size_t>(columns) * elementSize);
-  transpose(in, kTileBytes, out, kTileBytes, 1);
+  transpose(in, kTileBytes, out, kTileBytes, 1, 1);
   for (int32_t i = 0; i < columns; ++i)
     std::memcpy(to + i * job.dstRowBytes, out + i * kTileBytes, static_cast<size_t>(rows) * elementSize);
 }
@@ -88,7 +93,7 @@ void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
   const auto misalignment = static_cast<int32_t>(reinterpret_cast<uintptr_t>(job.dst) % kTileBytes);
   const int32_t top = stream && misalignment ? std::min((kTileBytes - misalignment) >> sizeLog, job.height) : 0;
   const int32_t bottom = top + (job.height - top) / tile * tile;
-  const int32_t block = std::max(kBlockRows, kRunBytes >> sizeLog);
+  const int32_t block = tile * static_cast<int32_t>(kStripTiles(elementSize));
   const auto edge = [&](int32_t x, int32_t columns, int32_t y, int32_t rows) {
     if (columns > 0 && rows > 0) TransposeEdge(job, elementSize, stored, x, y, columns, rows);
   };
@@ -99,11 +104,9 @@ void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
     for (int32_t x = panel; x < panelEnd; x += tile) edge(x, std::min(tile, panelEnd - x), 0, top);
     for (int32_t y0 = top; y0 < bottom; y0 += block) {
       const int32_t y1 = std::min(y0 + block, bottom);
-      for (int32_t x = panel; x < right; x += tile) {
-        transpose(job.src + y0 * job.srcRowBytes + (static_cast<ptrdiff_t>(x) << sizeLog), job.srcRowBytes,
-                  job.dst + x * job.dstRowBytes + (static_cast<ptrdiff_t>(y0) << sizeLog), job.dstRowBytes,
-                  static_cast<size_t>((y1 - y0) / tile));
-      }
+      transpose(job.src + y0 * job.srcRowBytes + (static_cast<ptrdiff_t>(panel) << sizeLog), job.srcRowBytes,
+                job.dst + panel * job.dstRowBytes + (static_cast<ptrdiff_t>(y0) << sizeLog), job.dstRowBytes,
+                static_cast<size_t>((y1 - y0) / tile), static_cast<size_t>((right - panel) / tile));
       for (int32_t y = y0; y < y1; y += tile) edge(right, panelEnd - right, y, tile);
     }
     for (int32_t x = panel; x < panelEnd; x += tile) edge(x, std::min(tile, panelEnd - x), bottom, job.height - bottom);

@@ -16,7 +16,7 @@ namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 namespace {
 
-constexpr ptrdiff_t kPrefetchBytes = 2 * kTileBytes;
+constexpr size_t kAhead = 4;  // lines of a row that are fetched together
 
 // 16 bytes of one row in each block of a vector.
 template <class D>
@@ -64,57 +64,144 @@ HWY_INLINE void StorePiece(V v, uint8_t* dst) {
     hn::StoreU(hn::BitCast(d8, v), d8, dst);
 }
 
-// Goes through the source by columns of 16 bytes, so that each destination line is written at once.
+// Transposes 16 bytes of each row of a tile into lines, one for each element.
 template <class T, int kSize, bool kStream>
-HWY_INLINE void TileLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
+HWY_INLINE void ColumnLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
   const hn::ScalableTag<T> d;
   constexpr int n = 16 / kSize, kVectors = kTileBytes / HWY_MAX_BYTES, kVectorRows = HWY_MAX_BYTES / kSize;
-  for (int x = 0; x < kTileBytes / 16; ++x) {
-    hn::VFromD<decltype(d)> lines[kVectors][n];
-    HWY_UNROLL(4)
-    for (int v = 0; v < kVectors; ++v) {
-      HWY_UNROLL(16)
-      for (int i = 0; i < n; ++i)
-        lines[v][i] = LoadBlocks(d, src + (v * kVectorRows + i) * srcRowBytes + 16 * x, n * srcRowBytes);
-      TransposeBlocks(lines[v]);
-    }
+  hn::VFromD<decltype(d)> lines[kVectors][n];
+  HWY_UNROLL(4)
+  for (int v = 0; v < kVectors; ++v) {
     HWY_UNROLL(16)
-    for (int i = 0; i < n; ++i) HWY_UNROLL(4)
-    for (int v = 0; v < kVectors; ++v)
-      StorePiece<kStream>(lines[v][i], dst + (x * n + i) * dstRowBytes + v * HWY_MAX_BYTES);
+    for (int i = 0; i < n; ++i) lines[v][i] = LoadBlocks(d, src + (v * kVectorRows + i) * srcRowBytes, n * srcRowBytes);
+    TransposeBlocks(lines[v]);
   }
+  HWY_UNROLL(16)
+  for (int i = 0; i < n; ++i) HWY_UNROLL(4)
+  for (int v = 0; v < kVectors; ++v) StorePiece<kStream>(lines[v][i], dst + i * dstRowBytes + v * HWY_MAX_BYTES);
 }
 
+// 16 bytes of each row of tiles that stand one below the other. Each destination row gets their lines in turn.
 template <class T, int kSize, bool kStream>
-HWY_INLINE void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
-  constexpr int kVectors = kTileBytes / HWY_MAX_BYTES, kRows = kTileBytes / kSize;
-  if constexpr (!kStream || kVectors == 1 || kVectors * 16 / kSize <= 8) {
-    TileLines<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes);
+HWY_INLINE void Column(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t tiles) {
+  for (size_t t = 0; t < tiles; ++t, src += kTileBytes / kSize * srcRowBytes)
+    ColumnLines<T, kSize, kStream>(src, srcRowBytes, dst + t * kTileBytes, dstRowBytes);
+}
+
+// kColumns times 16 bytes of up to kTiles tiles.
+template <class T, int kSize, bool kStream, int kColumns, size_t kTiles>
+HWY_INLINE void Columns(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t tiles) {
+  constexpr int n = 16 / kSize;
+  if constexpr (!kStream || kTileBytes == HWY_MAX_BYTES) {
+    for (int x = 0; x < kColumns; ++x)
+      Column<T, kSize, kStream>(src + 16 * x, srcRowBytes, dst + x * n * dstRowBytes, dstRowBytes, tiles);
   } else {
     // Too few registers to write whole lines.
     const hn::ScalableTag<uint8_t> d;
-    alignas(64) uint8_t lines[kRows * kTileBytes];
-    TileLines<T, kSize, false>(src, srcRowBytes, lines, kTileBytes);
-    for (int i = 0; i < kRows; ++i)
-      for (int v = 0; v < kTileBytes; v += HWY_MAX_BYTES)
-        hn::Stream(hn::Load(d, lines + i * kTileBytes + v), d, dst + i * dstRowBytes + v);
+    constexpr ptrdiff_t kRun = kTiles * kTileBytes;
+    alignas(64) uint8_t lines[kColumns * n * kRun];
+    for (int x = 0; x < kColumns; ++x)
+      Column<T, kSize, false>(src + 16 * x, srcRowBytes, lines + x * n * kRun, kRun, tiles);
+    for (ptrdiff_t i = 0; i < kColumns * n; ++i)
+      for (size_t v = 0; v < tiles * kTileBytes; v += HWY_MAX_BYTES)
+        hn::Stream(hn::Load(d, lines + i * kRun + v), d, dst + i * dstRowBytes + v);
+  }
+}
+
+#if HWY_TARGET == HWY_AVX3
+// Reads and writes each line of a tile once, whatever places in the cache its rows share.
+template <class T, int kSize, bool kStream>
+HWY_INLINE void WholeLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
+  const hn::ScalableTag<uint8_t> d8;
+  const hn::ScalableTag<T> d;
+  using V = hn::VFromD<decltype(d)>;
+  constexpr int n = 16 / kSize;
+  V rows[4][n], lines[4][n];
+  HWY_UNROLL(4)
+  for (int b = 0; b < 4; ++b) {
+    HWY_UNROLL(4)
+    for (int i = 0; i < n; ++i) rows[b][i] = hn::BitCast(d, hn::LoadU(d8, src + (b * n + i) * srcRowBytes));
+    TransposeBlocks(rows[b]);
+  }
+  // Then the blocks change places.
+  const auto even = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0x88)}; };
+  const auto odd = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0xDD)}; };
+  HWY_UNROLL(4)
+  for (int i = 0; i < n; ++i) {
+    const V even01 = even(rows[0][i], rows[1][i]), even23 = even(rows[2][i], rows[3][i]);
+    const V odd01 = odd(rows[0][i], rows[1][i]), odd23 = odd(rows[2][i], rows[3][i]);
+    lines[0][i] = even(even01, even23);
+    lines[1][i] = even(odd01, odd23);
+    lines[2][i] = odd(even01, even23);
+    lines[3][i] = odd(odd01, odd23);
+  }
+  HWY_UNROLL(4)
+  for (int b = 0; b < 4; ++b) HWY_UNROLL(4)
+  for (int i = 0; i < n; ++i) StorePiece<kStream>(lines[b][i], dst + (b * n + i) * dstRowBytes);
+}
+#endif
+
+template <class T, int kSize, bool kStream>
+HWY_INLINE void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
+  constexpr int kColumns = kTileBytes / 16, n = 16 / kSize;
+  if constexpr (kSize < 4) {
+    Columns<T, kSize, kStream, kColumns, 1>(src, srcRowBytes, dst, dstRowBytes, 1);
+  } else {
+#if HWY_TARGET == HWY_AVX3
+    WholeLines<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes);
+#else
+    for (int c = 0; c < kColumns; ++c)
+      ColumnLines<T, kSize, kStream>(src + 16 * c, srcRowBytes, dst + c * n * dstRowBytes, dstRowBytes);
+#endif
   }
 }
 
 template <class T, int kSize, bool kStream>
-HWY_INLINE void Tiles(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t count) {
+HWY_INLINE void Strip(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down,
+                      size_t across) {
   constexpr ptrdiff_t kRows = kTileBytes / kSize;
-  for (; count != 0; --count, src += kRows * srcRowBytes, dst += kTileBytes) {
-    // So many rows at once are more than the hardware follows.
-    HWY_UNROLL(16)
-    for (ptrdiff_t i = 0; i < kRows; ++i) __builtin_prefetch(src + i * srcRowBytes + kPrefetchBytes, 0, 2);
-    Tile<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes);
+  constexpr int kColumns = kTileBytes / 16, n = 16 / kSize;
+  const size_t rows = down * kRows;
+  // Lines at such distances share few places in the cache: source lines are read once, and destination lines written
+  // four in a row.
+  const bool gather = kSize < 4 && (srcRowBytes % (1024 * kSize) == 0 || dstRowBytes % (1024 * kSize) == 0);
+  for (size_t x = 0; x < across; ++x, dst += kRows * dstRowBytes) {
+    // So many rows at once are more than the hardware follows. With each tile, the lines of the next tiles are fetched
+    // for some of the rows; after the last tile, those of the rows below.
+    const size_t next = x / kAhead * kAhead + kAhead;
+    const uint8_t* ahead =
+        (next < across ? src + next * kTileBytes : src + static_cast<ptrdiff_t>(rows) * srcRowBytes) +
+        static_cast<ptrdiff_t>(x % kAhead * rows / kAhead) * srcRowBytes;
+    const auto fetch = [&](size_t count) HWY_ATTR {
+      for (size_t i = 0; i < count; ++i, ahead += srcRowBytes)
+        for (size_t k = 0; k < kAhead; ++k) __builtin_prefetch(ahead + k * kTileBytes);
+    };
+    const uint8_t* from = src + x * kTileBytes;
+    if (gather) {
+      const hn::ScalableTag<uint8_t> d;
+      constexpr size_t kTiles = kStripTiles(kSize);
+      alignas(64) uint8_t in[kTiles * kRows * kTileBytes];
+      for (size_t i = 0; i < rows; ++i, from += srcRowBytes) {
+        if (i % kAhead == 0) fetch(1);
+        HWY_UNROLL(4)
+        for (size_t v = 0; v < kTileBytes; v += HWY_MAX_BYTES)
+          hn::Store(hn::LoadU(d, from + v), d, in + i * kTileBytes + v);
+      }
+      for (int c = 0; c < kColumns; ++c)
+        Columns<T, kSize, kStream, 1, kTiles>(in + 16 * c, kTileBytes, dst + c * n * dstRowBytes, dstRowBytes, down);
+    } else {
+      for (size_t t = 0; t < down; ++t, from += kRows * srcRowBytes) {
+        fetch(kRows / kAhead);
+        Tile<T, kSize, kStream>(from, srcRowBytes, dst + t * kTileBytes, dstRowBytes);
+      }
+    }
   }
 }
 
-#define VX_TILE(name, T, kSize, kStream)                                                                    \
-  void name(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t count) { \
-    Tiles<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes, count);                                    \
+#define VX_TILE(name, T, kSize, kStream)                                                                 \
+  void name(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down, \
+            size_t across) {                                                                             \
+    Strip<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes, down, across);                          \
   }
 VX_TILE(Tile1, uint8_t, 1, false)
 VX_TILE(Tile2, uint16_t, 2, false)
@@ -188,10 +275,10 @@ namespace plain {
 namespace {
 
 template <int kSize>
-void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t count) {
-  constexpr int kColumns = kTileBytes / kSize;
-  const auto rows = static_cast<ptrdiff_t>(kColumns * count);
-  for (int x = 0; x < kColumns; ++x)
+void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down, size_t across) {
+  constexpr size_t kColumns = kTileBytes / kSize;
+  const auto rows = static_cast<ptrdiff_t>(kColumns * down), columns = static_cast<ptrdiff_t>(kColumns * across);
+  for (ptrdiff_t x = 0; x < columns; ++x)
     for (ptrdiff_t y = 0; y < rows; ++y)
       std::memcpy(dst + x * dstRowBytes + y * kSize, src + y * srcRowBytes + x * kSize, kSize);
 }

@@ -10,9 +10,14 @@ namespace vexel {
 
 inline constexpr int kTileBytes = 64;
 
-// `count` full tiles of kTileBytes / size elements each way, one below the other in the source.
+// Tiles that stand one below the other in the source: their rows are read side by side, and of a destination row they
+// fill at least 256 bytes. Lines that are written far apart are slow even past the cache, most of all a multiple of
+// 4,096 bytes apart; four in a row are not.
+constexpr size_t kStripTiles(int elementSize) { return elementSize < 4 ? 4 : static_cast<size_t>(elementSize); }
+
+// Full tiles of kTileBytes / size elements each way, up to kStripTiles `down` and any number `across`.
 using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes,
-                               size_t count);
+                               size_t down, size_t across);
 
 // For element sizes 1, 2, 4, 8 and 16; index is the logarithm of the size.
 extern const KernelVariants<TransposeTile> kTransposeTiles[5];

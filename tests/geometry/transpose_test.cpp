@@ -84,10 +84,12 @@ TEST(Rotate, EveryAngleFlipAndDepthInTheCacheAndPastIt) {
       }
 }
 
-// Several panels of columns, and what is large enough to be streamed: into whole lines, from any place in one.
+// Several panels of columns, rows that share places in the cache, and what is large enough to be streamed: into whole
+// lines, from any place in one.
 TEST(Transpose, LargePictures) {
   for (size_t size = 1; size <= 16; ++size)
-    for (const auto& [width, lines, offset] : {std::tuple{2055, 0, 3}, {700, 1, 0}, {700, 1, 48}, {2127, 1, 16}}) {
+    for (const auto& [width, lines, offset] :
+         {std::tuple{2055, 0, 3}, {1021, 0, 0}, {700, 1, 0}, {700, 1, 48}, {1021, 1, 16}, {2127, 1, 16}}) {
       if (lines && (size & (size - 1))) continue;  // the others are not streamed
       const int step = static_cast<int>(size), height = lines ? (1 << 20) / (width * step) + 37 : 261;
       const int padding = lines ? 64 - height * step % 64 : 2 * step;
