@@ -39,16 +39,21 @@ constexpr float kXyzToRgb[3][3] = {
     {Weight(-0.9692436362808796), Weight(1.8759675015077202), Weight(0.0415550574071756)},
     {Weight(0.0556300796969936), Weight(-0.2039769588889765), Weight(1.0569715142428786)}};
 
-// The two bytes of a V210 group that hold a sample, and the factor that moves it to the top of their 16 bits.
+// V210 samples of two groups in three pieces of 8, each out of 16 bytes of the groups; twice over, for four groups.
+constexpr size_t kPieces = 6, kPieceSamples = 8;
+constexpr size_t PieceStart(size_t piece) { return piece / 3 * 32 + piece % 3 * 8; }
+
+// The two bytes that hold a sample, and the factor that moves it to the top of their 16 bits.
 struct UnpackTable {
-  alignas(16) uint8_t bytes[2][16] = {};
-  alignas(16) uint16_t factors[2][8] = {};
+  alignas(32) uint8_t bytes[kPieces][16] = {};
+  alignas(32) uint16_t factors[kPieces][kPieceSamples] = {};
   constexpr UnpackTable() {
-    for (size_t i = 0; i < kGroupSamples; ++i) {
-      const auto first = static_cast<uint8_t>(i / 3 * 4 + i % 3);
-      bytes[i / 8][i % 8 * 2] = first;
-      bytes[i / 8][i % 8 * 2 + 1] = static_cast<uint8_t>(first + 1);
-      factors[i / 8][i % 8] = static_cast<uint16_t>(64 >> 2 * (i % 3));
+    for (size_t i = 0; i < kPieces * kPieceSamples; ++i) {
+      const size_t piece = i / kPieceSamples, lane = i % kPieceSamples;
+      const auto first = static_cast<uint8_t>(i / 3 * 4 + i % 3 - PieceStart(piece));
+      bytes[piece][lane * 2] = first;
+      bytes[piece][lane * 2 + 1] = static_cast<uint8_t>(first + 1);
+      factors[piece][lane] = static_cast<uint16_t>(64 >> 2 * (i % 3));
     }
   }
 };
@@ -97,14 +102,11 @@ using DG16 = hn::Repartition<uint16_t, DG8>;
 using VG8 = hn::VFromD<DG8>;
 constexpr size_t kGroups = HWY_MAX_BYTES >= 32 ? 2 : 1;
 
-HWY_INLINE VG8 ShuffleGroups(VG8 v, const uint8_t* table) {
-  return hn::TableLookupBytes(v, hn::LoadDup128(DG8(), table));
-}
-HWY_INLINE VG8 LoadGroups(const uint8_t* HWY_RESTRICT in) {
+HWY_INLINE VG8 LoadBlocks(const uint8_t* HWY_RESTRICT first, [[maybe_unused]] const uint8_t* HWY_RESTRICT second) {
 #if HWY_MAX_BYTES >= 32
-  return hn::Combine(DG8(), hn::LoadU(D8(), in + kUyvy16GroupBytes), hn::LoadU(D8(), in));
+  return hn::Combine(DG8(), hn::LoadU(D8(), second), hn::LoadU(D8(), first));
 #else
-  return hn::LoadU(DG8(), in);
+  return hn::LoadU(DG8(), first);
 #endif
 }
 
@@ -128,54 +130,74 @@ void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
       });
 }
 #else
-// Of each word the first two samples side by side and the third above nothing, from samples 0 to 7 and 4 to 11.
+// Of each word the first and third samples side by side and the second above nothing, from samples 0 to 7 and 4 to 11.
 void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  alignas(16) static constexpr uint8_t kTwoLower[16] = {0, 1, 2, 3, 6, 7, 8, 9, 12, 13, 14, 15, Z, Z, Z, Z};
-  alignas(16) static constexpr uint8_t kTwoUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 10, 11, 12, 13};
-  alignas(16) static constexpr uint8_t kThirdLower[16] = {Z, Z, 4, 5, Z, Z, 10, 11, Z, Z, Z, Z, Z, Z, Z, Z};
-  alignas(16) static constexpr uint8_t kThirdUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, Z, Z, 14, 15};
-  const auto pack = [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-    const hn::Repartition<uint32_t, DG8> d;
-    const auto lower = LoadGroups(in), upper = LoadGroups(in + 8);
-    const auto words = [&](const uint8_t* fromLower, const uint8_t* fromUpper) HWY_ATTR {
-      return hn::BitCast(d, hn::Or(ShuffleGroups(lower, fromLower), ShuffleGroups(upper, fromUpper)));
-    };
-    const auto two = words(kTwoLower, kTwoUpper);
-    const auto first = hn::And(two, hn::Set(d, 0xFFFF));
-    const auto second = hn::And(hn::ShiftRight<6>(two), hn::Set(d, 0x03FFFC00));
-    const auto third = hn::ShiftLeft<4>(words(kThirdLower, kThirdUpper));
-    hn::StoreU(hn::BitCast(DG8(), hn::Or(hn::Or(first, second), third)), DG8(), out);
-  };
-  RowLoop<2 * kGroups, kUyvy16GroupBytes, kV210GroupBytes>(
+  alignas(16) static constexpr uint8_t kOuterLower[16] = {0, 1, 4, 5, 6, 7, 10, 11, 12, 13, Z, Z, Z, Z, Z, Z};
+  alignas(16) static constexpr uint8_t kOuterUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, 10, 11, 14, 15};
+  alignas(16) static constexpr uint8_t kMiddleLower[16] = {2, 3, Z, Z, 8, 9, Z, Z, 14, 15, Z, Z, Z, Z, Z, Z};
+  alignas(16) static constexpr uint8_t kMiddleUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 12, 13, Z, Z};
+  const DG8 d8;
+  const DG16 d16;
+  const hn::Repartition<uint32_t, DG8> d32;
+  const auto outerLower = hn::LoadDup128(d8, kOuterLower), outerUpper = hn::LoadDup128(d8, kOuterUpper);
+  const auto middleLower = hn::LoadDup128(d8, kMiddleLower), middleUpper = hn::LoadDup128(d8, kMiddleUpper);
+  const auto thirdUp = hn::BitCast(d16, hn::Set(d32, 0x100001));
+  RowLoop<4, kUyvy16GroupBytes, kV210GroupBytes>(
       src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        pack(in, out);
-        pack(in + kGroups * kUyvy16GroupBytes, out + kGroups * kV210GroupBytes);
+        HWY_UNROLL(4)
+        for (size_t i = 0; i < 4; i += kGroups, in += kGroups * kUyvy16GroupBytes, out += kGroups * kV210GroupBytes) {
+          const auto lower = LoadBlocks(in, in + kUyvy16GroupBytes),
+                     upper = LoadBlocks(in + 8, in + kUyvy16GroupBytes + 8);
+          const auto outer = hn::Or(hn::TableLookupBytes(lower, outerLower), hn::TableLookupBytes(upper, outerUpper));
+          const auto middle =
+              hn::Or(hn::TableLookupBytes(lower, middleLower), hn::TableLookupBytes(upper, middleUpper));
+          hn::StoreU(hn::Or(hn::BitCast(d8, hn::Mul(hn::BitCast(d16, outer), thirdUp)),
+                            hn::BitCast(d8, hn::ShiftLeft<10>(hn::BitCast(d32, middle)))),
+                     d8, out);
+        }
       });
 }
 #endif
 
+#if HWY_TARGET == HWY_AVX3
+// Four groups at once: the first two samples of each word side by side, the third in a vector of its own.
 void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
-  RowLoop<kGroups, kV210GroupBytes, kUyvy16GroupBytes>(
-      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const DG16 d;
-        const auto groups = hn::LoadU(DG8(), in);
-        const auto samples = [&](size_t half) HWY_ATTR {
-          const auto v = hn::BitCast(d, ShuffleGroups(groups, kUnpack.bytes[half]));
-          return hn::BitCast(DG8(), hn::ShiftRight<6>(hn::Mul(v, hn::LoadDup128(d, kUnpack.factors[half]))));
-        };
-        const auto store = [](V8 eight, V8 four, uint8_t* HWY_RESTRICT to) HWY_ATTR {
-          hn::StoreU(eight, D8(), to);
-          hn::StoreU(hn::LowerHalf(four), hn::Half<D8>(), to + 16);
-        };
-        const auto eight = samples(0), four = samples(1);
-#if HWY_MAX_BYTES >= 32
-        store(hn::LowerHalf(eight), hn::LowerHalf(four), out);
-        store(hn::UpperHalf(D8(), eight), hn::UpperHalf(D8(), four), out + kUyvy16GroupBytes);
-#else
-        store(eight, four, out);
-#endif
+  struct Indices {
+    alignas(64) uint16_t from[64] = {};
+    constexpr Indices() {
+      for (size_t i = 0; i < 4 * kGroupSamples; ++i)
+        from[i] = static_cast<uint16_t>(i / 3 * 2 + (i % 3 == 2 ? 32 : i % 3));
+    }
+  };
+  static constexpr Indices kIndices;
+  const hn::Full512<uint32_t> d;
+  const auto lowerFrom = _mm512_load_si512(kIndices.from), upperFrom = _mm512_load_si512(kIndices.from + 32);
+  RowLoop<4, kV210GroupBytes, kUyvy16GroupBytes>(
+      src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        const auto words = hn::LoadU(d, reinterpret_cast<const uint32_t*>(in));
+        const auto part = [&](auto moved, uint32_t mask) HWY_ATTR { return hn::And(moved, hn::Set(d, mask)); };
+        const auto two = hn::Or(part(words, 0x3FF), part(hn::ShiftLeft<6>(words), 0x3FF0000)).raw;
+        const auto third = part(hn::ShiftRight<20>(words), 0x3FF).raw;
+        _mm512_storeu_si512(out, _mm512_permutex2var_epi16(two, lowerFrom, third));
+        _mm256_storeu_si256(reinterpret_cast<__m256i*>(out + 64),
+                            _mm512_castsi512_si256(_mm512_permutex2var_epi16(two, upperFrom, third)));
       });
 }
+#else
+void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
+  RowLoop<4, kV210GroupBytes, kUyvy16GroupBytes>(
+      src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+        const DG8 d8;
+        const DG16 d;
+        HWY_UNROLL(6)
+        for (size_t p = 0; p < kPieces; p += kGroups) {
+          const auto bytes = LoadBlocks(in + PieceStart(p), in + PieceStart(p + 1));
+          const auto v = hn::BitCast(d, hn::TableLookupBytes(bytes, hn::Load(d8, kUnpack.bytes[p])));
+          hn::StoreU(hn::BitCast(d8, hn::ShiftRight<6>(hn::Mul(v, hn::Load(d, kUnpack.factors[p])))), d8, out + 16 * p);
+        }
+      });
+}
+#endif
 
 // The fourth sample is neither read nor written: it may be somebody else's.
 #if HWY_TARGET == HWY_AVX3
@@ -208,56 +230,74 @@ void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
   hn::BlendedStore(pixels(words), samples(count - i), d16, reinterpret_cast<uint16_t*>(dst) + 4 * i);
 }
 #else
-// Without masked stores of 16-bit lanes, the fourth sample is stepped over with ordinary stores of 4 and 2 bytes, two
-// pixels being computed at once.
+// Without masked stores of 16-bit lanes, the fourth sample is stepped over with stores of 4 and 2 bytes.
 void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
-  const auto both = [](uint32_t mask) { return mask * 0x100000001u; };
-  const auto store = [](uint8_t* to, uint64_t lower, uint64_t upper) {
-    const auto two = static_cast<uint32_t>(lower);
-    const auto third = static_cast<uint16_t>(upper);
-    std::memcpy(to, &two, 4);
-    std::memcpy(to + 4, &third, 2);
-  };
-  const auto pixels = [&](uint64_t w, uint8_t* to, bool isPair) {
-    const uint64_t lower = ((w << 4) & both(kTopTen)) | ((w << 10) & both(uint32_t{kTopTen} << 16));
-    const uint64_t upper = (w >> 16) & both(kTopTen);
-    store(to, lower, upper);
-    if (isPair) store(to + 8, lower >> 32, upper >> 32);
+  const D32 d;
+  constexpr size_t kBlock = 8, kLanes = 4;
+  const auto store = [&](const uint8_t* from, uint8_t* to) HWY_ATTR {
+    const auto w = hn::LoadU(d, reinterpret_cast<const uint32_t*>(from));
+    const auto two = hn::Or(hn::And(hn::ShiftLeft<4>(w), hn::Set(d, kTopTen)),
+                            hn::And(hn::ShiftLeft<10>(w), hn::Set(d, uint32_t{kTopTen} << 16)));
+    const auto third = hn::BitCast(D16(), hn::And(hn::ShiftRight<16>(w), hn::Set(d, kTopTen)));
+    HWY_UNROLL(4)
+    for (size_t i = 0; i < kLanes; ++i) {
+      const uint32_t pair = hn::ExtractLane(two, i);
+      const uint16_t last = hn::ExtractLane(third, 2 * i);
+      std::memcpy(to + 8 * i, &pair, 4);
+      std::memcpy(to + 8 * i + 4, &last, 2);
+    }
   };
   size_t i = 0;
-  for (; i + 2 <= count; i += 2) {
-    uint64_t two;
-    std::memcpy(&two, src + 4 * i, 8);
-    pixels(two, dst + 8 * i, true);
+  for (; i + kBlock <= count; i += kBlock) {
+    FetchAhead<kBlock * 8>(dst + 8 * i);
+    store(src + 4 * i, dst + 8 * i);
+    store(src + 4 * (i + kLanes), dst + 8 * (i + kLanes));
   }
-  if (i == count) return;
-  uint32_t one;
-  std::memcpy(&one, src + 4 * i, 4);
-  pixels(one, dst + 8 * i, false);
+  for (; i < count; ++i) {
+    alignas(16) uint8_t word[16] = {}, pixels[32];
+    std::memcpy(word, src + 4 * i, 4);
+    store(word, pixels);
+    std::memcpy(dst + 8 * i, pixels, 6);
+  }
 }
 #endif
 
-// The first three samples of each pixel, left-aligned 10-bit values, as a word in the lower half of its lane.
+// Sums of the products of neighbours.
 template <class V>
-HWY_INLINE V PackTopTen(V v) {
-  const auto part = [](V moved, uint64_t mask) HWY_ATTR { return hn::And(moved, hn::Set(hn::DFromV<V>(), mask)); };
-  return hn::Or(hn::Or(part(hn::ShiftRight<4>(v), 0xFFC), part(hn::ShiftRight<10>(v), 0x3FF000)),
-                part(hn::ShiftRight<16>(v), 0xFFC00000));
+HWY_INLINE V MultiplyPairs(V a, V b) {
+#if HWY_TARGET == HWY_AVX3
+  if constexpr (sizeof(V) == 64) return V{_mm512_madd_epi16(a.raw, b.raw)};
+#endif
+#if HWY_TARGET == HWY_AVX3 || HWY_TARGET == HWY_AVX2
+  if constexpr (sizeof(V) == 32) return V{_mm256_madd_epi16(a.raw, b.raw)};
+#endif
+  if constexpr (sizeof(V) == 16) return V{_mm_madd_epi16(a.raw, b.raw)};
 }
+
+// Words of the top ten bits of the first three samples of each pixel.
 template <class V>
 HWY_INLINE void StoreWords(V lower, V upper, uint8_t* HWY_RESTRICT to) {
-  const hn::Repartition<uint32_t, hn::DFromV<V>> d;
-  hn::StoreU(hn::ConcatEven(d, hn::BitCast(d, upper), hn::BitCast(d, lower)), d, reinterpret_cast<uint32_t*>(to));
+  const hn::DFromV<V> d;
+  const hn::Repartition<uint16_t, decltype(d)> d16;
+  const hn::Repartition<uint32_t, decltype(d)> d32;
+  const auto words = [&](V v) HWY_ATTR {
+    const V samples = hn::BitCast(d, hn::ShiftRight<6>(hn::BitCast(d16, v)));
+    // Two samples in the lower half, the third 24 bits above its place.
+    const V sums = MultiplyPairs(samples, hn::Set(d, 0x400010000004));
+    return hn::BitCast(d32, hn::Or(sums, hn::ShiftRight<24>(sums)));
+  };
+  hn::StoreU(hn::ConcatEven(d32, words(upper), words(lower)), d32, reinterpret_cast<uint32_t*>(to));
 }
 
 void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
   const hn::ScalableTag<uint64_t> d;
-  RowLoop<HWY_MAX_BYTES / 4, 8, 4>(
-      src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto half = [&](size_t at)
-                              HWY_ATTR { return PackTopTen(hn::LoadU(d, reinterpret_cast<const uint64_t*>(in + at))); };
-        StoreWords(half(0), half(HWY_MAX_BYTES), out);
-      });
+  constexpr size_t kBlock = HWY_MAX_BYTES < 32 ? 8 : HWY_MAX_BYTES / 4;
+  RowLoop<kBlock, 8, 4>(src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const auto pixels = [&](size_t at) HWY_ATTR { return hn::LoadU(d, reinterpret_cast<const uint64_t*>(in + at)); };
+    HWY_UNROLL(2)
+    for (size_t at = 0; at < 8 * kBlock; at += 2 * HWY_MAX_BYTES)
+      StoreWords(pixels(at), pixels(at + HWY_MAX_BYTES), out + at / 2);
+  });
 }
 
 // Calls each(i, v) with the 48 bytes at `in` as four vectors of 12 bytes each, which `table` moves; nothing beyond the
@@ -274,10 +314,10 @@ HWY_INLINE void SpreadTwelves(const uint8_t* HWY_RESTRICT in, const uint8_t* tab
 void Bgr16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kToRgb[16] = {4, 5, 2, 3, 0, 1, Z, Z, 10, 11, 8, 9, 6, 7, Z, Z};
   RowLoop<8, 6, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-    V64 words[4];
-    SpreadTwelves(in, kToRgb, [&](int i, V8 v) HWY_ATTR { words[i] = PackTopTen(hn::BitCast(D64(), v)); });
-    StoreWords(words[0], words[1], out);
-    StoreWords(words[2], words[3], out + 16);
+    V64 pixels[4];
+    SpreadTwelves(in, kToRgb, [&](int i, V8 v) HWY_ATTR { pixels[i] = hn::BitCast(D64(), v); });
+    StoreWords(pixels[0], pixels[1], out);
+    StoreWords(pixels[2], pixels[3], out + 16);
   });
 }
 
@@ -324,12 +364,15 @@ void Rgb16ToXrgb15(const uint8_t* src, uint8_t* dst, size_t count) {
 template <bool kSwap>
 HWY_INLINE void Scale15(uint8_t* row, size_t count) {
   const hn::ScalableTag<uint16_t> d;
-  InPlaceLoop<HWY_MAX_BYTES / 2, 2>(row, count, [&](uint8_t* p) HWY_ATTR {
-    auto* samples = reinterpret_cast<uint16_t*>(p);
-    const auto s = hn::LoadU(d, samples);
-    auto v = hn::SaturatedAdd(s, s);
-    if constexpr (kSwap) v = hn::Or(hn::ShiftLeft<8>(v), hn::ShiftRight<8>(v));
-    hn::StoreU(v, d, samples);
+  InPlaceLoop<32, 2>(row, count, [&](uint8_t* p) HWY_ATTR {
+    HWY_UNROLL(4)
+    for (size_t at = 0; at < 64; at += HWY_MAX_BYTES) {
+      auto* samples = reinterpret_cast<uint16_t*>(p + at);
+      const auto s = hn::LoadU(d, samples);
+      auto v = hn::SaturatedAdd(s, s);
+      if constexpr (kSwap) v = hn::Or(hn::ShiftLeft<8>(v), hn::ShiftRight<8>(v));
+      hn::StoreU(v, d, samples);
+    }
   });
 }
 void Scale15To16(uint8_t* row, size_t count) { Scale15<false>(row, count); }
@@ -339,8 +382,11 @@ void SwapBytes32(uint8_t* row, size_t count) {
   alignas(16) static constexpr uint8_t kReversed[16] = {3, 2, 1, 0, 7, 6, 5, 4, 11, 10, 9, 8, 15, 14, 13, 12};
   const hn::ScalableTag<uint8_t> d;
   const auto table = hn::LoadDup128(d, kReversed);
-  InPlaceLoop<HWY_MAX_BYTES / 4, 4>(
-      row, count, [&](uint8_t* p) HWY_ATTR { hn::StoreU(hn::TableLookupBytes(hn::LoadU(d, p), table), d, p); });
+  InPlaceLoop<16, 4>(row, count, [&](uint8_t* p) HWY_ATTR {
+    HWY_UNROLL(4)
+    for (size_t at = 0; at < 64; at += HWY_MAX_BYTES)
+      hn::StoreU(hn::TableLookupBytes(hn::LoadU(d, p + at), table), d, p + at);
+  });
 }
 
 void SGamut3ToSGamut3Cine(uint8_t* row, size_t count) {
