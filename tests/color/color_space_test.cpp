@@ -279,6 +279,14 @@ TEST(ColorCurves, ScalarFunctionsFollowTheStandards) {
     // The curve's exponent magnifies a rounding of its argument almost eightyfold.
     EXPECT_NEAR(pq.LinearToEOTF(light), signal, signal * 80 * 0x1p-23) << light;
     EXPECT_NEAR(pq.EOTFToLinear(signal), light, light * 2e-4) << light;
+    // Reference white is a factor of the signal, to the last digit.
+    EXPECT_EQ(pqWhite.LinearToEOTF(light), pq.LinearToEOTF(light) / 0.50807786f);
+    EXPECT_EQ(pqWhite.EOTFToLinear(signal), pq.EOTFToLinear(signal * 0.50807786f));
+    const float pixel[4] = {light, 0.5f * light, -light, 1};
+    float without[4], with[4];
+    pq.ConvertPixelsFromRec709(pixel, without, 1, false);
+    pqWhite.ConvertPixelsFromRec709(pixel, with, 1, false);
+    for (int k = 0; k < 3; ++k) EXPECT_EQ(with[k], without[k] * 1.9682022f);
   }
   EXPECT_NEAR(pqWhite.LinearToEOTF(1), 1, 1e-5);
   EXPECT_NEAR(pqWhite.EOTFToLinear(1), 1, 2e-4);
@@ -513,6 +521,13 @@ TEST(ColorSpaceMatrices, FollowThePrimaries) {
   for (const auto& [space, luma] :
        {std::pair<const ColorSpace*, Rgb>{&srgb, {0.2126, 0.7152, 0.0722}}, {&rec2020, {0.2627, 0.6780, 0.0593}}})
     for (size_t i = 0; i < 3; ++i) EXPECT_NEAR(space->RGBtoXYZ()[1][i], luma[i], 5e-5);
+}
+
+TEST(ColorSpaceMatrices, Illuminants) {
+  constexpr float kWhites[6][2] = {{0.34567f, 0.3585f}, {0.33242f, 0.34743f}, {0.32168f, 0.33767f},
+                                   {0.314f, 0.351f},    {0.31271f, 0.32902f}, {0.29902f, 0.31485f}};
+  for (int i = 0; i < 6; ++i)
+    for (int k = 0; k < 2; ++k) EXPECT_EQ(ColorSpace::Illuminant(static_cast<VX_Illuminant>(i))[k], kWhites[i][k]);
 }
 
 TEST(ColorSpaceMatrices, AdaptByBradford) {

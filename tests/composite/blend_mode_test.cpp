@@ -113,12 +113,22 @@ TEST(BlendMode, Edges) {
       {M::Divide, 1, {0, 1e-8f, -2, 1}, {0.5f, 1, 1, 1}, {0.5f / 1e-7f, 1 / 1e-7f, -0.5f, 1}},
       {M::ColorBurn, 1, {0, 0, 0.5f, 1}, {1, 0.5f, 0.75f, 1}, {1, 0, 0.5f, 1}},
       {M::ColorDodge, 1, {1, 1, 0.5f, 1}, {0, 0.5f, 0.25f, 1}, {0, 1, 0.5f, 1}},
+      // Divisors are held away from 0, each at its own distance.
+      {M::ColorBurn, 1, {0, 0, 0, 1}, {1 - 0x1p-24f, 0.5f, 1, 1}, {1 - 0x1p-24f / 1e-7f, 0, 1, 1}},
+      {M::ColorDodge, 1, {1, 1, 1, 1}, {5e-6f, 0.5f, 0, 1}, {5e-6f / (1 - 0.99999f), 1, 0, 1}},
+      {M::VividLight,
+       1,
+       {1, 0, 0, 1},
+       {1e-6f, 1 - 0x1p-20f, 0, 1},
+       {0.5e-6f / (1 - 0.999999f), 1 - 0x1p-21f / 1e-6f, 0, 1}},
       {M::HardMix, 1, {0.25f, 0.25f, 0.25f, 1}, {0.75f, 0.7499f, 2, 1}, {1, 0, 1, 1}},
       {M::LinearLight, 1, {1, 0, 2, 1}, {1, 0, 0.5f, 1}, {2, -1, 1.5f, 1}},
       // Equal luminance keeps the background, alpha included; a clear background gives way; a clear source stays out.
       {M::DarkerColor, 1, {1, 1, 1, 1}, {2, 2, 2, 0.5f}, {2, 2, 2, 0.5f}},
       {M::LighterColor, 0.5f, {0.25f, 0.5f, 1, 0.5f}, {9, 9, 9, 7e-6f}, {0.25f, 0.5f, 1, 0.25f}},
       {M::LighterColor, 1, {1, 1, 1, 7e-6f}, {0.5f, -3, 0.25f, 0.5f}, {0.5f, -3, 0.25f, 0.5f}},
+      {M::LighterColor, 0.5f, {0.25f, 0.5f, 1, 0.5f}, {9, 9, 9, 8.4e-6f}, {9, 9, 9, 8.4e-6f}},
+      {M::LighterColor, 1, {1, 1, 1, 8.4e-6f}, {0.5f, -3, 0.25f, 0}, {1, 1, 1, 8.4e-6f}},
       // NaN stays in its channel, and in the pixel where it is an alpha.
       {M::Screen, 1, {kNan, 1, 0.5f, 1}, {0.5f, kNan, 0.5f, 1}, {kNan, kNan, 0.75f, 1}},
       {M::Luminosity, 1, {kNan, 0, 0, 1}, {0.5f, 0.5f, 0.5f, 1}, {kNan, 0, 0, 1}},
