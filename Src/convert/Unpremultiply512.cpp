@@ -25,65 +25,88 @@ constexpr Factors kFactors;
 
 constexpr size_t kPixels = 64, kBlockBytes = 4 * kPixels, kFetchAhead = 8192;
 
-// Byte kAlpha of each pixel in all its bytes.
-template <int kAlpha>
-VX_VBMI_INLINE __m512i SpreadAlpha(__m512i pixels) {
-  constexpr int a = kAlpha * 0x01010101;
-  return _mm512_shuffle_epi8(pixels, _mm512_set4_epi32(a + 0x0C0C0C0C, a + 0x08080808, a + 0x04040404, a));
+// A constant that compilers keep in a register; in loops they would rather make it anew, by way of a general register.
+VX_VBMI_INLINE __m512i Constant(int value) {
+  __m512i vector = _mm512_set1_epi32(value);
+  asm("" : "+v"(vector));
+  return vector;
 }
 
 // Both products of 16-bit lanes, with the result in the high byte.
 VX_VBMI_INLINE __m512i Quotients(__m512i channels, __m512i p, __m512i m) {
-  return _mm512_add_epi16(_mm512_mulhi_epu16(_mm512_mullo_epi16(channels, p), m), _mm512_set1_epi16(128));
+  return _mm512_add_epi16(_mm512_mulhi_epu16(_mm512_mullo_epi16(channels, p), m), Constant(0x00800080));
 }
 
-// Sixteen pixels, with their factors in both words of each.
+// The even or the odd words of two vectors, so that unpacking words undoes it.
+template <int kOdd>
+VX_VBMI_INLINE __m512i SplitWords(__m512i v0, __m512i v1) {
+  alignas(64) static constexpr struct Indices {
+    constexpr Indices() : words{} {
+      for (int i = 0; i < 32; ++i) words[i] = static_cast<uint16_t>(i / 8 * 8 + i % 4 * 2 + (i & 4) * 8 + kOdd);
+    }
+    uint16_t words[32];
+  } kIndices;
+  return _mm512_permutex2var_epi16(v0, _mm512_load_si512(kIndices.words), v1);
+}
+
+// The low bytes and the high bytes of words; above the low ones is 0.
+VX_VBMI_INLINE __m512i Join(__m512i low, __m512i high) {
+  constexpr int kLowOrHighByte = 0xF8;
+  return _mm512_ternarylogic_epi32(low, high, Constant(static_cast<int>(0xFF00FF00)), kLowOrHighByte);
+}
+
+// The alpha of 64 pixels: with the third colour in words, and its factors in bytes, for unpacking.
 template <int kAlpha>
-VX_VBMI_INLINE void Divide(__m512i pixels, __m512i p, __m512i m, uint8_t* dst) {
-  constexpr __mmask64 kOdd = kAlpha == 0 ? 0xAAAAAAAAAAAAAAAA : 0x2222222222222222,
-                      kEven = kAlpha == 0 ? 0x4444444444444444 : 0x5555555555555555;
-  const __m512i limited = _mm512_min_epu8(pixels, SpreadAlpha<kAlpha>(pixels));
-  const __m512i even = Quotients(_mm512_and_si512(limited, _mm512_set1_epi16(0xFF)), p, m),
-                odd = Quotients(_mm512_srli_epi16(limited, 8), p, m);
-  const __m512i result = _mm512_mask_mov_epi8(pixels, kOdd, odd);
-  _mm512_storeu_si512(dst, _mm512_mask_mov_epi8(result, kEven, _mm512_srli_epi16(even, 8)));
-}
-
-// The factors of 64 pixels as words: those of vectors 0 and 1, and of 2 and 3. Each 16 bytes hold four pixels of both.
-struct BlockFactors {
-  __m512i p01, p23, m01, m23;
-  bool opaque;
+struct Alphas {
+  VX_VBMI_INLINE explicit Alphas(const uint8_t* src) {
+    for (int half = 0; half < 2; ++half)
+      words[half] =
+          SplitWords<kAlpha != 0>(_mm512_loadu_si512(src + 128 * half), _mm512_loadu_si512(src + 128 * half + 64));
+    const __m512i bytes = _mm512_packus_epi16(Alone(0), Alone(1));
+    isOpaque = _mm512_cmpneq_epi8_mask(bytes, _mm512_set1_epi8(-1)) == 0;
+    // Above 127, p has a high byte of 1.
+    pLow = LookUpBytes(kFactors.pLow, bytes), mLow = LookUpBytes(kFactors.mLow, bytes);
+    pHigh = _mm512_mask_mov_epi8(
+        _mm512_permutex2var_epi8(_mm512_load_si512(kFactors.pHigh), bytes, _mm512_load_si512(kFactors.pHigh + 64)),
+        _mm512_movepi8_mask(bytes), _mm512_set1_epi8(1));
+  }
+  VX_VBMI_INLINE __m512i Alone(int half) const {
+    return kAlpha == 0 ? _mm512_and_si512(words[half], _mm512_set1_epi16(0xFF)) : _mm512_srli_epi16(words[half], 8);
+  }
+  __m512i words[2], pLow, pHigh, mLow;
+  bool isOpaque;
 };
 
 template <int kAlpha>
-VX_VBMI_INLINE BlockFactors FactorsOf(const uint8_t* src) {
-  // In each 16 bytes the alphas of four pixels of every vector, which the unpacking puts where their pixels are.
-  const __m512i first = _mm512_set1_epi32(0x0C080400 + kAlpha * 0x01010101);
-  __m512i alphas = _mm512_shuffle_epi8(_mm512_loadu_si512(src), first);
-  alphas = _mm512_mask_shuffle_epi8(alphas, 0x00F000F000F000F0, _mm512_loadu_si512(src + 64), first);
-  alphas = _mm512_mask_shuffle_epi8(alphas, 0x0F000F000F000F00, _mm512_loadu_si512(src + 128), first);
-  alphas = _mm512_mask_shuffle_epi8(alphas, 0xF000F000F000F000, _mm512_loadu_si512(src + 192), first);
-  const __m512i pLow = LookUpBytes(kFactors.pLow, alphas), pHigh = LookUpBytes(kFactors.pHigh, alphas),
-                mLow = LookUpBytes(kFactors.mLow, alphas), mHigh = _mm512_set1_epi8(-1);
-  return {_mm512_unpacklo_epi8(pLow, pHigh), _mm512_unpackhi_epi8(pLow, pHigh), _mm512_unpacklo_epi8(mLow, mHigh),
-          _mm512_unpackhi_epi8(mLow, mHigh), _mm512_cmpneq_epi8_mask(alphas, mHigh) == 0};
+VX_VBMI_INLINE void Divide32(const uint8_t* src, __m512i last, __m512i alpha, __m512i p, __m512i m, uint8_t* dst) {
+  const __m512i colors = SplitWords<kAlpha == 0>(_mm512_loadu_si512(src), _mm512_loadu_si512(src + 64));
+  const __m512i odd = kAlpha == 0 ? _mm512_srli_epi16(last, 8) : last;
+  // Above alpha is 0, so the minimum takes the upper bytes away too.
+  const auto quotients = [&](__m512i c) VX_VBMI { return Quotients(_mm512_min_epu8(c, alpha), p, m); };
+  const __m512i first = quotients(colors), second = quotients(_mm512_srli_epi16(colors, 8)), third = quotients(odd);
+  const __m512i both = Join(_mm512_srli_epi16(first, 8), second);
+  const __m512i rest = kAlpha == 0 ? Join(alpha, third) : Join(_mm512_srli_epi16(third, 8), last);
+  const __m512i even = kAlpha == 0 ? rest : both, uneven = kAlpha == 0 ? both : rest;
+  _mm512_storeu_si512(dst, _mm512_unpacklo_epi16(even, uneven));
+  _mm512_storeu_si512(dst + 64, _mm512_unpackhi_epi16(even, uneven));
 }
 
 template <int kAlpha>
-VX_VBMI_INLINE void Divide64(const uint8_t* src, const BlockFactors& f, uint8_t* dst) {
-  const __m512i v0 = _mm512_loadu_si512(src), v1 = _mm512_loadu_si512(src + 64), v2 = _mm512_loadu_si512(src + 128),
-                v3 = _mm512_loadu_si512(src + 192);
-  if (f.opaque) {
+VX_VBMI_INLINE void Divide64(const uint8_t* src, const Alphas<kAlpha>& a, uint8_t* dst) {
+  if (a.isOpaque) {
+    const __m512i v0 = _mm512_loadu_si512(src), v1 = _mm512_loadu_si512(src + 64), v2 = _mm512_loadu_si512(src + 128),
+                  v3 = _mm512_loadu_si512(src + 192);
     _mm512_storeu_si512(dst, v0);
     _mm512_storeu_si512(dst + 64, v1);
     _mm512_storeu_si512(dst + 128, v2);
     _mm512_storeu_si512(dst + 192, v3);
     return;
   }
-  Divide<kAlpha>(v0, _mm512_unpacklo_epi16(f.p01, f.p01), _mm512_unpacklo_epi16(f.m01, f.m01), dst);
-  Divide<kAlpha>(v1, _mm512_unpackhi_epi16(f.p01, f.p01), _mm512_unpackhi_epi16(f.m01, f.m01), dst + 64);
-  Divide<kAlpha>(v2, _mm512_unpacklo_epi16(f.p23, f.p23), _mm512_unpacklo_epi16(f.m23, f.m23), dst + 128);
-  Divide<kAlpha>(v3, _mm512_unpackhi_epi16(f.p23, f.p23), _mm512_unpackhi_epi16(f.m23, f.m23), dst + 192);
+  const __m512i ones = _mm512_set1_epi8(-1);
+  Divide32<kAlpha>(src, a.words[0], a.Alone(0), _mm512_unpacklo_epi8(a.pLow, a.pHigh),
+                   _mm512_unpacklo_epi8(a.mLow, ones), dst);
+  Divide32<kAlpha>(src + 128, a.words[1], a.Alone(1), _mm512_unpackhi_epi8(a.pLow, a.pHigh),
+                   _mm512_unpackhi_epi8(a.mLow, ones), dst + 128);
 }
 
 // The factors are looked up one block ahead: both parts in a row are a longer chain than processors overlap.
@@ -91,11 +114,11 @@ template <int kAlpha>
 VX_VBMI void Unpremultiply(const uint8_t* src, uint8_t* dst, size_t count) {
   const size_t blocks = count / kPixels, rest = count % kPixels;
   if (blocks > 0) {
-    BlockFactors now = FactorsOf<kAlpha>(src);
+    Alphas<kAlpha> now(src);
     for (size_t i = 0; i < blocks; ++i, src += kBlockBytes, dst += kBlockBytes) {
       for (size_t line = 0; line < kBlockBytes; line += 64)
         __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + line));
-      const BlockFactors next = FactorsOf<kAlpha>(i + 1 < blocks ? src + kBlockBytes : src);
+      const Alphas<kAlpha> next(i + 1 < blocks ? src + kBlockBytes : src);
       Divide64<kAlpha>(src, now, dst);
       now = next;
     }
@@ -103,7 +126,7 @@ VX_VBMI void Unpremultiply(const uint8_t* src, uint8_t* dst, size_t count) {
   if (rest == 0) return;
   uint8_t in[kBlockBytes] = {}, out[kBlockBytes];
   std::memcpy(in, src, 4 * rest);
-  Divide64<kAlpha>(in, FactorsOf<kAlpha>(in), out);
+  Divide64<kAlpha>(in, Alphas<kAlpha>(in), out);
   std::memcpy(dst, out, 4 * rest);
 }
 
