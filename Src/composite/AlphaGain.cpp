@@ -3,8 +3,10 @@
 #include <cmath>
 
 #include "composite/AlphaUtilityKernels.h"
+#include "composite/GainLookup512.h"
 #include "composite/Opacity.h"
 #include "composite/RowJob.h"
+#include "convert/Vbmi.h"
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
 #include "vexel/compositing.h"
@@ -25,6 +27,11 @@ const GainKernels* KernelFor(VX_PixelFormat format) noexcept {
   }
   if (alpha != kAlphaPremultiplied) return nullptr;
   return !is8u ? &kGainPixel32f : IsYuv(format) ? &kGainVuyp8 : &kGainPixel8u;
+}
+
+// Whether the kernel treats every byte by itself.
+bool ScalesAllBytes(VX_PixelFormat format) noexcept {
+  return Depth(format) == kDepth8u && AlphaKind(format) == kAlphaPremultiplied;
 }
 
 VX_PixelFormat WorkingFormat(VX_PixelFormat dst, int32_t precisionHint) noexcept {
@@ -63,5 +70,10 @@ VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcF
 
   const GainKernel scale = (*KernelFor(working))[job.Variant()];
   const float factor = Depth(working) == kDepth8u ? std::min(gain, kMostGain8u) : gain;
+  if (job.Variant() == KernelVariant::Avx512 && HasVbmi() && ScalesAllBytes(working)) {
+    const GainCodes codes(scale, factor);
+    const auto lookUp = IsYuv(working) ? GainVuyp512 : GainPixel512;
+    return job.Run([&](const RowSpan& span) { lookUp(span.src[0], span.dst, span.count, codes); });
+  }
   return job.Run([=](const RowSpan& span) { scale(span.src[0], span.dst, span.count, factor); });
 }

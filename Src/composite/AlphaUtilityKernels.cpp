@@ -71,7 +71,17 @@ HWY_INLINE void MergeRow(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_
 
 template <class T, class Op>
 HWY_INLINE void MapBytes(const uint8_t* src, uint8_t* dst, size_t bytes, const Op& op) {
-  MergeRow<T>(src, src, dst, bytes, [&](Full<T> v, Full<T>) HWY_ATTR { return op(v); });
+  constexpr size_t kBlock = 4 * HWY_MAX_BYTES;
+  const auto body = [&](const uint8_t* in, const uint8_t*, uint8_t* out) HWY_ATTR {
+    FetchAhead<kBlock>(in);
+    const auto r0 = op(LoadVector<T>(in, 0)), r1 = op(LoadVector<T>(in, 1));
+    const auto r2 = op(LoadVector<T>(in, 2)), r3 = op(LoadVector<T>(in, 3));
+    StoreVector(r0, out, 0);
+    StoreVector(r1, out, 1);
+    StoreVector(r2, out, 2);
+    StoreVector(r3, out, 3);
+  };
+  TwoRowLoop<kBlock>(src, src, dst, bytes, body);
 }
 
 template <class L>
