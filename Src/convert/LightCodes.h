@@ -68,9 +68,9 @@ class LightCodes {
   int32_t OverflowBits() const { return mOverflow; }
 
   // The same function, unrounded, unlimited and up to kLast off by less than kMostError, between kFirst and kScalesEnd,
-  // in two factors: Scales by the low bits of the exponent, and a parabola of the rest of the mantissa (as 1 to 17/16)
-  // by its four high bits.
-  static constexpr float kMostError = 1.0f / 6144;
+  // in two factors: Scales by the low bits of the exponent, and a parabola of the rest of the mantissa (as 1 to 33/32)
+  // by its five high bits.
+  static constexpr float kMostError = 1.0f / 12288;
   static constexpr int32_t kScalesEnd = kFirst + (32 << 23);
   const float* Scales() const { return mScales; }
   const float* Coefficients(int power) const { return mCoefficients[power]; }
@@ -87,16 +87,16 @@ class LightCodes {
     }
     for (int exponent = kFirst >> 23; exponent < kScalesEnd >> 23; ++exponent)
       mScales[exponent & 31] = 255.0f * SignedPower(std::bit_cast<float>(exponent << 23), kFromLinear);
-    for (int i = 0; i < 16; ++i) FitParabola(i);
+    for (int i = 0; i < 32; ++i) FitParabola(i);
     mOverflow = Bisect(kLast, 0x7F800000, [](int32_t bits) { return CodeOfBits(bits) == 0; });
   }
   static constexpr int32_t kLowMask = (1 << kLowBits) - 1;
   static constexpr int32_t kBuckets = ((kLast - kFirst) >> kLowBits) + 1;
   static int32_t CodeOfBits(int32_t bits) { return NarrowLightTo8(std::bit_cast<float>(bits)); }
-  // Through the three Chebyshev nodes of a sixteenth of an octave.
+  // Through the three Chebyshev nodes of a segment.
   void FitParabola(int i) noexcept {
-    constexpr double kMiddle = 1 + 1 / 32.0, kStep = 0.86602540378443865 / 32;
-    const auto at = [&](double x) { return double{SignedPower(static_cast<float>(x + i / 16.0), kFromLinear)}; };
+    constexpr double kMiddle = 1 + 1 / 64.0, kStep = 0.86602540378443865 / 64;
+    const auto at = [&](double x) { return double{SignedPower(static_cast<float>(x + i / 32.0), kFromLinear)}; };
     const double before = at(kMiddle - kStep), middle = at(kMiddle), after = at(kMiddle + kStep);
     const double curvature = (before - 2 * middle + after) / (2 * kStep * kStep),
                  slope = (after - before) / (2 * kStep);
@@ -115,7 +115,7 @@ class LightCodes {
   }
 
   alignas(64) float mScales[32] = {};
-  alignas(64) float mCoefficients[3][16];
+  alignas(64) float mCoefficients[3][32];
   int32_t mEntries[kBuckets];
   int32_t mOverflow;
 };

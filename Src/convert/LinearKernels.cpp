@@ -42,18 +42,52 @@ class LinearToBgra8Body {
  public:
   explicit HWY_INLINE LinearToBgra8Body(const LightCodes& codes) : mCodes(codes), mOverflow(codes.OverflowBits()) {}
 
+#if HWY_TARGET == HWY_AVX3
+  // Several vectors of pixels go from step to step together; one pixel's way is longer than processors overlap.
+  static constexpr size_t kVectors = 4;
+
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
-    F32 blue, green, red, alpha;
-    LoadPixels(reinterpret_cast<const float*>(in), blue, green, red, alpha);
-    const Codes codes = LightToCodes(blue, green, red);
-    StorePixelCodes(codes, ConvertNearest(hn::Mul(alpha, hn::Set(hn::ScalableTag<float>(), 255.0f))), out);
+    Unrounded values[kVectors];
+    auto largest = hn::Zero(DI());
+    for (size_t i = 0; i < kVectors; ++i) {
+      const Light light = LoadLight(in, i);
+      values[i] = {Estimate(light.blue, largest), Estimate(light.green, largest), Estimate(light.red, largest),
+                   ScaledAlpha(light)};
+    }
+    const bool inRange = hn::AllTrue(DI(), hn::Lt(largest, hn::Set(DI(), LightCodes::kScalesEnd)));
+    for (size_t i = 0; i < kVectors; ++i) {
+      const Unrounded& v = values[i];
+      Codes codes = {ConvertNearest(v.blue), ConvertNearest(v.green), ConvertNearest(v.red)};
+      if (HWY_UNLIKELY(!inRange || !IsClear(v))) codes = LookUp(LoadLight(in, i));
+      StorePixelCodes(codes, ConvertNearest(v.alpha), out + i * HWY_MAX_BYTES);
+    }
   }
+#else
+  static constexpr size_t kVectors = 1;
+
+  HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
+    const Light light = LoadLight(in, 0);
+    StorePixelCodes(LookUp(light), ConvertNearest(ScaledAlpha(light)), out);
+  }
+#endif
 
  private:
+  using DF = hn::ScalableTag<float>;
   using DI = hn::ScalableTag<int32_t>;
+  struct Light {
+    F32 blue, green, red, alpha;
+  };
   struct Codes {
     I32 blue, green, red;
   };
+
+  static HWY_INLINE Light LoadLight(const uint8_t* in, size_t index) {
+    Light light;
+    LoadPixels(reinterpret_cast<const float*>(in) + index * 4 * kLanes<float>, light.blue, light.green, light.red,
+               light.alpha);
+    return light;
+  }
+  static HWY_INLINE F32 ScaledAlpha(const Light& light) { return hn::Mul(light.alpha, hn::Set(DF(), 255.0f)); }
 
   // Limits codes to 8u and brings them into the order of memory.
   static HWY_INLINE void StorePixelCodes(const Codes& codes, I32 alpha, uint8_t* out) {
@@ -79,42 +113,40 @@ class LinearToBgra8Body {
     const auto entry = hn::GatherIndex(d, mCodes.Entries(), bucket);
     return ZeroOverflow(bits, hn::ShiftRight<LightCodes::kLowBits>(hn::Add(entry, inRange)));
   }
-  HWY_INLINE Codes LookUpAll(F32 blue, F32 green, F32 red) const { return {LookUp(blue), LookUp(green), LookUp(red)}; }
+  HWY_INLINE Codes LookUp(const Light& light) const {
+    return {LookUp(light.blue), LookUp(light.green), LookUp(light.red)};
+  }
 
 #if HWY_TARGET == HWY_AVX3
-  // Tables of 16 and 32 floats are permutations here, which are faster than gathers. Only near a threshold and far
+  struct Unrounded {
+    F32 blue, green, red, alpha;
+  };
+
+  // By the low five bits.
+  static HWY_INLINE F32 LookUp32(const float* table, I32 index) {
+    return F32{_mm512_permutex2var_ps(_mm512_load_ps(table), index.raw, _mm512_load_ps(table + 16))};
+  }
+
+  // Tables of 32 floats are permutations here, which are faster than gathers. Only near a threshold and far
   // above white does the result leave the code open. Codes above 255 stand for 255.
-  HWY_INLINE I32 Estimate(F32 v, I32& largest, F32& farthest) const {
-    const hn::ScalableTag<float> df;
+  HWY_INLINE F32 Estimate(F32 v, I32& largest) const {
     const auto bits = hn::Max(hn::BitCast(DI(), v), hn::Set(DI(), LightCodes::kFirst));
-    const auto segment = hn::ShiftRight<19>(bits).raw;
-    const auto coefficient = [&](int power) HWY_ATTR {
-      return F32{_mm512_permutexvar_ps(segment, _mm512_load_ps(mCodes.Coefficients(power)))};
-    };
-    const auto rest = hn::Or(hn::And(bits, hn::Set(DI(), 0x7FFFF)), hn::Set(DI(), 0x3F800000));
-    const auto x = hn::BitCast(df, rest);
-    const auto parabola = hn::Add(coefficient(0), hn::Mul(x, hn::Add(coefficient(1), hn::Mul(x, coefficient(2)))));
-    const auto scale = F32{_mm512_permutex2var_ps(_mm512_load_ps(mCodes.Scales()), hn::ShiftRight<23>(bits).raw,
-                                                  _mm512_load_ps(mCodes.Scales() + 16))};
-    const auto unrounded = hn::Mul(parabola, scale);
-    constexpr int kToNearest = 0, kLargerMagnitude = 0b1011;
-    farthest = F32{_mm512_range_ps(farthest.raw, _mm512_reduce_ps(unrounded.raw, kToNearest), kLargerMagnitude)};
     largest = hn::Max(largest, bits);
-    return ConvertNearest(unrounded);
+    const auto segment = hn::ShiftRight<18>(bits);
+    const auto coefficient = [&](int power) HWY_ATTR { return LookUp32(mCodes.Coefficients(power), segment); };
+    const auto rest = hn::Or(hn::And(bits, hn::Set(DI(), 0x3FFFF)), hn::Set(DI(), 0x3F800000));
+    const auto x = hn::BitCast(DF(), rest);
+    const auto parabola = hn::Add(coefficient(0), hn::Mul(x, hn::Add(coefficient(1), hn::Mul(x, coefficient(2)))));
+    return hn::Mul(parabola, LookUp32(mCodes.Scales(), hn::ShiftRight<23>(bits)));
   }
-  HWY_INLINE Codes LightToCodes(F32 blue, F32 green, F32 red) const {
-    const hn::ScalableTag<float> df;
-    auto farthest = hn::Zero(df);
-    auto largest = hn::Zero(DI());
-    const Codes codes = {Estimate(blue, largest, farthest), Estimate(green, largest, farthest),
-                         Estimate(red, largest, farthest)};
-    const auto isClear = hn::And(hn::Lt(farthest, hn::Set(df, 0.5f - LightCodes::kMostError)),
-                                 hn::RebindMask(df, hn::Lt(largest, hn::Set(DI(), LightCodes::kScalesEnd))));
-    if (HWY_LIKELY(hn::AllTrue(df, isClear))) return codes;
-    return LookUpAll(blue, green, red);
+  // Whether no value is so near a threshold that its code may be wrong.
+  static HWY_INLINE bool IsClear(const Unrounded& v) {
+    constexpr int kToNearest = 0, kLargerMagnitude = 0b1011;
+    const auto distance = [](F32 value) HWY_ATTR { return _mm512_reduce_ps(value.raw, kToNearest); };
+    const auto farthest = _mm512_range_ps(_mm512_range_ps(distance(v.blue), distance(v.green), kLargerMagnitude),
+                                          distance(v.red), kLargerMagnitude);
+    return hn::AllTrue(DF(), hn::Lt(F32{farthest}, hn::Set(DF(), 0.5f - LightCodes::kMostError)));
   }
-#else
-  HWY_INLINE Codes LightToCodes(F32 blue, F32 green, F32 red) const { return LookUpAll(blue, green, red); }
 #endif
 
   const LightCodes& mCodes;
@@ -141,19 +173,108 @@ HWY_ATTR void Bgra8ToLinear(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRI
 HWY_ATTR void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) { plain::Bgra8ToLinear(src, dst, count); }
 #endif
 
+// Powers of the colours of pixels, block by block, in two passes that load and store pixels themselves: their
+// exponents, then 2^exponent. The steps and special cases are those of frame/Power-inl.h.
+template <const PowerExponent& kExponent, AlphaWrite kAlpha>
+class PixelPowers {
+ public:
+  static constexpr size_t kPixels = PixelBlock::kPixels;
+
+  HWY_INLINE void operator()(const float* from, float* to, size_t pixels) {
+    if (!mNegative) {
+      if (HWY_LIKELY(!FindExponents<false>(from, pixels))) return Raise<false, false>(from, to, pixels);
+      mNegative = AnyNegative(from, pixels);
+      if (!mNegative) return Raise<true, false>(from, to, pixels);
+    }
+    FindExponents<true>(from, pixels);
+    Raise<true, true>(from, to, pixels);
+  }
+
+ private:
+  using DF = hn::ScalableTag<float>;
+  using DI = hn::ScalableTag<int32_t>;
+  using One = power_detail::Bundle<1>;
+  static constexpr PowerCore kCore = PowerCore::Float;
+  static_assert(kExponent.core == kCore);
+
+  // Whether there are colours outside the range of the fast form.
+  template <bool kSigned>
+  HWY_INLINE bool FindExponents(const float* from, size_t pixels) {
+    auto above = hn::Set(DI(), INT32_MIN);
+    for (size_t i = 0; i < pixels; i += kLanes<float>) {
+      FetchNextBlock(from + 4 * i);
+      F32 blue, green, red, alpha;
+      LoadPixels(from + 4 * i, blue, green, red, alpha);
+      const auto store = [&](F32 v, size_t at) VX_COLOR_STAGE {
+        const One x{power_detail::Magnitude<kSigned>(v)};
+        above = hn::Max(above, power_detail::AboveFirst(x.a, kExponent));
+        One eighths, place;
+        power_detail::PlaceOf<false, kCore>(x, kExponent.log, eighths, place);
+        hn::Store(eighths.a, DF(), mCounts + at);
+        hn::Store(place.a, DF(), mRests + at);
+      };
+      store(blue, 3 * i);
+      store(green, 3 * i + kLanes<float>);
+      store(red, 3 * i + 2 * kLanes<float>);
+      if constexpr (kAlpha == AlphaWrite::Keep) hn::Store(alpha, DF(), mAlpha + i);
+    }
+    for (size_t i = 0; i < 3 * pixels; i += kLanes<float>) {
+      One count, rest;
+      power_detail::ExponentOf<kCore>(One{hn::Load(DF(), mCounts + i)}, One{hn::Load(DF(), mRests + i)}, kExponent.log,
+                                      count, rest);
+      hn::Store(count.a, DF(), mCounts + i);
+      hn::Store(rest.a, DF(), mRests + i);
+    }
+    return !hn::AllFalse(DI(), hn::Gt(above, power_detail::FastSpan(kExponent)));
+  }
+
+  template <bool kRare, bool kSigned>
+  HWY_INLINE void Raise(const float* from, float* to, size_t pixels) {
+    for (size_t i = 0; i < pixels; i += kLanes<float>) {
+      FetchNextBlock(to + 4 * i);
+      F32 blue, green, red, alpha;
+      if constexpr (kRare) LoadPixels(from + 4 * i, blue, green, red, alpha);
+      const auto raise = [&](F32& v, size_t at) VX_COLOR_STAGE {
+        const One count{hn::Load(DF(), mCounts + at)}, rest{hn::Load(DF(), mRests + at)};
+        auto power = power_detail::Exp2Of<false>(count, rest).a;
+        if constexpr (kRare) {
+          power = power_detail::MendRare<kCore>(power, power_detail::Magnitude<kSigned>(v), kExponent);
+          power = power_detail::WithoutSignedNaN<kSigned>(power_detail::WithSign<kSigned>(power, v), v);
+        }
+        v = power;
+      };
+      raise(blue, 3 * i);
+      raise(green, 3 * i + kLanes<float>);
+      raise(red, 3 * i + 2 * kLanes<float>);
+      alpha = kAlpha == AlphaWrite::Keep ? hn::Load(DF(), mAlpha + i) : hn::Set(DF(), 1.0f);
+      StorePixels(blue, green, red, alpha, to + 4 * i);
+    }
+  }
+
+  static HWY_INLINE bool AnyNegative(const float* from, size_t pixels) {
+    auto all = hn::Zero(DI());
+    for (size_t i = 0; i < 4 * pixels; i += kLanes<float>)
+      all = hn::Or(all, hn::BitCast(DI(), hn::LoadU(DF(), from + i)));
+    return !hn::AllFalse(DI(), hn::Lt(all, hn::Zero(DI())));
+  }
+
+  bool mNegative = false;  // A minus sign has been met; until then none is taken off or put back.
+  HWY_ALIGN float mCounts[3 * kPixels];
+  HWY_ALIGN float mRests[3 * kPixels];
+  HWY_ALIGN float mAlpha[kPixels];
+};
+
 template <const PowerExponent& kExponent, AlphaWrite kAlpha>
 HWY_ATTR void Curve(const uint8_t* src, uint8_t* dst, size_t count) {
-  const auto* from = reinterpret_cast<const float*>(src);
-  ForEachBlock(from, reinterpret_cast<float*>(dst), count, [](PixelBlock& block) VX_COLOR_STAGE {
-    SignedPowers<PowerCore::Float>(block, kExponent);
-    if constexpr (kAlpha != AlphaWrite::Keep) std::fill_n(block.alpha, block.pixels, 1.0f);
-  });
+  PixelPowers<kExponent, kAlpha> powers;
+  ForEachRun(reinterpret_cast<const float*>(src), reinterpret_cast<float*>(dst), count, powers.kPixels,
+             [&](const float* from, float* to, size_t pixels) VX_COLOR_STAGE { powers(from, to, pixels); });
 }
 HWY_ATTR void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
   // The thresholds are those of rounding to nearest; a caller's other rounding mode takes the definition.
   constexpr uint32_t kRoundingMode = 0x6000;
   if (_mm_getcsr() & kRoundingMode) return plain::LinearToBgra8(src, dst, count);
-  RowLoop<kLanes<float>, 16, 4>(src, dst, count, LinearToBgra8Body(LightCodes::Get()));
+  RowLoop<LinearToBgra8Body::kVectors * kLanes<float>, 16, 4>(src, dst, count, LinearToBgra8Body(LightCodes::Get()));
 }
 template <AlphaWrite kAlpha>
 HWY_ATTR void Linearize(const uint8_t* src, uint8_t* dst, size_t count) {

@@ -224,9 +224,15 @@ TEST(AlphaKernels, Float) {
 double SignedPow(float x, float exponent) { return std::copysign(std::pow(std::abs(double{x}), double{exponent}), x); }
 
 TEST(LinearKernels, CurveBothWays) {
-  std::vector<float> source = {0.0f,  -0.0f,  1.0f,      -1.0f,      1e-45f, -1e-30f,
-                               3e38f, -3e38f, kInfinity, -kInfinity, 0.5f,   2.0f};
+  // Blocks of ordinary values, blocks with rare ones, and from there on with signs.
+  std::vector<float> source;
   Random random(24);
+  while (source.size() < 4096) source.push_back(random.Float(0.01f, 1.5f));
+  for (const float rare : {0.0f, 1e-45f, 1e-30f, 3e38f, kInfinity}) {
+    source.push_back(rare);
+    while (source.size() % 1023 != 0) source.push_back(random.Float(0.0f, 1.5f));
+  }
+  source.insert(source.end(), {-0.0f, 1.0f, -1.0f, -1e-30f, -3e38f, -kInfinity, 0.5f, 2.0f});
   while (source.size() < 40000) source.push_back(random.Float(-0.5f, 1.5f));
   while (source.size() < 48000)
     source.push_back(std::ldexp(random.Float(-2.0f, 2.0f), static_cast<int>(random.Int(-60, 40))));
