@@ -8,7 +8,7 @@
 namespace vexel {
 namespace {
 
-constexpr size_t kPixels = 16;
+constexpr size_t kPixels = 16, kFetchAhead = 8192;
 
 // Byte k of the light of every code: 256 bytes are two pairs of registers.
 struct BytePlanes {
@@ -62,7 +62,10 @@ VX_VBMI void Convert16(const uint8_t* src, uint8_t* dst, const BytePlanes& plane
 
 void LightLookup512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
   const BytePlanes& planes = BytePlanes::Get();
-  for (; count >= kPixels; count -= kPixels, src += 4 * kPixels, dst += 16 * kPixels) Convert16(src, dst, planes);
+  for (; count >= kPixels; count -= kPixels, src += 4 * kPixels, dst += 16 * kPixels) {
+    __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead));
+    Convert16(src, dst, planes);
+  }
   if (count == 0) return;
   uint8_t in[4 * kPixels] = {}, out[16 * kPixels];
   std::memcpy(in, src, 4 * count);

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "convert/RgbKernels.h"
 #include "formats/FormatBits.h"
 #include "frame/StreamCopy.h"
 
@@ -11,6 +12,12 @@ namespace {
 // Six pixels are a whole number of pairs and groups, so blocks of them have exact byte counts in every format.
 uint32_t BytesPerSixPixels(VX_PixelFormat format) {
   return static_cast<uint32_t>(UnpaddedRowBytes(format, kBlockMultiple));
+}
+
+// Powers take longer than memory does, so that nothing is gained by staging what they write.
+bool OutlastsMemory(const RowKernelSet* kernel) {
+  return kernel == &kBgra32fToLinear || kernel == &kBgrx32fToLinear || kernel == &kLinearToBgra32f ||
+         kernel == &kLinearToBgrx32f;
 }
 
 }  // namespace
@@ -28,9 +35,11 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
   mIsCopy = src == dst;
   mStream = false;
   mWholeRow = false;
+  mOutlastsMemory = false;
   for (int i = 0; i < mStepCount; ++i) {
     mSteps[i] = (*plan.steps[i].kernel)[variant];
     mWholeRow |= plan.steps[i].span == StepSpan::Row;
+    mOutlastsMemory |= OutlastsMemory(plan.steps[i].kernel);
   }
   if (const RowKernelSet* fused = FusedKernelFor(src, dst)) {
     mSteps[0] = (*fused)[variant];
@@ -88,14 +97,11 @@ void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
   uint8_t* const staging = mScratch + static_cast<size_t>(std::min(mStepCount - 1, 2)) * ScratchRowBytes();
   for (size_t done = 0; done < mWidth; done += unit) {
     const size_t count = std::min(unit, mWidth - done);
-    const size_t srcBytes = count / kBlockMultiple * mSrcBytesPerSixPixels;
     const uint8_t* from = src + done / kBlockMultiple * mSrcBytesPerSixPixels;
     uint8_t* to = dst + done / kBlockMultiple * mDstBytesPerSixPixels;
     RunSteps(from, mStream ? staging : to, count);
-    if (mStream) {
-      PrefetchBlock(from + srcBytes, srcBytes);
+    if (mStream)
       StreamCopy(to, staging, static_cast<size_t>(UnpaddedRowBytes(mDstFormat, static_cast<int64_t>(count))), mVariant);
-    }
   }
 }
 

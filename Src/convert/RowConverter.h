@@ -28,9 +28,9 @@ class RowConverter {
   VX_Result Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, int32_t width,
                     KernelVariant variant = ActiveKernelVariant()) noexcept;
 
-  // For destinations too large for the cache: the last step's output goes past the cache. Before ScratchBytes. Call
-  // StreamFence (frame/StreamCopy.h) after the last row.
-  void StreamOutput() noexcept { mStream = true; }
+  // For destinations too large for the cache: the last step's output goes past the cache, unless the chain is too slow
+  // to gain from it. Before ScratchBytes. Call StreamFence (frame/StreamCopy.h) after the last row.
+  void StreamOutput() noexcept { mStream = !mOutlastsMemory; }
 
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }
@@ -64,7 +64,7 @@ class RowConverter {
   size_t mWidth = 0;
   VX_PixelFormat mDstFormat{};
   uint32_t mSrcBytesPerSixPixels = 0, mDstBytesPerSixPixels = 0;
-  bool mWholeRow = false, mStream = false, mIsCopy = false;
+  bool mWholeRow = false, mStream = false, mIsCopy = false, mOutlastsMemory = false;
   KernelVariant mVariant = KernelVariant::Plain;
   uint8_t* mScratch = nullptr;
 };
