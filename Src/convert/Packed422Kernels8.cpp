@@ -5,6 +5,7 @@
 
 #include "convert/PairOrder.h"
 #include "convert/PlainPixels.h"
+#include "convert/Upsample512.h"
 #include "convert/YuvFixed8.h"
 #include "convert/YuvKernels.h"
 
@@ -61,6 +62,7 @@ struct PairsToBgrxBody {
 };
 template <PairOrder kOrder>
 HWY_INLINE void PairsToBgrx(const uint8_t* src, uint8_t* dst, size_t count, const FixedYuvToRgb8& f) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return PairsToBgrx512(kOrder, src, dst, count, f);
   PairLoop<4, false>(src, dst, count, PairsToBgrxBody<kOrder>{VectorYuvToRgb8(f)});
 }
 
