@@ -110,6 +110,35 @@ HWY_INLINE VG8 LoadBlocks(const uint8_t* HWY_RESTRICT first, [[maybe_unused]] co
 #endif
 }
 
+// In each block two words of `lower`, then two of `upper`.
+template <int kControl, class V>
+HWY_INLINE V PickWords(V lower, V upper) {
+#if HWY_TARGET == HWY_AVX3
+  if constexpr (sizeof(V) == 64)
+    return V{_mm512_castps_si512(
+        _mm512_shuffle_ps(_mm512_castsi512_ps(lower.raw), _mm512_castsi512_ps(upper.raw), kControl))};
+#endif
+#if HWY_TARGET == HWY_AVX3 || HWY_TARGET == HWY_AVX2
+  if constexpr (sizeof(V) == 32)
+    return V{_mm256_castps_si256(
+        _mm256_shuffle_ps(_mm256_castsi256_ps(lower.raw), _mm256_castsi256_ps(upper.raw), kControl))};
+#endif
+  if constexpr (sizeof(V) == 16)
+    return V{_mm_castps_si128(_mm_shuffle_ps(_mm_castsi128_ps(lower.raw), _mm_castsi128_ps(upper.raw), kControl))};
+}
+
+// Sums of the products of neighbours.
+template <class V>
+HWY_INLINE V MultiplyPairs(V a, V b) {
+#if HWY_TARGET == HWY_AVX3
+  if constexpr (sizeof(V) == 64) return V{_mm512_madd_epi16(a.raw, b.raw)};
+#endif
+#if HWY_TARGET == HWY_AVX3 || HWY_TARGET == HWY_AVX2
+  if constexpr (sizeof(V) == 32) return V{_mm256_madd_epi16(a.raw, b.raw)};
+#endif
+  if constexpr (sizeof(V) == 16) return V{_mm_madd_epi16(a.raw, b.raw)};
+}
+
 #if HWY_TARGET == HWY_AVX3
 // Four groups at once: the first, second and third samples of their words, spread to 32 bits.
 void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
@@ -130,30 +159,31 @@ void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
       });
 }
 #else
-// Of each word the first and third samples side by side and the second above nothing, from samples 0 to 7 and 4 to 11.
+// Of each word the first and third samples side by side, out of samples 0 to 7 and 4 to 11, and the second with a
+// neighbour that a product with zero drops.
 void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kOuterLower[16] = {0, 1, 4, 5, 6, 7, 10, 11, 12, 13, Z, Z, Z, Z, Z, Z};
   alignas(16) static constexpr uint8_t kOuterUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, 10, 11, 14, 15};
-  alignas(16) static constexpr uint8_t kMiddleLower[16] = {2, 3, Z, Z, 8, 9, Z, Z, 14, 15, Z, Z, Z, Z, Z, Z};
-  alignas(16) static constexpr uint8_t kMiddleUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 12, 13, Z, Z};
+  constexpr int kMiddle = 0xD8;  // words 0 and 2 of the lower samples, 1 and 3 of the upper
   const DG8 d8;
   const DG16 d16;
   const hn::Repartition<uint32_t, DG8> d32;
+  const hn::Repartition<uint64_t, DG8> d64;
   const auto outerLower = hn::LoadDup128(d8, kOuterLower), outerUpper = hn::LoadDup128(d8, kOuterUpper);
-  const auto middleLower = hn::LoadDup128(d8, kMiddleLower), middleUpper = hn::LoadDup128(d8, kMiddleUpper);
   const auto thirdUp = hn::BitCast(d16, hn::Set(d32, 0x100001));
+  const auto secondUp = hn::BitCast(d32, hn::Set(d64, uint64_t{1024} << 32 | 1024 << 16));
   RowLoop<4, kUyvy16GroupBytes, kV210GroupBytes>(
       src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
         HWY_UNROLL(4)
         for (size_t i = 0; i < 4; i += kGroups, in += kGroups * kUyvy16GroupBytes, out += kGroups * kV210GroupBytes) {
-          const auto lower = LoadBlocks(in, in + kUyvy16GroupBytes),
-                     upper = LoadBlocks(in + 8, in + kUyvy16GroupBytes + 8);
+          const auto lower = LoadBlocks(in, in + kUyvy16GroupBytes);
+          const auto upper = LoadBlocks(in + 8, in + kUyvy16GroupBytes + 8);
           const auto outer = hn::Or(hn::TableLookupBytes(lower, outerLower), hn::TableLookupBytes(upper, outerUpper));
-          const auto middle =
-              hn::Or(hn::TableLookupBytes(lower, middleLower), hn::TableLookupBytes(upper, middleUpper));
-          hn::StoreU(hn::Or(hn::BitCast(d8, hn::Mul(hn::BitCast(d16, outer), thirdUp)),
-                            hn::BitCast(d8, hn::ShiftLeft<10>(hn::BitCast(d32, middle)))),
-                     d8, out);
+          const auto middle = PickWords<kMiddle>(hn::BitCast(d32, lower), hn::BitCast(d32, upper));
+          // The product is signed.
+          const auto second = hn::And(MultiplyPairs(middle, secondUp), hn::Set(d32, 0x03FFFFFF));
+          const auto others = hn::BitCast(d32, hn::Mul(hn::BitCast(d16, outer), thirdUp));
+          hn::StoreU(hn::BitCast(d8, hn::Or(others, second)), d8, out);
         }
       });
 }
@@ -262,31 +292,15 @@ void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 #endif
 
-// Sums of the products of neighbours.
-template <class V>
-HWY_INLINE V MultiplyPairs(V a, V b) {
-#if HWY_TARGET == HWY_AVX3
-  if constexpr (sizeof(V) == 64) return V{_mm512_madd_epi16(a.raw, b.raw)};
-#endif
-#if HWY_TARGET == HWY_AVX3 || HWY_TARGET == HWY_AVX2
-  if constexpr (sizeof(V) == 32) return V{_mm256_madd_epi16(a.raw, b.raw)};
-#endif
-  if constexpr (sizeof(V) == 16) return V{_mm_madd_epi16(a.raw, b.raw)};
-}
-
 // Words of the top ten bits of the first three samples of each pixel.
 template <class V>
 HWY_INLINE void StoreWords(V lower, V upper, uint8_t* HWY_RESTRICT to) {
-  const hn::DFromV<V> d;
-  const hn::Repartition<uint16_t, decltype(d)> d16;
-  const hn::Repartition<uint32_t, decltype(d)> d32;
-  const auto words = [&](V v) HWY_ATTR {
-    const V samples = hn::BitCast(d, hn::ShiftRight<6>(hn::BitCast(d16, v)));
-    // Two samples in the lower half, the third 24 bits above its place.
-    const V sums = MultiplyPairs(samples, hn::Set(d, 0x400010000004));
-    return hn::BitCast(d32, hn::Or(sums, hn::ShiftRight<24>(sums)));
-  };
-  hn::StoreU(hn::ConcatEven(d32, words(upper), words(lower)), d32, reinterpret_cast<uint32_t*>(to));
+  const hn::Repartition<uint16_t, hn::DFromV<V>> d16;
+  const hn::Repartition<uint32_t, hn::DFromV<V>> d;
+  const auto l = hn::BitCast(d, lower), u = hn::BitCast(d, upper);
+  const auto two = hn::BitCast(d, hn::ShiftRight<6>(hn::BitCast(d16, hn::ConcatEven(d, u, l))));
+  const auto third = hn::And(hn::ShiftLeft<16>(hn::ConcatOdd(d, u, l)), hn::Set(d, uint32_t{kTopTen} << 16));
+  hn::StoreU(hn::Or(MultiplyPairs(two, hn::Set(d, 4096 << 16 | 4)), third), d, reinterpret_cast<uint32_t*>(to));
 }
 
 void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
@@ -363,14 +377,16 @@ void Rgb16ToXrgb15(const uint8_t* src, uint8_t* dst, size_t count) {
 // from 32768 on it is above 65535.
 template <bool kSwap>
 HWY_INLINE void Scale15(uint8_t* row, size_t count) {
+  alignas(16) static constexpr uint8_t kSwapped[16] = {1, 0, 3, 2, 5, 4, 7, 6, 9, 8, 11, 10, 13, 12, 15, 14};
   const hn::ScalableTag<uint16_t> d;
+  const hn::ScalableTag<uint8_t> d8;
   InPlaceLoop<32, 2>(row, count, [&](uint8_t* p) HWY_ATTR {
     HWY_UNROLL(4)
     for (size_t at = 0; at < 64; at += HWY_MAX_BYTES) {
       auto* samples = reinterpret_cast<uint16_t*>(p + at);
       const auto s = hn::LoadU(d, samples);
       auto v = hn::SaturatedAdd(s, s);
-      if constexpr (kSwap) v = hn::Or(hn::ShiftLeft<8>(v), hn::ShiftRight<8>(v));
+      if constexpr (kSwap) v = hn::TableLookupBytes(v, hn::BitCast(d, hn::LoadDup128(d8, kSwapped)));
       hn::StoreU(v, d, samples);
     }
   });
@@ -389,29 +405,46 @@ void SwapBytes32(uint8_t* row, size_t count) {
   });
 }
 
+// Towards zero, of what is in the range of int32.
+template <class V>
+HWY_INLINE auto Truncate(V v) {
+  using Result = hn::VFromD<hn::Rebind<int32_t, hn::DFromV<V>>>;
+#if HWY_TARGET == HWY_AVX3
+  return Result{_mm512_cvttpd_epi32(v.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return Result{_mm256_cvttpd_epi32(v.raw)};
+#else
+  return Result{_mm_cvttpd_epi32(v.raw)};
+#endif
+}
+
 void SGamut3ToSGamut3Cine(uint8_t* row, size_t count) {
   const hn::ScalableTag<double> d;
-  const hn::ScalableTag<uint64_t> d64;
-  const hn::ScalableTag<int64_t> dSigned;
-  const hn::Rebind<int32_t, decltype(d)> d32;
-  InPlaceLoop<HWY_MAX_BYTES / 8, 8>(row, count, [&](uint8_t* p) HWY_ATTR {
-    auto* pixels = reinterpret_cast<uint64_t*>(p);
-    const auto q = hn::LoadU(d64, pixels);
-    const auto low = hn::Set(d64, 0xFFFF);
-    // As the low bits of 2^52, an integer is a double.
-    const auto magic = hn::Set(d, 0x1p52);
-    const auto sample = [&](auto v) HWY_ATTR {
-      return hn::Sub(hn::BitCast(d, hn::Or(hn::And(v, low), hn::BitCast(d64, magic))), magic);
+  const hn::ScalableTag<int32_t> d32;
+  const hn::Rebind<int32_t, decltype(d)> dHalf;
+  using V = hn::VFromD<decltype(d32)>;
+  InPlaceLoop<HWY_MAX_BYTES / 4, 8>(row, count, [&](uint8_t* p) HWY_ATTR {
+    auto* words = reinterpret_cast<int32_t*>(p);
+    const auto q0 = hn::LoadU(d32, words), q1 = hn::LoadU(d32, words + HWY_MAX_BYTES / 4);
+    // The words of samples 0 and 1, and those of samples 2 and 3.
+    const auto first = PickWords<0x88>(q0, q1), second = PickWords<0xDD>(q0, q1);
+    const auto low = hn::Set(d32, 0xFFFF);
+    const V s0 = hn::And(first, low), s2 = hn::And(second, low);
+    const V s1 = hn::BitCast(d32, hn::ShiftRight<16>(hn::BitCast(hn::ScalableTag<uint32_t>(), first)));
+    const auto half = [&](const double* m, auto v0, auto v1, auto v2) HWY_ATTR {
+      const auto term = [&](int k, auto v) HWY_ATTR { return hn::Mul(hn::Set(d, m[k]), hn::PromoteTo(d, v)); };
+      return Truncate(hn::Add(hn::Add(term(0, v0), term(1, v1)), term(2, v2)));
     };
-    const auto s0 = sample(q), s1 = sample(hn::ShiftRight<16>(q)), s2 = sample(hn::ShiftRight<32>(q));
     const auto result = [&](const double* m) HWY_ATTR {
-      const auto sum =
-          hn::Add(hn::Add(hn::Mul(hn::Set(d, m[0]), s0), hn::Mul(hn::Set(d, m[1]), s1)), hn::Mul(hn::Set(d, m[2]), s2));
-      return hn::And(hn::BitCast(d64, hn::PromoteTo(dSigned, hn::DemoteTo(d32, sum))), low);
+      const auto lower = half(m, hn::LowerHalf(dHalf, s0), hn::LowerHalf(dHalf, s1), hn::LowerHalf(dHalf, s2));
+      const auto upper = half(m, hn::UpperHalf(dHalf, s0), hn::UpperHalf(dHalf, s1), hn::UpperHalf(dHalf, s2));
+      return hn::Combine(d32, upper, lower);
     };
-    const auto out = hn::Or(result(kSGamut3ToCine[0]), hn::Or(hn::ShiftLeft<16>(result(kSGamut3ToCine[1])),
-                                                              hn::ShiftLeft<32>(result(kSGamut3ToCine[2]))));
-    hn::StoreU(hn::Or(out, hn::And(q, hn::Set(d64, 0xFFFF000000000000))), d64, pixels);
+    const V r0 = result(kSGamut3ToCine[0]), r1 = result(kSGamut3ToCine[1]), r2 = result(kSGamut3ToCine[2]);
+    const V to0 = hn::Or(hn::And(r0, low), hn::ShiftLeft<16>(r1));
+    const V to1 = hn::Or(hn::And(r2, low), hn::AndNot(low, second));
+    hn::StoreU(hn::InterleaveLower(d32, to0, to1), d32, words);
+    hn::StoreU(hn::InterleaveUpper(d32, to0, to1), d32, words + HWY_MAX_BYTES / 4);
   });
 }
 
