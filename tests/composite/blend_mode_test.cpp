@@ -287,7 +287,7 @@ TEST(Dissolve, DrawsOnlyWhereNeededRowByRow) {
 
 TEST(BlendMode, KernelsInTheArena) {
   for (const M mode : Modes(true))
-    for (const F format : {kFloats, kBytes, F::XRGB_4444_8u}) {
+    for (const F format : {kFloats, kBytes, F::XRGB_4444_8u, F::PRGB_4444_8u}) {
       ArenaCase arenaCase;
       arenaCase.name = std::string("blend ") + ModeName(mode);
       arenaCase.sources = {format, format};

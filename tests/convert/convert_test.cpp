@@ -193,6 +193,10 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
     ExpectRefusal("case " + std::to_string(&c - cases), c.expected, [&](void* memory) {
       return VX_Convert(memory, 64, c.src, memory, -64, c.dst, c.width, c.height, 2);
     });
+  for (const auto& [quality, expected] : {std::pair{2, VX_ErrUnsupportedFormat}, {3, VX_ErrUnsupportedConversion}})
+    ExpectRefusal("a smaller DV picture", expected, [&, q = quality](void* memory) {
+      return VX_Convert(memory, 0, F::PAL_DV100_1080i, memory, 64, F::BGRA_4444_8u, 1000, 1000, q);
+    });
   uint8_t pixel[64] = {};
   EXPECT_EQ(VX_Convert(nullptr, 64, F::BGRA_4444_8u, pixel, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullSource);
   EXPECT_EQ(VX_Convert(pixel, 64, F::BGRA_4444_8u, nullptr, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullDestination);

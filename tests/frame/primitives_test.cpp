@@ -246,13 +246,15 @@ TEST(ImagePrimitives, MultiplyRoundsToNearestEvenAndSaturates) {
       std::fill(std::begin(dst), std::end(dst), 0xEE);
       const uint8_t constants[4] = {static_cast<uint8_t>(constant), static_cast<uint8_t>(255 - constant), 255,
                                     static_cast<uint8_t>(constant / 2)};
-      ASSERT_EQ(MultiplyByConstants4(src, 256, constants, dst, 256, 64, 1, scale), Status::Ok);
-      for (int i = 0; i < 256; ++i) {
-        const double exact = std::ldexp(i * constants[i % 4], -std::max(std::min(scale, 100), -100));
-        ASSERT_EQ(dst[i], std::min(std::nearbyint(exact), 255.0))
-            << i << " * " << int{constants[i % 4]} << " >> " << scale;
-      }
-      ASSERT_EQ(dst[256], 0xEE);
+      ForEachVariant([&](int) {
+        ASSERT_EQ(MultiplyByConstants4(src, 256, constants, dst, 256, 64, 1, scale), Status::Ok);
+        for (int i = 0; i < 256; ++i) {
+          const double exact = std::ldexp(i * constants[i % 4], -std::max(std::min(scale, 100), -100));
+          ASSERT_EQ(dst[i], std::min(std::nearbyint(exact), 255.0))
+              << i << " * " << int{constants[i % 4]} << " >> " << scale;
+        }
+        ASSERT_EQ(dst[256], 0xEE);
+      });
     }
 }
 
