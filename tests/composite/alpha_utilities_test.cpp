@@ -37,14 +37,15 @@ double Get(const uint8_t* samples, size_t i, F f) {
   return double{real};
 }
 void Put(uint8_t* samples, size_t i, F f, double value) {
-  const auto word = static_cast<uint16_t>(static_cast<int>(value));
-  const auto real = static_cast<float>(value);
-  if (Depth(f) == kDepth8u)
+  if (Depth(f) == kDepth8u) {
     samples[i] = static_cast<uint8_t>(value);
-  else if (Depth(f) == kDepth15u)
+  } else if (Depth(f) == kDepth15u) {
+    const auto word = static_cast<uint16_t>(value);
     std::memcpy(samples + 2 * i, &word, 2);
-  else
+  } else {
+    const auto real = static_cast<float>(value);
     std::memcpy(samples + 4 * i, &real, 4);
+  }
 }
 
 std::vector<F> FormatsThat(const std::function<bool(F)>& fit) {

@@ -108,28 +108,19 @@ TEST_F(Lifecycle, FlagsSetTheirSwitchesAndStartUpResetsFeatures) {
   };
   const std::vector<bool> started = values();
   for (const int value : {0, 1, -5, 0}) {
-    for (uint32_t index = 0; index < 11; ++index) {
+    for (const uint32_t index : {0u, 1u, 2u, 3u, 4u, 5u, 6u, 7u, 8u, 9u, 10u, 11u, 12u, 1000u, UINT32_MAX}) {
       auto expected = values();
-      if (switches[index]) expected[index] = value != 0;
+      if (index < 11 && switches[index]) expected[index] = value != 0;
       EXPECT_EQ(VX_SetDebugFlag(index, value), VX_Success);
       EXPECT_EQ(values(), expected) << index;
     }
-    EXPECT_EQ(VX_hasSSE4(), value != 0);
-    EXPECT_EQ(VX_hasAVX(), value != 0);
-    EXPECT_EQ(VX_hasAVX2(), value != 0);
-    for (const uint32_t index : {1u, 11u, 12u, 1000u, UINT32_MAX}) {
-      const auto expected = values();
-      EXPECT_EQ(VX_SetDebugFlag(index, 1), VX_Success);
-      EXPECT_EQ(values(), expected) << index;
-    }
+    for (const bool has : {VX_hasSSE4(), VX_hasAVX(), VX_hasAVX2()}) EXPECT_EQ(has, value != 0);
   }
-  VX_SetDebugFlag(0, 1);
-  VX_SetDebugFlag(10, 1);
+  for (const uint32_t index : {0u, 10u}) VX_SetDebugFlag(index, 1);
   VX_Terminate();
   VX_Initialize();
   EXPECT_TRUE(gSwitches.motionPath && gSwitches.forceTopLeft) << "not features: kept";
-  VX_SetDebugFlag(0, 0);
-  VX_SetDebugFlag(10, 0);
+  for (const uint32_t index : {0u, 10u}) VX_SetDebugFlag(index, 0);
   EXPECT_EQ(values(), started);
   VX_Terminate();
 }
@@ -138,20 +129,16 @@ TEST_F(Lifecycle, SwitchesAndProcessorChooseTheKernels) {
   VX_Initialize();
   LimitKernelVariant(KernelVariant::Avx512);
   const auto at = [](KernelVariant variant) { return std::min(variant, ProcessorVariant()); };
-  for (const uint32_t index : {3u, 6u, 8u, 9u}) VX_SetDebugFlag(index, 1);
-  EXPECT_EQ(ActiveKernelVariant(), at(KernelVariant::Avx512));
-  VX_SetDebugFlag(8, 0);
-  EXPECT_EQ(ActiveKernelVariant(), at(KernelVariant::Avx512)) << "AVX2 is asked first";
-  VX_SetDebugFlag(9, 0);
-  EXPECT_EQ(ActiveKernelVariant(), at(KernelVariant::Sse41));
-  VX_SetDebugFlag(6, 0);
-  EXPECT_EQ(ActiveKernelVariant(), at(KernelVariant::Ssse3));
-  VX_SetDebugFlag(8, 1);
-  EXPECT_EQ(ActiveKernelVariant(), at(KernelVariant::Sse41)) << "AVX uses the SSE4.1 kernels";
-  VX_SetDebugFlag(8, 0);
-  VX_SetDebugFlag(3, 0);
-  EXPECT_EQ(ActiveKernelVariant(), KernelVariant::Plain);
-  for (const uint32_t index : {3u, 6u, 8u, 9u}) VX_SetDebugFlag(index, 1);
+  const auto with = [&](bool sse2, bool sse41, bool avx, bool avx2) {
+    VX_SetDebugFlag(3, sse2), VX_SetDebugFlag(6, sse41), VX_SetDebugFlag(8, avx), VX_SetDebugFlag(9, avx2);
+    return ActiveKernelVariant();
+  };
+  EXPECT_EQ(with(true, true, false, true), at(KernelVariant::Avx512)) << "AVX2 is asked first";
+  EXPECT_EQ(with(true, true, false, false), at(KernelVariant::Sse41));
+  EXPECT_EQ(with(true, false, true, false), at(KernelVariant::Sse41)) << "AVX uses the SSE4.1 kernels";
+  EXPECT_EQ(with(true, false, false, false), at(KernelVariant::Ssse3));
+  EXPECT_EQ(with(false, false, false, false), KernelVariant::Plain);
+  EXPECT_EQ(with(true, true, true, true), at(KernelVariant::Avx512));
   for (int i = 0; i < kKernelVariantCount; ++i) {
     const auto variant = static_cast<KernelVariant>(i);
     LimitKernelVariant(variant);

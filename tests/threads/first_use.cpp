@@ -19,7 +19,7 @@ namespace {
 
 constexpr int kThreads = 8, kWidth = 14, kHeight = 6;
 
-// Results in any order: each thread starts elsewhere.
+// Results in any order.
 class Digest {
  public:
   void Add(size_t item, const void* bytes, size_t count) {
@@ -59,34 +59,35 @@ void Convert(VX_PixelFormat from, VX_PixelFormat to, size_t item, Digest& digest
   digest.Add(item, destination.data(), destination.size());
 }
 
+// Each thread starts elsewhere.
+template <class Use>
+void ForEachItem(size_t count, size_t start, const Use& use) {
+  for (size_t i = 0; i < count; ++i) use((i + start * count / kThreads) % count);
+}
+
 void UsePlans(size_t start, Digest& digest) {
   static const std::vector<VX_PixelFormat> formats = Formats(false);
-  const size_t count = formats.size() * formats.size();
-  for (size_t i = 0; i < count; ++i) {
-    const size_t item = (i + start * count / kThreads) % count;
+  ForEachItem(formats.size() * formats.size(), start, [&](size_t item) {
     VX_PixelFormat chain[9] = {};
     int32_t length = 0;
     VX_ExplainConversion(formats[item / formats.size()], formats[item % formats.size()], 3, chain, &length);
     digest.Add(item, chain, sizeof chain);
-  }
+  });
 }
 
 void UseConversions(size_t start, Digest& digest) {
   static const std::vector<VX_PixelFormat> formats = Formats(false);
-  const size_t count = formats.size() * formats.size() / 5;  // every fifth pair meets all formats
-  for (size_t i = 0; i < count; ++i) {
-    const size_t item = (i + start * count / kThreads) % count * 5;
-    Convert(formats[item / formats.size()], formats[item % formats.size()], item, digest);
-  }
+  ForEachItem(formats.size() * formats.size() / 5, start, [&](size_t item) {  // every fifth pair meets all formats
+    Convert(formats[5 * item / formats.size()], formats[5 * item % formats.size()], item, digest);
+  });
 }
 
 void UsePlanar(size_t start, Digest& digest) {
   static const std::vector<VX_PixelFormat> formats = Formats(true);
-  for (size_t i = 0; i < formats.size(); ++i) {
-    const size_t item = (i + start * 2) % formats.size();
+  ForEachItem(formats.size(), start, [&](size_t item) {
     Convert(formats[item], VX_PixelFormat::BGRA_4444_8u, item, digest);
     Convert(VX_PixelFormat::VUYA_4444_32f_709, formats[item], item, digest);
-  }
+  });
 }
 
 void UseColour(size_t start, Digest& digest) {
@@ -97,8 +98,7 @@ void UseColour(size_t start, Digest& digest) {
   // The last two look their signals up in tables.
   static const VX::PQColorSpace pq(true, false);
   static const VX::HLGColorSpace hlg;
-  for (size_t i = 0; i < 8; ++i) {
-    const size_t item = (i + start) % 8;
+  ForEachItem(8, start, [&](size_t item) {
     const VX::ColorSpace& space = item == 6   ? static_cast<const VX::ColorSpace&>(pq)
                                   : item == 7 ? static_cast<const VX::ColorSpace&>(hlg)
                                               : VX::ColorSpace::WorkingSpace(static_cast<VX_WorkingSpace>(item));
@@ -114,7 +114,7 @@ void UseColour(size_t start, Digest& digest) {
     copy.ConvertPixelsToRec709(pixels.data(), converted.data(), count, false);
     add(item + 60);
     if (const float* luma = space.LuminanceCoeffs()) digest.Add(item + 50, luma, 3 * sizeof(float));
-  }
+  });
 }
 
 using Use = void (*)(size_t start, Digest& digest);
