@@ -143,7 +143,7 @@ Operation ToBlackOperation(float opacity) {
           [=](F f, const double* in, double* out) {
             const bool isFloat = Depth(f) == kDepth32f, full = opacity > 0.999992f;
             const double level = full ? 255 : std::floor(double{opacity} * 255 + 0.5);
-            const double scaled = Rounded(in[AlphaAt(f)] * double{std::min(opacity, isFloat ? opacity : 1.0f)});
+            const double scaled = Rounded(in[AlphaAt(f)] * (full ? 1 : double{opacity}));
             const double alpha = isFloat ? scaled : std::round(in[AlphaAt(f)] * level / 255);
             for (size_t k = 0; k < 4; ++k) {
               const double black = !IsYuv(f) || isFloat ? 0 : k == 2 ? 16 : 128;
