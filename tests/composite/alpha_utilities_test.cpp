@@ -21,10 +21,8 @@ namespace {
 
 using F = VX_PixelFormat;
 
-bool IsPixels(F f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
 // The formats that gains work in: those with an alpha that counts, in 8u and 32f.
 bool HasGainKernel(F f) { return IsPixels(f) && AlphaKind(f) != kAlphaIgnored && Depth(f) != kDepth15u; }
-bool IsMatted(F f) { return IsPixels(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
 double FullScale(F f) { return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth15u ? 32768 : 1; }
 
 double Get(const uint8_t* samples, size_t i, F f) {

@@ -33,9 +33,7 @@ bool IsSettable(F f) {
   return f == F::BGRA_4444_8u || f == F::VUYA_4444_8u || f == F::BGRA_4444_15u || f == F::BGRA_4444_32f ||
          f == F::ARGB_4444_32f;
 }
-bool IsPixel(F f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
-bool IsMatted(F f) { return IsPixel(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
-bool IsAddressed(F f) { return IsPixel(f) || f == kRgb10Format; }
+bool IsAddressed(F f) { return IsPixels(f) || f == kRgb10Format; }
 
 // The codes of frames instead of rasters and of rasters that nothing leads from or to.
 struct Refusals {
@@ -90,9 +88,9 @@ std::vector<Operation> Operations() {
        },
        kMixes},
       {"gain", 1, [](Sources s, To to) { return AlphaGain(s[0], to, to.width % 2 ? 0.4f : 3.5f); }, kMixes},
-      {"invert", 1, [](Sources s, To to) { return InvertAlpha(s[0], to); }, All(VX_ErrUnsupportedFormat), IsPixel, true,
-       true},
-      {"set alpha", 1, SetAlphaAtAnyStride, All(VX_ErrFormatNotHandled), IsPixel, true},
+      {"invert", 1, [](Sources s, To to) { return InvertAlpha(s[0], to); }, All(VX_ErrUnsupportedFormat), IsPixels,
+       true, true},
+      {"set alpha", 1, SetAlphaAtAnyStride, All(VX_ErrFormatNotHandled), IsPixels, true},
       {"matte", 1, [](Sources s, To to) { return RemoveMatte(s[0], to, matte, F::BGRA_4444_32f); },
        All(VX_ErrUnsupportedFormat), IsMatted, true},
       {"multiply", 1,

@@ -45,6 +45,10 @@ struct Image {
 // Where the alpha of a pixel of four channels is.
 inline size_t AlphaAt(VX_PixelFormat format) { return IsReversed(format) ? 0 : 3; }
 
+// Whether pixels have a fourth channel, and whether a matte colour may be taken from them.
+inline bool IsPixels(VX_PixelFormat f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
+inline bool IsMatted(VX_PixelFormat f) { return IsPixels(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
+
 // Whether a format has alpha to honour.
 inline bool CarriesAlpha(VX_PixelFormat format) {
   return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied;
