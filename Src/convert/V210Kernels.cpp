@@ -225,7 +225,33 @@ void V210ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) {
   GroupLoop<kByteGroups, 16, 12, 0, kByteOver, 0>(src, 16 * GroupsOf(count), dst, 4 * PairsOf(count), UnpackBytes());
 }
 
-// Two groups at a time, one per block; the wider targets gain nothing from four.
+#if HWY_TARGET == HWY_AVX3
+// Four groups at once. Of three vectors of samples, the ones with the same place in their words stand in different
+// lanes, every third of each vector.
+constexpr size_t kPackGroups = 4;
+
+struct PackFloats {
+  static HWY_INLINE __m512i Codes(const uint8_t* HWY_RESTRICT in, size_t index) {
+    const hn::ScalableTag<int32_t> d;
+    const auto codes = ScaleToCodes<kUyvy10Scale>(LoadVector<float>(in, index));
+    return hn::Min(hn::Max(codes, hn::Zero(d)), hn::Set(d, 1023)).raw;
+  }
+  // Lanes 0, 3, 6, ... of x, 1, 4, 7, ... of y and 2, 5, 8, ... of z, where sample `place` of each word is, in order.
+  static HWY_INLINE __m512i Samples(__m512i x, __m512i y, __m512i z, int place) {
+    const __m512i from = _mm512_add_epi32(_mm512_setr_epi32(0, 3, 6, 9, 12, 15, 2, 5, 8, 11, 14, 1, 4, 7, 10, 13),
+                                          _mm512_set1_epi32(place));
+    return _mm512_permutexvar_epi32(from, _mm512_mask_blend_epi32(0x4924, _mm512_mask_blend_epi32(0x2492, x, y), z));
+  }
+  HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
+    const __m512i a = Codes(in, 0), b = Codes(in, 1), c = Codes(in, 2);
+    const __m512i first = Samples(a, c, b, 0), second = Samples(b, a, c, 1), third = Samples(c, b, a, 2);
+    StoreVector(
+        U32{_mm512_or_si512(_mm512_or_si512(first, _mm512_slli_epi32(second, 10)), _mm512_slli_epi32(third, 20))}, out,
+        0);
+  }
+};
+#else
+// Two groups at a time, one per block.
 using PackTag = hn::CappedTag<float, 8>;
 constexpr size_t kPackGroups = hn::MaxLanes(PackTag()) / 4;
 
@@ -233,7 +259,7 @@ constexpr size_t kPackGroups = hn::MaxLanes(PackTag()) / 4;
 template <size_t kPair>
 HWY_INLINE auto LoadPairs(const uint8_t* HWY_RESTRICT groups) {
   const auto* floats = reinterpret_cast<const float*>(groups) + 4 * kPair;
-#if HWY_TARGET <= HWY_AVX2
+#if HWY_TARGET == HWY_AVX2
   const hn::Full128<float> d;
   return ScaleToCodes<kUyvy10Scale>(hn::Combine(PackTag(), hn::LoadU(d, floats + kGroupSamples), hn::LoadU(d, floats)));
 #else
@@ -272,7 +298,7 @@ struct PackFloats {
     const auto last = Saturate(hn::ReorderDemote2To(d16, middle, LoadPairs<2>(in)));
     const auto two = Pick(first, last, kTwo), third = Pick(first, last, kThird);
     // A sum of products puts the second sample above the first.
-#if HWY_TARGET <= HWY_AVX2
+#if HWY_TARGET == HWY_AVX2
     const hn::VFromD<decltype(d32)> lower{_mm256_madd_epi16(two.raw, _mm256_set1_epi32(1 | 1024 << 16))};
 #else
     const hn::VFromD<decltype(d32)> lower{_mm_madd_epi16(two.raw, _mm_set1_epi32(1 | 1024 << 16))};
@@ -280,6 +306,7 @@ struct PackFloats {
     hn::StoreU(hn::BitCast(d8, hn::Or(lower, hn::ShiftLeft<4>(hn::BitCast(d32, third)))), d8, out);
   }
 };
+#endif
 
 void Uyvy32fToV210(const uint8_t* src, uint8_t* dst, size_t count) {
   GroupLoop<kPackGroups, 48, 16, 0, 0, 0>(src, 16 * PairsOf(count), dst, 16 * GroupsOf(count), PackFloats());
