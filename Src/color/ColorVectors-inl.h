@@ -8,12 +8,14 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 
 #include <hwy/highway.h>
 
 #include "color/PixelKernels.h"
 #include "frame/PixelBlock-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -59,11 +61,14 @@ HWY_INLINE ColorVector LookupUnit(ColorVector v, const float* table, int size) {
   return hn::GatherIndex(d, table, index);
 }
 
-HWY_NOINLINE inline void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
+HWY_INLINE ColorVector Least(const RgbVectors& c) { return hn::Min(hn::Min(c.r, c.g), c.b); }
+HWY_INLINE ColorVector Most(const RgbVectors& c) { return hn::Max(hn::Max(c.r, c.g), c.b); }
+
+// Pulls toward any luma, or none.
+HWY_NOINLINE inline void PullToAnyLuma(RgbVectors& c, ColorVector y) {
   const ColorTag d;
   const auto zero = hn::Zero(d);
   const auto one = hn::Set(d, 1.0f);
-  const ColorVector y = Luma(c, luma);
   const auto negR = hn::Lt(c.r, zero), negG = hn::Lt(c.g, zero), negB = hn::Lt(c.b, zero);
   const ColorVector downR = hn::Sub(y, c.r), downG = hn::Sub(y, c.g), downB = hn::Sub(y, c.b);
   const auto stuck = hn::Or(hn::Or(hn::And(negR, hn::Eq(downR, zero)), hn::And(negG, hn::Eq(downG, zero))),
@@ -80,12 +85,26 @@ HWY_NOINLINE inline void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
   c = {move(c.r), move(c.g), move(c.b)};
 }
 
-HWY_NOINLINE inline void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
+// Where luma is not negative, the least channel decides how far to pull.
+HWY_INLINE void PullNegatives(RgbVectors& c, const LumaWeights& luma) {
+  const ColorTag d;
+  const auto zero = hn::Zero(d);
+  const ColorVector y = Luma(c, luma), least = Least(c);
+  const auto usual = hn::And(hn::Ge(y, zero), hn::Lt(y, hn::Set(d, std::numeric_limits<float>::infinity())));
+  if (HWY_UNLIKELY(!hn::AllTrue(d, usual))) return PullToAnyLuma(c, y);
+  const auto pull = hn::Lt(least, zero);
+  const ColorVector t = hn::Div(y, hn::Sub(y, least));
+  const auto move = [&](ColorVector v) HWY_ATTR {
+    return hn::IfThenElse(pull, hn::Max(hn::Add(y, hn::Mul(hn::Sub(v, y), t)), zero), v);
+  };
+  c = {move(c.r), move(c.g), move(c.b)};
+}
+
+HWY_INLINE void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
   const ColorTag d;
   const auto one = hn::Set(d, 1.0f);
   const auto over = hn::Or(hn::Or(hn::Gt(c.r, one), hn::Gt(c.g, one)), hn::Gt(c.b, one));
-  const ColorVector least = hn::Min(hn::Min(c.r, c.g), c.b);
-  const ColorVector most = hn::Max(hn::Max(c.r, c.g), c.b);
+  const ColorVector least = Least(c), most = Most(c);
   const ColorVector s = hn::Div(one, hn::Sub(most, least));
   const auto part = [&](float weight, ColorVector v)
                         HWY_ATTR { return hn::Mul(hn::Mul(hn::Set(d, weight), hn::Sub(v, least)), s); };
@@ -99,19 +118,32 @@ HWY_NOINLINE inline void ScaleOver(RgbVectors& c, const LumaWeights& luma) {
   c = {move(c.r), move(c.g), move(c.b)};
 }
 
-// Most pixels lie inside the gamut: the divisions wait for one that does not.
-HWY_INLINE void CompressGamut(RgbVectors& c, const LumaWeights& luma) {
+// stage(RgbVectors&) changes the colours of a block, which are then brought inside the gamut. Many blocks are: the
+// divisions wait for one that is not.
+template <class Stage>
+HWY_INLINE void ForEachColorIntoGamut(PixelBlock& block, const LumaWeights& luma, const Stage& stage) {
   const ColorTag d;
-  const auto zero = hn::Zero(d);
-  const auto one = hn::Set(d, 1.0f);
-  const auto negative = hn::Or(hn::Or(hn::Lt(c.r, zero), hn::Lt(c.g, zero)), hn::Lt(c.b, zero));
-  if (!hn::AllFalse(d, negative)) PullNegatives(c, luma);
-  const auto over = hn::Or(hn::Or(hn::Gt(c.r, one), hn::Gt(c.g, one)), hn::Gt(c.b, one));
-  if (!hn::AllFalse(d, over)) ScaleOver(c, luma);
+  auto least = hn::Zero(d), most = hn::Zero(d);  // NaN does not count.
+  const auto findMost = [&](const RgbVectors& c) HWY_ATTR { most = hn::Max(c.r, hn::Max(c.g, hn::Max(c.b, most))); };
+  ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+    stage(c);
+    least = hn::Min(c.r, hn::Min(c.g, hn::Min(c.b, least)));
+    findMost(c);
+  });
+  if (!hn::AllFalse(d, hn::Lt(least, hn::Zero(d)))) {
+    most = hn::Zero(d);
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
+      PullNegatives(c, luma);
+      findMost(c);
+    });
+  }
+  if (!hn::AllFalse(d, hn::Gt(most, hn::Set(d, 1.0f))))
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE { ScaleOver(c, luma); });
 }
 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #endif

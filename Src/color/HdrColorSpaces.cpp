@@ -1,4 +1,5 @@
 #include <cstring>
+#include <limits>
 
 #include "color/Engines.h"
 #include "color/HdrConstants.h"
@@ -11,18 +12,17 @@ namespace {
 constexpr float kReferenceWhiteSignal = 0.50807786f;  // ST 2084 of 100 cd/m2
 constexpr float kInverseReferenceWhiteSignal = 1.9682022f;
 
+// NaN outside the curve, as its powers give.
 float PqToLinear(float signal) {
-  const float e = Power(signal, kPqInverseM2);
-  return Power((e - kPqC1) / (kPqC2 - kPqC3 * e), kPqInverseM1) * 100.0f;
+  if (!(signal >= kPqLeastSignal && signal <= kPqMostSignal)) return std::numeric_limits<float>::quiet_NaN();
+  const float ratio = PqRatio(signal);
+  return ratio < 0.0f ? std::numeric_limits<float>::quiet_NaN() : PqLightOf(ratio);
 }
 
 // Built on first use, under the guard of its static object, and never freed.
 struct PqTable {
   PqTable() {
-    for (int i = 0; i < kPqTableSize; ++i) {
-      const float e = Power(static_cast<float>(i) * (1.0f / (kPqTableSize - 1)), kPqInverseM2);
-      light[i] = Power(plain::Most((e - kPqC1) / (kPqC2 - kPqC3 * e), 0.0f), kPqInverseM1) * 100.0f;
-    }
+    for (int i = 0; i < kPqTableSize; ++i) light[i] = PqLight(static_cast<float>(i) * (1.0f / (kPqTableSize - 1)));
   }
   float light[kPqTableSize];
 };

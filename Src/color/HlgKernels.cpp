@@ -2,6 +2,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
+#include <limits>
 
 #include "color/HdrConstants.h"
 #include "color/PixelKernels.h"
@@ -14,6 +15,7 @@
 
 #include "color/ColorVectors-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -64,7 +66,7 @@ void Rec709ToHlg(const float* src, float* dst, size_t count, const HlgJob& job) 
     });
     ApplyGain(block, gain);
     Logs(
-        block.colors, 3 * block.pixels, block.scratch,
+        block.colors, 3 * block.pixels, block.scratch, power::kNaturalLog,
         // Below the threshold the logarithm does not count; held at a positive number it costs no detour. NaN stays.
         [&](ColorVector v) VX_COLOR_STAGE {
           return hn::Max(hn::Set(d, 0.5f * kHlgThreshold), hn::Sub(hn::Abs(v), hn::Set(d, kHlgB)));
@@ -99,6 +101,7 @@ void HlgToRec709(const float* src, float* dst, size_t count, const HlgJob& job) 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 

@@ -2,6 +2,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
+#include <limits>
 
 #include "color/HdrConstants.h"
 #include "color/PixelKernels.h"
@@ -14,6 +15,7 @@
 
 #include "color/ColorVectors-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -25,11 +27,58 @@ HWY_INLINE OneLess PqEncodingRatio(ColorVector v) {
   return {hn::Div(hn::Mul(hn::Set(d, kPqBelowOne), hn::Sub(one, y)), hn::Add(hn::Mul(hn::Set(d, kPqC3), y), one))};
 }
 
-HWY_INLINE ColorVector PqDecodingRatio(ColorVector v) {
+HWY_INLINE ColorVector PqRatioOf(ColorVector t) {
   const ColorTag d;
-  const auto e = hn::Abs(v);
-  const auto below = hn::Sub(hn::Set(d, kPqC2), hn::Mul(e, hn::Set(d, kPqC3)));
-  return hn::Max(hn::Div(hn::Sub(e, hn::Set(d, kPqC1)), below), hn::Zero(d));
+  const auto constant = [&](float c) VX_COLOR_STAGE { return hn::Set(d, c); };
+  const float *n = kPqRatioAbove, *m = kPqRatioBelow;
+  const auto above = hn::Add(hn::Mul(hn::Add(hn::Mul(constant(n[2]), t), constant(n[1])), t), constant(n[0]));
+  const auto below = hn::Add(hn::Mul(hn::Add(t, constant(m[1])), t), constant(m[0]));
+  return hn::Max(hn::Div(above, below), constant(kPqLeastRatio));
+}
+
+// Signals times `scale` become the ratios of which light is a power, at least kPqLeastRatio. Without kAny it is refused
+// unless all are positive and light is in the range of floats; with it ratios carry the sign of the signal.
+template <bool kAny>
+HWY_INLINE bool PqRatios(PixelBlock& block, float scale) {
+  const ColorTag d;
+  const hn::RebindToUnsigned<ColorTag> du;
+  const size_t count = 3 * block.pixels, lanes = hn::Lanes(d);
+  const power_detail::StepArrays steps(block.scratch, count);
+  auto largest = hn::Zero(du);
+  for (size_t i = 0; i < count; i += lanes) {
+    auto v = hn::Mul(hn::Load(d, block.colors + i), hn::Set(d, scale));
+    if constexpr (kAny) {
+      v = hn::Min(hn::Max(hn::Abs(v), hn::Set(d, kPqLeastSignal)), hn::Set(d, kPqMostSignal));
+    } else {
+      largest = hn::Max(largest, hn::BitCast(du, v));
+      v = hn::Max(v, hn::Set(d, kPqLeastSignal));
+    }
+    steps.Store(power_detail::PlaceOf<false, PowerCore::Float>(v, power::kEighthsLog2), i);
+  }
+  if constexpr (!kAny) {
+    const auto most = hn::BitCast(du, hn::Set(d, kPqMostUsualSignal));
+    if (HWY_UNLIKELY(!hn::AllFalse(du, hn::Gt(largest, most)))) return false;
+  }
+  for (size_t i = 0; i < count; i += lanes) {
+    auto ratio = PqRatioOf(power_detail::Log2InEighths(steps.PlaceAt(i)));
+    if constexpr (kAny) ratio = WithSignOf(ratio, hn::Load(d, block.colors + i));
+    hn::Store(ratio, d, block.colors + i);
+  }
+  return true;
+}
+
+HWY_INLINE void PqToLight(PixelBlock& block, float scale) {
+  const size_t count = 3 * block.pixels;
+  const ColorTag d;
+  const auto light = [&](ColorVector power, ColorVector ratio)
+                         VX_COLOR_STAGE { return hn::IfThenElseZero(hn::Gt(ratio, hn::Set(d, kPqLeastRatio)), power); };
+  if (HWY_LIKELY(PqRatios<false>(block, scale)))
+    return UsualPowers<PowerCore::Float>(block.colors, count, block.scratch, kPqInverseM1, light);
+  PqRatios<true>(block, scale);
+  Powers<PowerCore::Float>(
+      block, kPqInverseM1, [](ColorVector ratio) VX_COLOR_STAGE { return hn::Abs(ratio); },
+      [&](ColorVector power, ColorVector ratio)
+          VX_COLOR_STAGE { return WithSignOf(light(power, hn::Abs(ratio)), ratio); });
 }
 
 void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
@@ -68,20 +117,11 @@ template <bool kCompressed>
 HWY_INLINE void PqToRec709Loop(const float* src, float* dst, size_t count, const PqJob& job) {
   const PqJob local = job;
   const MatrixVectors matrix(local.matrix);
-  const ColorTag d;
   ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
-    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
-      const auto scale = hn::Set(d, local.scale);
-      c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
-    });
-    SignedPowers<PowerCore::Float>(block, kPqInverseM2);
-    Powers<PowerCore::Long>(
-        block, kPqInverseM1, [](ColorVector v) VX_COLOR_STAGE { return PqDecodingRatio(v); },
-        [&](ColorVector power, ColorVector v)
-            VX_COLOR_STAGE { return WithSignOf(hn::Mul(power, hn::Set(d, 100.0f)), v); });
+    PqToLight(block, local.scale);
     if (local.applyMatrix) ForEachColor(block, matrix);
     SignedPowers<PowerCore::Float>(block, kPower1Over2_4);
-    if constexpr (kCompressed) ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE { CompressGamut(c, local.luma); });
+    if constexpr (kCompressed) ForEachColorIntoGamut(block, local.luma, [](RgbVectors&) VX_COLOR_STAGE {});
   });
 }
 
@@ -95,6 +135,7 @@ void PqToRec709Compressed(const float* src, float* dst, size_t count, const PqJo
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 
@@ -123,11 +164,7 @@ void PqTableToRec709(const float* src, float* dst, size_t count, const PqJob& jo
 }
 
 LinearRgb PqPixelToRec709(LinearRgb c, const PqJob& job) {
-  ForEachChannel(c, [&](float v) {
-    const float e = Power(std::fabs(v) * job.scale, kPqInverseM2);
-    const float ratio = Most((e - kPqC1) / (kPqC2 - kPqC3 * e), 0.0f);
-    return WithSignOf(Power(ratio, kPqInverseM1) * 100.0f, v);
-  });
+  ForEachChannel(c, [&](float v) { return WithSignOf(PqLight(std::fabs(v * job.scale)), v); });
   if (job.applyMatrix) c = Apply(job.matrix, c);
   ForEachChannel(c, [](float v) { return SignedPower(v, kPower1Over2_4); });
   return c;

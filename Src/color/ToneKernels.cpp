@@ -2,6 +2,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
+#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -22,6 +23,7 @@ constexpr float kLogRange = 0.01010101f;  // 1 / 99
 #endif
 }  // namespace vexel
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -51,23 +53,38 @@ HWY_INLINE void EncodeTones(PixelBlock& block, const ToneCurve& curve) {
       });
 }
 
-// The first half of the luminance curve: luminance to its place t on the curve, 0 at mid-tones, +-1 at the ends.
-HWY_INLINE ColorVector CurvePlace(ColorVector y, const ToneJob& job) {
+// The luminance curve: luminance to its place t, 0 at mid-tones, +-1 at the ends; a bend; and back.
+HWY_INLINE void CompressLuminances(float* values, size_t count, float* scratch, const ToneJob& job) {
   const ColorTag d;
+  const size_t lanes = hn::Lanes(d);
   const auto one = hn::Set(d, 1.0f);
-  const auto scaled = hn::Mul(hn::Mul(hn::Max(y, hn::Zero(d)), hn::Set(d, job.a)), hn::Set(d, kLogScale));
-  return hn::Sub(hn::Mul(Log10(hn::Add(scaled, one)), hn::Set(d, 0.5f)), one);
-}
-
-HWY_INLINE ColorVector BendCurve(ColorVector t, const ToneJob& job) {
-  const ColorTag d;
-  const auto one = hn::Set(d, 1.0f);
-  const auto u = hn::Min(hn::Abs(t), one);
-  const auto s = hn::Div(hn::Sub(u, hn::Set(d, job.k)), hn::Set(d, 1.0f - job.k));
-  const auto rest = hn::Sub(one, PowerAny(hn::Sub(one, s), job.shape));
-  const auto curved = hn::Add(hn::Mul(rest, hn::Set(d, 1.0f - job.c)), hn::Set(d, job.c));
-  const auto straight = hn::Mul(u, hn::Set(d, job.b));
-  return WithSignOf(hn::IfThenElse(hn::Gt(u, hn::Set(d, job.k)), curved, straight), t);
+  Logs(
+      values, count, scratch, power::kDecimalLog,
+      [&](ColorVector y) VX_COLOR_STAGE {
+        const auto light = hn::Mul(hn::Max(y, hn::Zero(d)), hn::Set(d, job.a));
+        return hn::Add(hn::Mul(light, hn::Set(d, kLogScale)), one);
+      },
+      [&](ColorVector log, ColorVector) VX_COLOR_STAGE { return hn::Sub(hn::Mul(log, hn::Set(d, 0.5f)), one); });
+  const auto distance = [&](ColorVector t) VX_COLOR_STAGE { return hn::Min(hn::Abs(t), one); };
+  HWY_ALIGN float bent[PixelBlock::kPixels];
+  for (size_t i = 0; i < count; i += lanes) {
+    const auto u = distance(hn::Load(d, values + i));
+    const auto s = hn::Div(hn::Sub(u, hn::Set(d, job.k)), hn::Set(d, 1.0f - job.k));
+    hn::Store(hn::Sub(one, s), d, bent + i);
+  }
+  PowersAny(bent, count, scratch, job.shape);
+  for (size_t i = 0; i < count; i += lanes) {
+    const auto t = hn::Load(d, values + i), u = distance(t);
+    const auto rest = hn::Sub(one, hn::Load(d, bent + i));
+    const auto curved = hn::Add(hn::Mul(rest, hn::Set(d, 1.0f - job.c)), hn::Set(d, job.c));
+    const auto straight = hn::Mul(u, hn::Set(d, job.b));
+    hn::Store(WithSignOf(hn::IfThenElse(hn::Gt(u, hn::Set(d, job.k)), curved, straight), t), d, values + i);
+  }
+  // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
+  Exps(
+      values, count, power::kLog2Of10Short, [&](ColorVector w) VX_COLOR_STAGE { return hn::Add(w, one); },
+      [&](ColorVector power, ColorVector)
+          VX_COLOR_STAGE { return hn::Mul(hn::Sub(power, one), hn::Set(d, kLogRange)); });
 }
 
 void CompressTones(const float* src, float* dst, size_t count, const ToneJob& job) {
@@ -75,22 +92,19 @@ void CompressTones(const float* src, float* dst, size_t count, const ToneJob& jo
   const MatrixVectors toXyz(local.toXyz), fromXyz(local.fromXyz);
   ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
     DecodeTones(block, local.decode);
-    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {  // From here x, t, y stand for red, green, blue.
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {  // From here x, Y, y stand for red, green, blue.
       const ColorTag d;
       toXyz(c);
       const auto sum = hn::Add(hn::Add(c.r, c.g), c.b);
       const auto bright = hn::Gt(sum, hn::Set(d, kDarkest));
-      c = {hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX)), CurvePlace(c.g, local),
+      c = {hn::IfThenElse(bright, hn::Div(c.r, sum), hn::Set(d, local.whiteX)), c.g,
            hn::IfThenElse(bright, hn::Div(c.g, sum), hn::Set(d, local.whiteY))};
     });
-    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE { c.g = BendCurve(c.g, local); });
+    CompressLuminances(block.colors + block.pixels, block.pixels, block.scratch, local);
     ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
       const ColorTag d;
-      const auto one = hn::Set(d, 1.0f);
-      const auto x = c.r, y = c.b;
-      // 10^(w + 1), not 10^(2 (w + 1)) which would invert the logarithm: the compressed range is part of the look.
-      const auto luminance = hn::Mul(hn::Sub(Exp10(hn::Add(c.g, one)), one), hn::Set(d, kLogRange));
-      const auto z = hn::Sub(hn::Sub(one, x), y);
+      const auto x = c.r, luminance = c.g, y = c.b;
+      const auto z = hn::Sub(hn::Sub(hn::Set(d, 1.0f), x), y);
       c = {hn::Div(hn::Mul(x, luminance), y), luminance, hn::Div(hn::Mul(z, luminance), y)};
       fromXyz(c);
     });
@@ -101,6 +115,7 @@ void CompressTones(const float* src, float* dst, size_t count, const ToneJob& jo
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 

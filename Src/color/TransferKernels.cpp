@@ -2,6 +2,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
+#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -23,6 +24,7 @@ constexpr float kSrgbOffset = 0.055f;
 #endif
 }  // namespace vexel
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -43,12 +45,8 @@ void PowerToPowerLoop(const float* src, float* dst, size_t count, const Transfer
   const MatrixVectors matrix(local.matrix);
   ForEachBlock(src, dst, count, [&](PixelBlock& block) VX_COLOR_STAGE {
     SignedPowersOf<kFloat>(block, local.decode);
-    if constexpr (kStep != GamutStep::None) {
-      ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {
-        matrix(c);
-        if constexpr (kStep == GamutStep::MatrixAndCompression) CompressGamut(c, local.luma);
-      });
-    }
+    if constexpr (kStep == GamutStep::Matrix) ForEachColor(block, matrix);
+    if constexpr (kStep == GamutStep::MatrixAndCompression) ForEachColorIntoGamut(block, local.luma, matrix);
     SignedPowersOf<kFloat>(block, local.encode);
   });
 }
@@ -110,6 +108,7 @@ void SrgbToPower(const float* src, float* dst, size_t count, const TransferJob& 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 

@@ -193,9 +193,15 @@ class PixelPowers {
  private:
   using DF = hn::ScalableTag<float>;
   using DI = hn::ScalableTag<int32_t>;
-  using One = power_detail::Bundle<1>;
   static constexpr PowerCore kCore = PowerCore::Float;
   static_assert(kExponent.core == kCore);
+
+  HWY_INLINE power_detail::StepArrays Steps() { return {mSteps, 3 * kPixels}; }
+
+  template <bool kSigned>
+  static HWY_INLINE F32 Magnitude(F32 v) {
+    return kSigned ? hn::Abs(v) : v;
+  }
 
   // Whether there are colours outside the range of the fast form.
   template <bool kSigned>
@@ -206,12 +212,9 @@ class PixelPowers {
       F32 blue, green, red, alpha;
       LoadPixels(from + 4 * i, blue, green, red, alpha);
       const auto store = [&](F32 v, size_t at) VX_COLOR_STAGE {
-        const One x{power_detail::Magnitude<kSigned>(v)};
-        above = hn::Max(above, power_detail::AboveFirst(x.a, kExponent));
-        One eighths, place;
-        power_detail::PlaceOf<false, kCore>(x, kExponent.log, eighths, place);
-        hn::Store(eighths.a, DF(), mCounts + at);
-        hn::Store(place.a, DF(), mRests + at);
+        const F32 x = Magnitude<kSigned>(v);
+        above = hn::Max(above, power_detail::AboveFirst(x, kExponent));
+        Steps().Store(power_detail::PlaceOf<false, kCore>(x, kExponent.log), at);
       };
       store(blue, 3 * i);
       store(green, 3 * i + kLanes<float>);
@@ -219,11 +222,8 @@ class PixelPowers {
       if constexpr (kAlpha == AlphaWrite::Keep) hn::Store(alpha, DF(), mAlpha + i);
     }
     for (size_t i = 0; i < 3 * pixels; i += kLanes<float>) {
-      One count, rest;
-      power_detail::ExponentOf<kCore>(One{hn::Load(DF(), mCounts + i)}, One{hn::Load(DF(), mRests + i)}, kExponent.log,
-                                      count, rest);
-      hn::Store(count.a, DF(), mCounts + i);
-      hn::Store(rest.a, DF(), mRests + i);
+      const auto log = power_detail::LogOf<kCore>(Steps().PlaceAt(i), kExponent.log);
+      Steps().Store(power_detail::EighthsOf<kCore>(log), i);
     }
     return !hn::AllFalse(DI(), hn::Gt(above, power_detail::FastSpan(kExponent)));
   }
@@ -235,11 +235,11 @@ class PixelPowers {
       F32 blue, green, red, alpha;
       if constexpr (kRare) LoadPixels(from + 4 * i, blue, green, red, alpha);
       const auto raise = [&](F32& v, size_t at) VX_COLOR_STAGE {
-        const One count{hn::Load(DF(), mCounts + at)}, rest{hn::Load(DF(), mRests + at)};
-        auto power = power_detail::Exp2Of<false>(count, rest).a;
+        auto power = power_detail::Exp2Of<false>(Steps().EighthsAt(at));
         if constexpr (kRare) {
-          power = power_detail::MendRare<kCore>(power, power_detail::Magnitude<kSigned>(v), kExponent);
-          power = power_detail::WithoutSignedNaN<kSigned>(power_detail::WithSign<kSigned>(power, v), v);
+          power = power_detail::MendRare<kCore>(power, Magnitude<kSigned>(v), kExponent);
+          if constexpr (kSigned) power = hn::Or(power, hn::And(v, hn::SignBit(DF())));
+          power = power_detail::WithoutSignedNaN<kSigned>(power, v);
         }
         v = power;
       };
@@ -259,8 +259,7 @@ class PixelPowers {
   }
 
   bool mNegative = false;  // A minus sign has been met; until then none is taken off or put back.
-  HWY_ALIGN float mCounts[3 * kPixels];
-  HWY_ALIGN float mRests[3 * kPixels];
+  HWY_ALIGN float mSteps[6 * kPixels];
   HWY_ALIGN float mAlpha[kPixels];
 };
 

@@ -13,7 +13,7 @@
 #include <hwy/highway.h>
 
 #include "frame/KernelTable.h"
-#include "frame/Power-inl.h"
+#include "frame/PixelBlock-inl.h"
 #include "frame/RowLoop-inl.h"
 
 #ifndef VEXEL_CONVERT_PACKERKERNELS_ONCE
@@ -451,17 +451,18 @@ void SGamut3ToSGamut3Cine(uint8_t* row, size_t count) {
 void ZyxToBgr32f(uint8_t* row, size_t count) {
   static constexpr PowerExponent kDecode(kDcdmGamma), kEncode(kDisplayGamma);
   const hn::ScalableTag<float> d;
-  InPlaceLoop<HWY_MAX_BYTES / 4, 16>(row, count, [&](uint8_t* p) HWY_ATTR {
-    auto* pixels = reinterpret_cast<float*>(p);
-    hn::VFromD<decltype(d)> z, y, x, rest;
-    hn::LoadInterleaved4(d, pixels, z, y, x, rest);
-    SignedPower3<PowerCore::Float>(x, y, z, kDecode);
-    const auto light = [&](const float* m) HWY_ATTR {
-      return hn::Add(hn::Add(hn::Mul(hn::Set(d, m[0]), x), hn::Mul(hn::Set(d, m[1]), y)), hn::Mul(hn::Set(d, m[2]), z));
-    };
-    auto r = light(kXyzToRgb[0]), g = light(kXyzToRgb[1]), b = light(kXyzToRgb[2]);
-    SignedPower3<PowerCore::Float>(r, g, b, kEncode);
-    hn::StoreInterleaved4(b, g, r, rest, d, pixels);
+  auto* pixels = reinterpret_cast<float*>(row);
+  ForEachBlock(pixels, pixels, count, [&](PixelBlock& block) VX_COLOR_STAGE {
+    SignedPowers<PowerCore::Float>(block, kDecode);
+    ForEachColor(block, [&](RgbVectors& c) VX_COLOR_STAGE {  // On entry X, Y, Z stand for red, green, blue.
+      const RgbVectors xyz = c;
+      const auto light = [&](const float* m) VX_COLOR_STAGE {
+        return hn::Add(hn::Add(hn::Mul(hn::Set(d, m[0]), xyz.r), hn::Mul(hn::Set(d, m[1]), xyz.g)),
+                       hn::Mul(hn::Set(d, m[2]), xyz.b));
+      };
+      c = {light(kXyzToRgb[0]), light(kXyzToRgb[1]), light(kXyzToRgb[2])};
+    });
+    SignedPowers<PowerCore::Float>(block, kEncode);
   });
 }
 

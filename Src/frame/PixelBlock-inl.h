@@ -14,6 +14,7 @@
 
 #include "frame/Power-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -41,17 +42,9 @@ struct PixelBlock {
   bool negative;  // A minus sign has been met, in this block or an earlier one.
   HWY_ALIGN float colors[3 * kPixels];
   HWY_ALIGN float alpha[kPixels];
-  HWY_ALIGN float scratch[6 * kPixels];
+  HWY_ALIGN float scratch[3 * kPowerScratch * kPixels];
 };
 
-#if HWY_TARGET == HWY_SCALAR
-HWY_INLINE void LoadPixels(const float* from, ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
-  hn::LoadInterleaved4(ColorTag(), from, v0, v1, v2, v3);
-}
-HWY_INLINE void StorePixels(ColorVector v0, ColorVector v1, ColorVector v2, ColorVector v3, float* to) {
-  hn::StoreInterleaved4(v0, v1, v2, v3, ColorTag(), to);
-}
-#else
 // 4 x 4 transposition within each 128 bits of four vectors.
 HWY_INLINE void Transpose4(ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
   const ColorTag d;
@@ -83,7 +76,6 @@ HWY_INLINE void StorePixels(ColorVector v0, ColorVector v1, ColorVector v2, Colo
   hn::StoreU(v2, d, to + 2 * lanes);
   hn::StoreU(v3, d, to + 3 * lanes);
 }
-#endif
 
 HWY_INLINE RgbVectors LoadColors(const PixelBlock& block, size_t i) {
   const ColorTag d;
@@ -200,5 +192,6 @@ HWY_INLINE void Powers(PixelBlock& block, const PowerExponent& y, const Prepare&
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #endif

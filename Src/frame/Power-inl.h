@@ -15,6 +15,7 @@
 #include "frame/Power.h"
 #include "frame/RowLoop-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -28,58 +29,6 @@ namespace hn = hwy::HWY_NAMESPACE;
 struct OneLess {
   hn::Vec<hn::ScalableTag<float>> u;
 };
-
-#if HWY_TARGET == HWY_SCALAR  // Compiled by foreach_target as the baseline, never chosen.
-
-namespace power_detail {
-using V = hn::Vec<hn::ScalableTag<float>>;
-}
-namespace power_detail {
-template <PowerCore kCore, bool kSigned>
-HWY_INLINE V Power1(V x, const PowerExponent& y) {
-  return V(kSigned ? vexel::SignedPower(x.raw, y) : vexel::Power(x.raw, y));
-}
-template <PowerCore kCore>
-HWY_INLINE void SignedPower3(V& a, V& b, V& c, const PowerExponent& y) {
-  a = Power1<kCore, true>(a, y);
-  b = Power1<kCore, true>(b, y);
-  c = Power1<kCore, true>(c, y);
-}
-template <PowerCore kCore>
-HWY_INLINE V PowerOf(V x, const PowerExponent& y) {
-  return Power1<kCore, false>(x, y);
-}
-template <PowerCore kCore>
-HWY_INLINE V PowerOf(OneLess x, const PowerExponent& y) {
-  return V(vexel::PowerOfOneLess(x.u.raw, y));
-}
-enum class Signs : uint8_t { ByFinish, Kept, Refused };
-template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
-HWY_INLINE bool PowerLoops(float* values, size_t count, float*, const PowerExponent& y, const Prepare& prepare,
-                           const Finish& finish) {
-  for (size_t i = 0; i < count; ++i) values[i] = finish(PowerOf<kCore>(prepare(V(values[i])), y), V(values[i])).raw;
-  return kSigns != Signs::Refused;
-}
-template <class Prepare, class Finish>
-HWY_INLINE void LogLoops(float* values, size_t count, float*, const vexel::power::ScaledLog2&, const Prepare& prepare,
-                         const Finish& finish) {
-  for (size_t i = 0; i < count; ++i) values[i] = finish(V(vexel::Log(prepare(V(values[i])).raw)), V(values[i])).raw;
-}
-template <bool kSigned>
-HWY_INLINE V Magnitude(V x) {
-  return kSigned ? hn::Abs(x) : x;
-}
-template <bool kSigned>
-HWY_INLINE V WithSign(V power, V x) {
-  return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(hn::ScalableTag<float>()))) : power;
-}
-}  // namespace power_detail
-HWY_INLINE power_detail::V Log(power_detail::V x) { return power_detail::V(vexel::Log(x.raw)); }
-HWY_INLINE power_detail::V Log10(power_detail::V x) { return power_detail::V(vexel::Log10(x.raw)); }
-HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::V(vexel::Exp(x.raw)); }
-HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::V(vexel::Exp10(x.raw)); }
-
-#else
 
 // Tables of eight floats, looked up without memory access. The index is the low three bits of each lane; what stands
 // above them does not matter.
@@ -152,92 +101,27 @@ HWY_INLINE V ScaleByEighths(V mantissa, VI countBits) {
   return hn::BitCast(d, result);
 }
 
-// Several vectors that advance together. The chain of a power is longer than the scheduler of a processor looks ahead,
-// so three powers overlap only if the program lists their instructions step by step. Map keeps that order: the empty
-// statements pin each step's results before the next step.
-template <size_t N>
-struct Bundle {
-  V a;
-};
-template <>
-struct Bundle<3> {  // Not an array, which compilers keep in memory.
-  V a, b, c;
-};
-
-HWY_INLINE void EndStep(V& v) {
-#if defined(__GNUC__)
-  asm volatile("" : "+v"(v.raw));
-#endif
-}
-
-template <size_t N, class F, class... Bundles>
-HWY_INLINE Bundle<N> Map(const F& f, const Bundles&... args) {
-  if constexpr (N == 1) {
-    return {f(args.a...)};
-  } else {
-    static_assert(N == 3);
-    return {f(args.a...), f(args.b...), f(args.c...)};
-  }
-}
-
-template <size_t N, class... Bundles>
-HWY_INLINE void EndStep(Bundles&... bundles) {
-  if constexpr (N == 3) {
-    (EndStep(bundles.a), ...);
-    (EndStep(bundles.b), ...);
-    (EndStep(bundles.c), ...);
-  }
-}
-
 // The bits of x from the first segment on. kAll: denormals too.
-template <bool kAll, size_t N>
-HWY_INLINE Bundle<N> SegmentBits(const Bundle<N>& x) {
+template <bool kAll>
+HWY_INLINE VI SegmentBits(V x) {
   const D d;
   const DI di;
-  return Map<N>(
-      [&](V v) VX_POWER_STEP {
-        VI i = hn::BitCast(di, v);
-        if constexpr (kAll) {
-          const VI renormalised = hn::Sub(hn::BitCast(di, hn::ConvertTo(d, i)), hn::Set(di, 149 << 23));
-          i = hn::IfThenElse(hn::Lt(i, hn::Set(di, 0x00800000)), renormalised, i);
-        }
-        return hn::BitCast(d, hn::Sub(i, hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits))));
-      },
-      x);
-}
-
-// Eighths of an octave, as integers.
-template <size_t N>
-HWY_INLINE Bundle<N> EighthsOf(const Bundle<N>& bits) {
-  return Map<N>([](V v) VX_POWER_STEP { return hn::BitCast(D(), hn::ShiftRight<20>(hn::BitCast(DI(), v))); }, bits);
+  VI i = hn::BitCast(di, x);
+  if constexpr (kAll) {
+    const VI renormalised = hn::Sub(hn::BitCast(di, hn::ConvertTo(d, i)), hn::Set(di, 149 << 23));
+    i = hn::IfThenElse(hn::Lt(i, hn::Set(di, 0x00800000)), renormalised, i);
+  }
+  return hn::Sub(i, hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits)));
 }
 
 // The mantissa less the centre of its segment.
-template <size_t N>
-HWY_INLINE Bundle<N> FractionOf(const Bundle<N>& bits, const Bundle<N>& eighths) {
+HWY_INLINE V FractionOf(VI bits, const EighthIndex& index) {
   const D d;
   const DI di;
-  return Map<N>(
-      [&](V v, V k) VX_POWER_STEP {
-        const VI mask = hn::Set(di, static_cast<int32_t>(vexel::power::kMantissaMask));
-        const VI first = hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits));
-        const V mantissa = hn::BitCast(d, hn::Add(hn::And(hn::BitCast(di, v), mask), first));
-        return hn::Sub(mantissa, LookupEighth(vexel::power::kCentre, MakeEighthIndex(hn::BitCast(di, k))));
-      },
-      bits, eighths);
-}
-
-// factor * eighths + offsets[segment].
-template <size_t N>
-HWY_INLINE Bundle<N> Linear(float factor, const float* offsets, const Bundle<N>& eighths) {
-  const D d;
-  const DI di;
-  return Map<N>(
-      [&](V k) VX_POWER_STEP {
-        const V product = hn::Mul(hn::Set(d, factor), hn::ConvertTo(d, hn::BitCast(di, k)));
-        return offsets ? hn::Add(product, LookupEighth(offsets, MakeEighthIndex(hn::BitCast(di, k)))) : product;
-      },
-      eighths);
+  const VI mask = hn::Set(di, static_cast<int32_t>(vexel::power::kMantissaMask));
+  const VI first = hn::Set(di, static_cast<int32_t>(vexel::power::kFirstBits));
+  const V mantissa = hn::BitCast(d, hn::Add(hn::And(bits, mask), first));
+  return hn::Sub(mantissa, LookupEighth(vexel::power::kCentre, index));
 }
 
 // c[0] + v * c[1] + v^2 * c[2] + v^3 * c[3].
@@ -248,128 +132,96 @@ HWY_INLINE V Cubic(V v, V square, const float* c) {
   return hn::Add(low, hn::Mul(square, high));
 }
 
+// A power goes in three steps, which loops over many vectors take one after the other: more vectors are in flight then
+// than a scheduler finds in one long chain. The first: x to eighths of an octave and its place in the segment, in the
+// float form already multiplied by the slope.
+struct Place {
+  VI eighths;
+  V place;
+};
+
+HWY_INLINE V ValueOf(V x) { return x; }
+HWY_INLINE V ValueOf(OneLess x) { return hn::Sub(hn::Set(D(), 1.0f), x.u); }
+// The fraction with what the rounding of the argument took away.
+HWY_INLINE V WithRest(V fraction, V) { return fraction; }
+HWY_INLINE V WithRest(V fraction, OneLess x) {
+  const V one = hn::Set(D(), 1.0f);
+  return hn::Add(fraction, hn::Sub(hn::Sub(one, hn::Sub(one, x.u)), x.u));
+}
+
+template <bool kAll, PowerCore kCore, class Argument, class Log>
+HWY_INLINE Place PlaceOf(Argument x, const Log& log) {
+  const VI bits = SegmentBits<kAll>(ValueOf(x));
+  const VI eighths = hn::ShiftRight<20>(bits);
+  const EighthIndex index = MakeEighthIndex(eighths);
+  const V fraction = FractionOf(bits, index);
+  if constexpr (kCore == PowerCore::Float) return {eighths, hn::Mul(fraction, LookupEighth(log.slopes, index))};
+  return {eighths, WithRest(fraction, x)};
+}
+
+// The second: scale * log2(x) - shift = large + middle + small, as whole eighths and the rest. The float form has no
+// middle.
+struct LogSum {
+  V large, middle, small;
+};
+
 // start + w^2 * series(w).
-template <size_t N>
-HWY_INLINE Bundle<N> Curve(const Bundle<N>& start, const Bundle<N>& w, const vexel::power::ScaledLog2& log) {
-  return Map<N>(
-      [&](V a, V v) VX_POWER_STEP {
-        const V square = hn::Mul(v, v);
-        return hn::Add(a, hn::Mul(square, Cubic(v, square, log.series)));
-      },
-      start, w);
+HWY_INLINE V Curve(V start, V w, const vexel::power::ScaledLog2& log) {
+  const V square = hn::Mul(w, w);
+  return hn::Add(start, hn::Mul(square, Cubic(w, square, log.series)));
 }
 
-// A power goes in three thirds, which loops over many vectors take one after the other. The first: x to eighths of an
-// octave and its place in the segment, in the float form already multiplied by the slope.
-template <bool kAll, PowerCore kCore, size_t N>
-HWY_INLINE void PlaceOf(const Bundle<N>& x, const vexel::power::ScaledLog2& log, Bundle<N>& eighths, Bundle<N>& place) {
-  const auto bits = SegmentBits<kAll>(x);
-  eighths = EighthsOf(bits);
-  place = FractionOf(bits, eighths);
+template <PowerCore kCore>
+HWY_INLINE LogSum LogOf(const Place& x, const vexel::power::ScaledLog2& log) {
+  const D d;
+  const EighthIndex index = MakeEighthIndex(x.eighths);
+  const V k = hn::ConvertTo(d, x.eighths);
+  const V large = hn::Mul(hn::Set(d, log.eighthHigh), k);
+  const V offset = hn::Add(hn::Mul(hn::Set(d, log.eighthLow), k), LookupEighth(log.offsets, index));
   if constexpr (kCore == PowerCore::Float) {
-    place = Map<N>(
-        [&](V r, V k)
-            VX_POWER_STEP { return hn::Mul(r, LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(DI(), k)))); },
-        place, eighths);
-  }
-}
-
-// scale * log2(x) - shift as a sum, large + small.
-template <size_t N>
-HWY_INLINE void FloatLog(const Bundle<N>& eighths, const Bundle<N>& w, const vexel::power::ScaledLog2& log,
-                         Bundle<N>& large, Bundle<N>& small) {
-  large = Linear(log.eighthHigh, nullptr, eighths);
-  auto offset = Linear(log.eighthLow, log.offsets, eighths);
-  EndStep<N>(large, offset);
-  const auto curve = Curve(w, w, log);
-  small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
-}
-
-template <size_t N>
-HWY_INLINE void LongLog(const Bundle<N>& eighths, const Bundle<N>& fraction, const vexel::power::ScaledLog2& log,
-                        Bundle<N>& large, Bundle<N>& middle, Bundle<N>& small) {
-  const DI di;
-  const V mask = hn::BitCast(D(), hn::Set(di, static_cast<int32_t>(0xfffff000)));
-  middle = Map<N>(
-      [&](V r, V k) VX_POWER_STEP {
-        return hn::Mul(hn::And(r, mask), LookupEighth(log.slopes, MakeEighthIndex(hn::BitCast(di, k))));
-      },
-      fraction, eighths);
-  auto rest = Map<N>(
-      [&](V r, V k) VX_POWER_STEP {
-        const EighthIndex index = MakeEighthIndex(hn::BitCast(di, k));
-        return hn::Add(hn::Mul(hn::Sub(r, hn::And(r, mask)), LookupEighth(log.slopes, index)),
-                       hn::Mul(r, LookupEighth(log.slopeRests, index)));
-      },
-      fraction, eighths);
-  large = Linear(log.eighthHigh, log.offsetsHigh, eighths);
-  auto offset = Linear(log.eighthLow, log.offsets, eighths);
-  EndStep<N>(rest, large, middle, offset);
-  const auto w = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, middle, rest);
-  const auto curve = Curve(rest, w, log);
-  small = Map<N>([](V a, V b) VX_POWER_STEP { return hn::Add(a, b); }, offset, curve);
-}
-
-// A sum as n / 8 + f, |f| at most 1/16; `count` is n / 8 + kEighthsMagic.
-template <size_t N>
-HWY_INLINE void CountEighths(const Bundle<N>& large, const Bundle<N>& small, Bundle<N>& count, Bundle<N>& f) {
-  const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
-  count = Map<N>([&](V a, V c) VX_POWER_STEP { return hn::Add(hn::Add(a, c), magic); }, large, small);
-  f = Map<N>([&](V a, V n, V c) VX_POWER_STEP { return hn::Add(hn::Sub(a, hn::Sub(n, magic)), c); }, large, count,
-             small);
-}
-
-// The second third of a power: its logarithm, counted in eighths.
-template <PowerCore kCore, size_t N>
-HWY_INLINE void ExponentOf(const Bundle<N>& eighths, const Bundle<N>& place, const vexel::power::ScaledLog2& log,
-                           Bundle<N>& count, Bundle<N>& f) {
-  Bundle<N> large, small;
-  if constexpr (kCore == PowerCore::Float) {
-    FloatLog(eighths, place, log, large, small);
-    CountEighths(large, small, count, f);
+    return {large, large, hn::Add(offset, Curve(x.place, x.place, log))};
   } else {
-    Bundle<N> middle;
-    LongLog(eighths, place, log, large, middle, small);
-    const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
-    count = Map<N>([&](V a, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Add(a, b), c), magic); }, large,
-                   middle, small);
-    f = Map<N>([&](V a, V n, V b, V c) VX_POWER_STEP { return hn::Add(hn::Add(hn::Sub(a, hn::Sub(n, magic)), b), c); },
-               large, count, middle, small);
+    const V top = hn::And(x.place, hn::BitCast(d, hn::Set(DI(), static_cast<int32_t>(0xfffff000))));
+    const V slope = LookupEighth(log.slopes, index);
+    const V middle = hn::Mul(top, slope);
+    const V rest =
+        hn::Add(hn::Mul(hn::Sub(x.place, top), slope), hn::Mul(x.place, LookupEighth(log.slopeRests, index)));
+    return {hn::Add(large, LookupEighth(log.offsetsHigh, index)), middle,
+            hn::Add(offset, Curve(rest, hn::Add(middle, rest), log))};
   }
 }
 
-// The last third: 2^(n / 8 + f + kRootShift). kAll: results that overflow or are denormal too.
-template <bool kAll, size_t N>
-HWY_INLINE Bundle<N> Exp2Of(const Bundle<N>& count, const Bundle<N>& f) {
+// n / 8 + f, |f| at most 1/16; `count` is n / 8 + kEighthsMagic.
+struct Eighths {
+  V count, f;
+};
+template <PowerCore kCore>
+HWY_INLINE Eighths EighthsOf(const LogSum& sum) {
+  const V magic = hn::Set(D(), vexel::power::kEighthsMagic);
+  constexpr bool kLong = kCore == PowerCore::Long;
+  const V upper = kLong ? hn::Add(sum.large, sum.middle) : sum.large;
+  const V count = hn::Add(hn::Add(upper, sum.small), magic);
+  const V left = hn::Sub(sum.large, hn::Sub(count, magic));
+  return {count, hn::Add(kLong ? hn::Add(left, sum.middle) : left, sum.small)};
+}
+
+// The last step: 2^(n / 8 + f + kRootShift). kAll: results that overflow or are denormal too.
+template <bool kAll>
+HWY_INLINE V Exp2Of(const Eighths& t) {
   const D d;
   const DI di;
-  const auto g = Map<N>([&](V v) VX_POWER_STEP { return hn::Mul(v, Cubic(v, hn::Mul(v, v), vexel::power::kExp2)); }, f);
-  return Map<N>(
-      [&](V n, V part) VX_POWER_STEP {
-        const VI bits = hn::BitCast(di, n);
-        const EighthIndex index = MakeEighthIndex(bits);
-        if constexpr (!kAll) {
-          // The count shifted to the exponent's place; the eighths that come along are taken out of the table's
-          // entries.
-          const VI shifted = hn::BitCast(di, LookupEighth(kShiftedRoot.entries, index));
-          const V root = hn::BitCast(d, hn::Add(shifted, hn::ShiftLeft<20>(bits)));
-          return hn::Add(root, hn::Mul(root, part));
-        } else {
-          const V root = LookupEighth(vexel::power::kRoot, index);
-          return ScaleByEighths(hn::Add(root, hn::Mul(root, part)), bits);
-        }
-      },
-      count, g);
-}
-
-template <bool kAll, PowerCore kCore, size_t N>
-HWY_INLINE Bundle<N> PowersOf(const Bundle<N>& x, const PowerExponent& y) {
-  Bundle<N> eighths, place, count, f;
-  PlaceOf<kAll, kCore>(x, y.log, eighths, place);
-  EndStep<N>(eighths, place);
-  ExponentOf<kCore>(eighths, place, y.log, count, f);
-  EndStep<N>(count, f);
-  return Exp2Of<kAll>(count, f);
+  const V part = hn::Mul(t.f, Cubic(t.f, hn::Mul(t.f, t.f), vexel::power::kExp2));
+  const VI bits = hn::BitCast(di, t.count);
+  const EighthIndex index = MakeEighthIndex(bits);
+  if constexpr (!kAll) {
+    // The count shifted to the exponent's place; the eighths that come along are taken out of the table's entries.
+    const VI shifted = hn::BitCast(di, LookupEighth(kShiftedRoot.entries, index));
+    const V root = hn::BitCast(d, hn::Add(shifted, hn::ShiftLeft<20>(bits)));
+    return hn::Add(root, hn::Mul(root, part));
+  } else {
+    const V root = LookupEighth(vexel::power::kRoot, index);
+    return ScaleByEighths(hn::Add(root, hn::Mul(root, part)), bits);
+  }
 }
 
 // Any argument at all.
@@ -381,18 +233,18 @@ HWY_NOINLINE V PowerAll(V x, const PowerExponent& y) {
   const auto isZero = hn::Eq(hn::Add(given, given), hn::Zero(di));
   const VI bits = hn::IfThenZeroElse(isZero, given);
   const VI infinity = hn::Set(di, 0x7f800000);
-  VI result = hn::BitCast(di, PowersOf<true, kCore>(Bundle<1>{hn::BitCast(d, bits)}, y).a);
+  const LogSum log = LogOf<kCore>(PlaceOf<true, kCore>(hn::BitCast(d, bits), y.log), y.log);
+  VI result = hn::BitCast(di, Exp2Of<true>(EighthsOf<kCore>(log)));
   result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, hn::IfThenZeroElse(isZero, result));
   result = hn::IfThenElse(hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, hn::Zero(di))), hn::Set(di, 0x7fc00000), result);
   return hn::BitCast(d, result);
 }
 
-template <bool kSigned>
-HWY_NOINLINE V PowerLaneByLane(V x, const PowerExponent& y) {
+HWY_NOINLINE inline V PowerLaneByLane(V x, const PowerExponent& y) {
   const D d;
   HWY_ALIGN float lanes[hn::MaxLanes(D())];
   hn::Store(x, d, lanes);
-  for (float& lane : lanes) lane = kSigned ? vexel::SignedPower(lane, y) : vexel::Power(lane, y);
+  for (float& lane : lanes) lane = vexel::Power(lane, y);
   return hn::Load(d, lanes);
 }
 
@@ -405,21 +257,6 @@ HWY_INLINE VI AboveFirst(V magnitude, const PowerExponent& y) {
 }
 HWY_INLINE VI FastSpan(const PowerExponent& y) {
   return hn::Set(DI(), static_cast<int32_t>(y.lastBits - y.firstBits + kFlip));
-}
-
-template <bool kSigned>
-HWY_INLINE V Magnitude(V x) {
-  return kSigned ? hn::Abs(x) : x;
-}
-
-template <bool kSigned>
-HWY_INLINE V WithSign(V power, V x) {
-  return kSigned ? hn::Or(power, hn::And(x, hn::SignBit(D()))) : power;
-}
-
-template <PowerCore kCore, bool kSigned>
-HWY_INLINE V FastPower(V x, const PowerExponent& y) {
-  return WithSign<kSigned>(PowersOf<false, kCore>(Bundle<1>{Magnitude<kSigned>(x)}, y).a, x);
 }
 
 // The fast power of a vector that may have arguments outside the fast range, put right. Zeros, the usual ones, cost
@@ -441,58 +278,19 @@ HWY_INLINE V WithoutSignedNaN(V power, V x) {
   return kSigned ? hn::IfThenElse(hn::IsNaN(x), hn::BitCast(D(), hn::Set(DI(), 0x7fc00000)), power) : power;
 }
 
-template <PowerCore kCore, bool kSigned>
-HWY_NOINLINE V RarePower(V x, const PowerExponent& y) {
-  const V magnitude = Magnitude<kSigned>(x);
-  const V power = MendRare<kCore>(PowersOf<false, kCore>(Bundle<1>{magnitude}, y).a, magnitude, y);
-  return WithoutSignedNaN<kSigned>(WithSign<kSigned>(power, x), x);
+// 8 log2(x), of a place by the float form.
+HWY_INLINE V Log2InEighths(const Place& x) {
+  const D d;
+  const vexel::power::EighthsLog2& log = vexel::power::kEighthsLog2;
+  const V w = x.place, square = hn::Mul(w, w);
+  const V low = hn::Add(hn::Set(d, log.series[0]), hn::Mul(w, hn::Set(d, log.series[1])));
+  const V curve = hn::Add(w, hn::Mul(square, hn::Add(low, hn::Mul(square, hn::Set(d, log.series[2])))));
+  return hn::Add(hn::ConvertTo(d, x.eighths), hn::Add(LookupEighth(log.offsets, MakeEighthIndex(x.eighths)), curve));
 }
 
-template <PowerCore kCore, bool kSigned>
-HWY_INLINE V Power1(V x, const PowerExponent& y) {
-  if constexpr (kCore == PowerCore::Scalar) {
-    return PowerLaneByLane<kSigned>(x, y);
-  } else {
-    const VI above = AboveFirst(Magnitude<kSigned>(x), y);
-    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Gt(above, FastSpan(y))))) return RarePower<kCore, kSigned>(x, y);
-    return FastPower<kCore, kSigned>(x, y);
-  }
-}
-
-template <PowerCore kCore>
-HWY_INLINE void SignedPower3(V& a, V& b, V& c, const PowerExponent& y) {
-  if constexpr (kCore == PowerCore::Scalar) {
-    a = PowerLaneByLane<true>(a, y);
-    b = PowerLaneByLane<true>(b, y);
-    c = PowerLaneByLane<true>(c, y);
-  } else {
-    const VI above = hn::Max(hn::Max(AboveFirst(Magnitude<true>(a), y), AboveFirst(Magnitude<true>(b), y)),
-                             AboveFirst(Magnitude<true>(c), y));
-    if (HWY_UNLIKELY(!hn::AllFalse(DI(), hn::Gt(above, FastSpan(y))))) {
-      a = RarePower<kCore, true>(a, y);
-      b = RarePower<kCore, true>(b, y);
-      c = RarePower<kCore, true>(c, y);
-    } else {
-      const Bundle<3> powers =
-          PowersOf<false, kCore>(Bundle<3>{Magnitude<true>(a), Magnitude<true>(b), Magnitude<true>(c)}, y);
-      a = WithSign<true>(powers.a, a);
-      b = WithSign<true>(powers.b, b);
-      c = WithSign<true>(powers.c, c);
-    }
-  }
-}
-
-// The loops keep more vectors in flight than a scheduler finds in one long chain. kSigns: what they do with negative
-// values; false is returned, with nothing done, where they refuse them.
-enum class Signs : uint8_t { ByFinish, Kept, Refused };
-
-HWY_INLINE V ValueOf(V x) { return x; }
-HWY_INLINE V ValueOf(OneLess x) { return hn::Sub(hn::Set(D(), 1.0f), x.u); }
-// The place in a segment with what the rounding of the argument took away.
-HWY_INLINE V WithRest(V place, V, V) { return place; }
-HWY_INLINE V WithRest(V place, V rounded, OneLess x) {
-  return hn::Add(place, hn::Sub(hn::Sub(hn::Set(D(), 1.0f), rounded), x.u));
-}
+// What loops do with negative values; false is returned, with nothing done, where they refuse them. Absent: the caller
+// knows that all arguments are positive and give normal results.
+enum class Signs : uint8_t { ByFinish, Kept, Refused, Absent };
 
 HWY_INLINE bool AnyNegative(const float* values, size_t count) {
   const D d;
@@ -502,6 +300,26 @@ HWY_INLINE bool AnyNegative(const float* values, size_t count) {
   return !hn::AllFalse(di, hn::Lt(all, hn::Zero(di)));
 }
 
+// What the steps leave of many vectors: two arrays.
+class StepArrays {
+ public:
+  HWY_INLINE StepArrays(float* scratch, size_t count) : mFirst(scratch), mSecond(scratch + count) {}
+  HWY_INLINE void Store(const Place& place, size_t i) const { Store(hn::BitCast(D(), place.eighths), place.place, i); }
+  HWY_INLINE void Store(const Eighths& eighths, size_t i) const { Store(eighths.count, eighths.f, i); }
+  HWY_INLINE Place PlaceAt(size_t i) const {
+    return {hn::BitCast(DI(), hn::Load(D(), mFirst + i)), hn::Load(D(), mSecond + i)};
+  }
+  HWY_INLINE Eighths EighthsAt(size_t i) const { return {hn::Load(D(), mFirst + i), hn::Load(D(), mSecond + i)}; }
+
+ private:
+  HWY_INLINE void Store(V first, V second, size_t i) const {
+    hn::Store(first, D(), mFirst + i);
+    hn::Store(second, D(), mSecond + i);
+  }
+  float* HWY_RESTRICT mFirst;
+  float* HWY_RESTRICT mSecond;
+};
+
 template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
 HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
                            const PowerExponent& y, const Prepare& prepare, const Finish& finish) {
@@ -509,41 +327,30 @@ HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
   const DI di;
   const size_t lanes = hn::Lanes(d);
   constexpr bool kSigned = kSigns == Signs::Kept;
-  float* HWY_RESTRICT scratch2 = scratch + count;
   if constexpr (kCore == PowerCore::Scalar) {
     if (kSigns == Signs::Refused && AnyNegative(values, count)) return false;
     for (size_t i = 0; i < count; i += lanes) {
       const V v = hn::Load(d, values + i);
-      hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane<false>(ValueOf(prepare(v)), y), v), v), d, values + i);
+      hn::Store(WithoutSignedNaN<kSigned>(finish(PowerLaneByLane(ValueOf(prepare(v)), y), v), v), d, values + i);
     }
   } else {
+    const StepArrays steps(scratch, count);
     VI above = hn::Set(di, INT32_MIN);
     for (size_t i = 0; i < count; i += lanes) {
-      const auto argument = prepare(hn::Load(d, values + i));
-      const Bundle<1> x{ValueOf(argument)};
-      above = hn::Max(above, AboveFirst(x.a, y));
-      Bundle<1> eighths, place;
-      PlaceOf<false, kCore>(x, y.log, eighths, place);
-      hn::Store(eighths.a, d, scratch + i);
-      hn::Store(WithRest(place.a, x.a, argument), d, scratch2 + i);
+      const auto x = prepare(hn::Load(d, values + i));
+      if constexpr (kSigns != Signs::Absent) above = hn::Max(above, AboveFirst(ValueOf(x), y));
+      steps.Store(PlaceOf<false, kCore>(x, y.log), i);
     }
-    const bool rare = !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
+    const bool rare = kSigns != Signs::Absent && !hn::AllFalse(di, hn::Gt(above, FastSpan(y)));
     if (kSigns == Signs::Refused && HWY_UNLIKELY(rare) && AnyNegative(values, count)) return false;
-    for (size_t i = 0; i < count; i += lanes) {
-      Bundle<1> whole, f;
-      ExponentOf<kCore>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}, y.log, whole, f);
-      hn::Store(whole.a, d, scratch + i);
-      hn::Store(f.a, d, scratch2 + i);
-    }
-    const auto last = [&](size_t i) VX_POWER_STEP {
-      return Exp2Of<false>(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}).a;
-    };
+    for (size_t i = 0; i < count; i += lanes) steps.Store(EighthsOf<kCore>(LogOf<kCore>(steps.PlaceAt(i), y.log)), i);
     if (HWY_LIKELY(!rare)) {
-      for (size_t i = 0; i < count; i += lanes) hn::Store(finish(last(i), hn::Load(d, values + i)), d, values + i);
+      for (size_t i = 0; i < count; i += lanes)
+        hn::Store(finish(Exp2Of<false>(steps.EighthsAt(i)), hn::Load(d, values + i)), d, values + i);
     } else {
       for (size_t i = 0; i < count; i += lanes) {
         const V v = hn::Load(d, values + i);
-        const V power = MendRare<kCore>(last(i), ValueOf(prepare(v)), y);
+        const V power = MendRare<kCore>(Exp2Of<false>(steps.EighthsAt(i)), ValueOf(prepare(v)), y);
         hn::Store(WithoutSignedNaN<kSigned>(finish(power, v), v), d, values + i);
       }
     }
@@ -551,32 +358,23 @@ HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
   return true;
 }
 
-HWY_INLINE V SumOfLog(V large, V middle, V small) {
-  const V sum = hn::Add(large, middle);
-  return hn::Add(sum, hn::Add(hn::Sub(middle, hn::Sub(sum, large)), small));
+HWY_INLINE V SumOfLog(const LogSum& log) {
+  const V sum = hn::Add(log.large, log.middle);
+  return hn::Add(sum, hn::Add(hn::Sub(log.middle, hn::Sub(sum, log.large)), log.small));
 }
 
-template <size_t N>
-HWY_INLINE Bundle<N> LogOfBase(const Bundle<N>& x, const vexel::power::ScaledLog2& log) {
+HWY_INLINE V LogOfBase(V x, const vexel::power::ScaledLog2& log) {
   const D d;
   const DI di;
-  Bundle<N> eighths, fraction, large, middle, small;
-  PlaceOf<true, PowerCore::Long>(x, log, eighths, fraction);
-  LongLog(eighths, fraction, log, large, middle, small);
-  return Map<N>(
-      [&](V in, V a, V b, V c) VX_POWER_STEP {
-        const V value = SumOfLog(a, b, c);
-        const VI bits = hn::BitCast(di, in);
-        const VI infinity = hn::Set(di, 0x7f800000);
-        const VI zero = hn::Zero(di);
-        const auto noNumber = hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, zero));
-        VI result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, hn::BitCast(di, value));
-        result = hn::IfThenElse(noNumber, hn::Set(di, 0x7fc00000), result);
-        result =
-            hn::IfThenElse(hn::Eq(hn::Add(bits, bits), zero), hn::Set(di, static_cast<int32_t>(0xff800000)), result);
-        return hn::BitCast(d, result);
-      },
-      x, large, middle, small);
+  const VI bits = hn::BitCast(di, x);
+  const VI infinity = hn::Set(di, 0x7f800000);
+  const VI zero = hn::Zero(di);
+  const auto noNumber = hn::Or(hn::Gt(bits, infinity), hn::Lt(bits, zero));
+  VI result = hn::BitCast(di, SumOfLog(LogOf<PowerCore::Long>(PlaceOf<true, PowerCore::Long>(x, log), log)));
+  result = hn::IfThenElse(hn::Eq(bits, infinity), infinity, result);
+  result = hn::IfThenElse(noNumber, hn::Set(di, 0x7fc00000), result);
+  result = hn::IfThenElse(hn::Eq(hn::Add(bits, bits), zero), hn::Set(di, static_cast<int32_t>(0xff800000)), result);
+  return hn::BitCast(d, result);
 }
 
 // Logarithms in loops like PowerLoops: finish(log of prepare(value), value).
@@ -586,82 +384,97 @@ HWY_INLINE void LogLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RE
   const D d;
   const DI di;
   const size_t lanes = hn::Lanes(d);
-  float* HWY_RESTRICT scratch2 = scratch + count;
+  const StepArrays steps(scratch, count);
   const VI first = hn::Set(di, static_cast<int32_t>(0x00800000 + kFlip));
   const VI span = hn::Set(di, static_cast<int32_t>(0x7f7fffff - 0x00800000 + kFlip));
   VI above = hn::Set(di, INT32_MIN);
   for (size_t i = 0; i < count; i += lanes) {
-    const Bundle<1> x{prepare(hn::Load(d, values + i))};
-    above = hn::Max(above, hn::Sub(hn::BitCast(di, x.a), first));
-    Bundle<1> eighths, fraction;
-    PlaceOf<false, PowerCore::Long>(x, log, eighths, fraction);
-    hn::Store(eighths.a, d, scratch + i);
-    hn::Store(fraction.a, d, scratch2 + i);
+    const V x = prepare(hn::Load(d, values + i));
+    above = hn::Max(above, hn::Sub(hn::BitCast(di, x), first));
+    steps.Store(PlaceOf<false, PowerCore::Long>(x, log), i);
   }
-  const bool rare = !hn::AllFalse(di, hn::Gt(above, span));
-  for (size_t i = 0; i < count; i += lanes) {
-    const V v = hn::Load(d, values + i);
-    V logarithm;
-    if (HWY_UNLIKELY(rare)) {
-      logarithm = LogOfBase(Bundle<1>{prepare(v)}, log).a;
-    } else {
-      Bundle<1> large, middle, small;
-      LongLog(Bundle<1>{hn::Load(d, scratch + i)}, Bundle<1>{hn::Load(d, scratch2 + i)}, log, large, middle, small);
-      logarithm = SumOfLog(large.a, middle.a, small.a);
+  if (HWY_LIKELY(hn::AllFalse(di, hn::Gt(above, span)))) {
+    for (size_t i = 0; i < count; i += lanes)
+      hn::Store(finish(SumOfLog(LogOf<PowerCore::Long>(steps.PlaceAt(i), log)), hn::Load(d, values + i)), d,
+                values + i);
+  } else {
+    for (size_t i = 0; i < count; i += lanes) {
+      const V v = hn::Load(d, values + i);
+      hn::Store(finish(LogOfBase(prepare(v), log), v), d, values + i);
     }
-    hn::Store(finish(logarithm, v), d, values + i);
   }
 }
 
-HWY_INLINE V ExpOfBase(V x, const vexel::power::SplitFloat& log2Base) {
+// log2(base^x) - kRootShift.
+HWY_INLINE Eighths ExponentOf(V x, const vexel::power::SplitFloat& log2Base) {
   const D d;
-  const DI di;
   const V bounded = hn::Max(hn::Min(x, hn::Set(d, 256.0f)), hn::Set(d, -256.0f));
-  const V top = hn::And(bounded, hn::BitCast(d, hn::Set(di, static_cast<int32_t>(0xfffff000))));
+  const V top = hn::And(bounded, hn::BitCast(d, hn::Set(DI(), static_cast<int32_t>(0xfffff000))));
   const V low = hn::Add(hn::Mul(top, hn::Set(d, log2Base.low)),
                         hn::Mul(hn::Sub(bounded, top), hn::Set(d, log2Base.high + log2Base.low)));
-  const V shifted = hn::Sub(low, hn::Set(d, static_cast<float>(vexel::power::kRootShift)));
-  Bundle<1> count, f;
-  CountEighths(Bundle<1>{hn::Mul(top, hn::Set(d, log2Base.high))}, Bundle<1>{shifted}, count, f);
-  const V power = Exp2Of<true>(count, f).a;
-  return hn::IfThenElse(hn::IsNaN(x), hn::BitCast(d, hn::Set(di, 0x7fc00000)), power);
+  const V large = hn::Mul(top, hn::Set(d, log2Base.high));
+  const V small = hn::Sub(low, hn::Set(d, static_cast<float>(vexel::power::kRootShift)));
+  return EighthsOf<PowerCore::Float>({large, large, small});
+}
+
+// Exponentials in loops like PowerLoops: finish(base^prepare(value), value).
+template <class Prepare, class Finish>
+HWY_INLINE void ExpLoops(float* HWY_RESTRICT values, size_t count, const vexel::power::SplitFloat& log2Base,
+                         const Prepare& prepare, const Finish& finish) {
+  const D d;
+  const size_t lanes = hn::Lanes(d);
+  constexpr float kMostUsual = 30.0f;  // Both bases raise it to a normal number.
+  V largest = hn::Zero(d);
+  auto noNumber = hn::IsNaN(largest);
+  for (size_t i = 0; i < count; i += lanes) {
+    const V x = prepare(hn::Load(d, values + i));
+    noNumber = hn::Or(noNumber, hn::IsNaN(x));
+    largest = hn::Max(largest, hn::Abs(x));
+  }
+  const bool rare = !hn::AllFalse(d, hn::Or(noNumber, hn::Gt(largest, hn::Set(d, kMostUsual))));
+  for (size_t i = 0; i < count; i += lanes) {
+    const V v = hn::Load(d, values + i), x = prepare(v);
+    const Eighths exponent = ExponentOf(x, log2Base);
+    V power;
+    if (HWY_UNLIKELY(rare)) {
+      power = hn::IfThenElse(hn::IsNaN(x), hn::BitCast(d, hn::Set(DI(), 0x7fc00000)), Exp2Of<true>(exponent));
+    } else {
+      power = Exp2Of<false>(exponent);
+    }
+    hn::Store(finish(power, v), d, values + i);
+  }
 }
 
 }  // namespace power_detail
 
-HWY_INLINE power_detail::V Log(power_detail::V x) {
-  return power_detail::LogOfBase(power_detail::Bundle<1>{x}, vexel::power::kNaturalLog).a;
-}
-HWY_INLINE power_detail::V Log10(power_detail::V x) {
-  return power_detail::LogOfBase(power_detail::Bundle<1>{x}, vexel::power::kDecimalLog).a;
-}
-HWY_INLINE power_detail::V Exp(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2EShort); }
-HWY_INLINE power_detail::V Exp10(power_detail::V x) { return power_detail::ExpOfBase(x, power::kLog2Of10Short); }
+// In all of these, `count` floats, whole vectors at an aligned address, become finish(function of prepare(value),
+// value). `scratch`, aligned too, has room for kPowerScratch times as many.
+inline constexpr size_t kPowerScratch = 2;
 
-#endif  // HWY_TARGET
-
-// Arguments and results as for the scalar functions; kCore must be y.core.
-template <PowerCore kCore>
-HWY_INLINE power_detail::V Power(power_detail::V x, const PowerExponent& y) {
-  return power_detail::Power1<kCore, false>(x, y);
-}
-template <PowerCore kCore>
-HWY_INLINE power_detail::V SignedPower(power_detail::V x, const PowerExponent& y) {
-  return power_detail::Power1<kCore, true>(x, y);
-}
-
-// Three vectors at once, the colour channels of pixels: a, b, c <- their powers.
-template <PowerCore kCore>
-HWY_INLINE void SignedPower3(power_detail::V& a, power_detail::V& b, power_detail::V& c, const PowerExponent& y) {
-  power_detail::SignedPower3<kCore>(a, b, c, y);
-}
-
-// `count` floats, whole vectors at an aligned address, become finish(power of prepare(value), value). `scratch`,
-// aligned too, has room for twice as many. prepare may give OneLess if the core is the long one.
+// kCore must be y.core. prepare may give OneLess if that is the long one.
 template <PowerCore kCore, class Prepare, class Finish>
 HWY_INLINE void Powers(float* values, size_t count, float* scratch, const PowerExponent& y, const Prepare& prepare,
                        const Finish& finish) {
   power_detail::PowerLoops<kCore, power_detail::Signs::ByFinish>(values, count, scratch, y, prepare, finish);
+}
+
+// For arguments that are known to be positive, with normal results.
+template <PowerCore kCore, class Finish>
+HWY_INLINE void UsualPowers(float* values, size_t count, float* scratch, const PowerExponent& y, const Finish& finish) {
+  power_detail::PowerLoops<kCore, power_detail::Signs::Absent>(
+      values, count, scratch, y, [](power_detail::V v) VX_POWER_STEP { return v; }, finish);
+}
+
+template <class Prepare, class Finish>
+HWY_INLINE void Logs(float* values, size_t count, float* scratch, const power::ScaledLog2& log, const Prepare& prepare,
+                     const Finish& finish) {
+  power_detail::LogLoops(values, count, scratch, log, prepare, finish);
+}
+
+template <class Prepare, class Finish>
+HWY_INLINE void Exps(float* values, size_t count, const power::SplitFloat& log2Base, const Prepare& prepare,
+                     const Finish& finish) {
+  power_detail::ExpLoops(values, count, log2Base, prepare, finish);
 }
 
 // Powers with the sign of their arguments. `negative` is set by the first call that meets a minus sign; until then
@@ -678,20 +491,22 @@ HWY_INLINE void SignedPowers(float* values, size_t count, float* scratch, const 
     negative = true;
   }
   PowerLoops<kCore, Signs::Kept>(
-      values, count, scratch, y, [](V v) VX_POWER_STEP { return power_detail::Magnitude<true>(v); },
-      [](V power, V v) VX_POWER_STEP { return power_detail::WithSign<true>(power, v); });
-}
-
-template <class Prepare, class Finish>
-HWY_INLINE void Logs(float* values, size_t count, float* scratch, const Prepare& prepare, const Finish& finish) {
-  power_detail::LogLoops(values, count, scratch, vexel::power::kNaturalLog, prepare, finish);
+      values, count, scratch, y, [](V v) VX_POWER_STEP { return hn::Abs(v); },
+      [](V power, V v) VX_POWER_STEP { return hn::Or(power, hn::And(v, hn::SignBit(power_detail::D()))); });
 }
 
 // For exponents whose core is known only at run time.
-HWY_NOINLINE inline power_detail::V PowerAny(power_detail::V x, const PowerExponent& y) {
-  if (y.core == PowerCore::Float) return Power<PowerCore::Float>(x, y);
-  if (y.core == PowerCore::Long) return Power<PowerCore::Long>(x, y);
-  return Power<PowerCore::Scalar>(x, y);
+HWY_NOINLINE inline void PowersAny(float* values, size_t count, float* scratch, const PowerExponent& y) {
+  using power_detail::V;
+  const auto same = [](V v) VX_POWER_STEP { return v; };
+  const auto result = [](V power, V) VX_POWER_STEP { return power; };
+  if (y.core == PowerCore::Float) {
+    Powers<PowerCore::Float>(values, count, scratch, y, same, result);
+  } else if (y.core == PowerCore::Long) {
+    Powers<PowerCore::Long>(values, count, scratch, y, same, result);
+  } else {
+    Powers<PowerCore::Scalar>(values, count, scratch, y, same, result);
+  }
 }
 HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scratch, const PowerExponent& y,
                                          bool& negative) {
@@ -707,5 +522,6 @@ HWY_NOINLINE inline void SignedPowersAny(float* values, size_t count, float* scr
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #endif

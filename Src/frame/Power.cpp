@@ -170,6 +170,15 @@ float SignedPower(float x, const PowerExponent& y) noexcept {
   return std::bit_cast<float>(std::bit_cast<uint32_t>(magnitude) | sign);
 }
 
+float Log2InEighths(float x) noexcept {
+  const power::EighthsLog2& log = power::kEighthsLog2;
+  const SplitArgument s = Split(x);
+  const int j = s.eighths & 7;
+  const float w = (s.mantissa - power::kCentre[j]) * log.slopes[j], square = w * w;
+  const float curve = w + square * ((log.series[0] + w * log.series[1]) + square * log.series[2]);
+  return static_cast<float>(s.eighths) + (log.offsets[j] + curve);
+}
+
 float Log(float x) noexcept { return LogOfBase(x, power::kNaturalLog); }
 float Log10(float x) noexcept { return LogOfBase(x, power::kDecimalLog); }
 float Exp(float x) noexcept { return ExpOfBase(x, power::kLog2EShort); }

@@ -13,90 +13,70 @@
 
 #include "frame/Power-inl.h"
 
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::testing {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 namespace power = vexel::HWY_NAMESPACE;
 
-using Vector = hn::Vec<hn::ScalableTag<float>>;
-
 // What the loops work on.
 struct Block {
   static constexpr size_t kCount = 3 * hn::MaxLanes(hn::ScalableTag<float>());
   HWY_ALIGN float values[kCount];
-  HWY_ALIGN float scratch[2 * kCount];
+  HWY_ALIGN float scratch[power::kPowerScratch * kCount];
 };
 
-// Single vectors, with the core known or not, and loops by turns.
-template <PowerCore kCore>
-void PowersOf(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  const hn::ScalableTag<float> d;
-  const size_t n = hn::Lanes(d);
+// change(Block&) for all values.
+template <class Change>
+void ForEachBlock(const float* src, float* dst, size_t count, const Change& change) {
   Block block;
-  for (size_t i = 0; i < count; i += 3 * n) {
-    if (i / (3 * n) % 2 != 0) {
-      std::memcpy(block.values, src + i, sizeof block.values);
-      power::Powers<kCore>(
-          block.values, 3 * n, block.scratch, y, [](Vector v) VX_POWER_STEP { return v; },
-          [](Vector power, Vector) VX_POWER_STEP { return power; });
-      std::memcpy(dst + i, block.values, sizeof block.values);
-    } else {
-      hn::StoreU(power::Power<kCore>(hn::LoadU(d, src + i), y), d, dst + i);
-      hn::StoreU(power::PowerAny(hn::LoadU(d, src + i + n), y), d, dst + i + n);
-      hn::StoreU(power::Power<kCore>(hn::LoadU(d, src + i + 2 * n), y), d, dst + i + 2 * n);
-    }
+  for (size_t i = 0; i < count; i += Block::kCount) {
+    std::memcpy(block.values, src + i, sizeof block.values);
+    change(block);
+    std::memcpy(dst + i, block.values, sizeof block.values);
   }
 }
 
 void Powers(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  if (y.core == PowerCore::Float) return PowersOf<PowerCore::Float>(src, dst, count, y);
-  if (y.core == PowerCore::Long) return PowersOf<PowerCore::Long>(src, dst, count, y);
-  return PowersOf<PowerCore::Scalar>(src, dst, count, y);
+  ForEachBlock(src, dst, count,
+               [&](Block& block) HWY_ATTR { power::PowersAny(block.values, Block::kCount, block.scratch, y); });
 }
 
-// Three vectors at once, loops that have not met a minus sign yet and loops that have, by turns.
-template <PowerCore kCore>
-void SignedPowersOf(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  const hn::ScalableTag<float> d;
-  const size_t n = hn::Lanes(d);
-  Block block;
-  for (size_t i = 0, turn = 0; i < count; i += 3 * n, ++turn) {
-    if (turn % 3 != 0) {
-      bool negative = turn % 3 == 2;
-      std::memcpy(block.values, src + i, sizeof block.values);
-      power::SignedPowersAny(block.values, 3 * n, block.scratch, y, negative);
-      std::memcpy(dst + i, block.values, sizeof block.values);
-      continue;
-    }
-    auto a = hn::LoadU(d, src + i), b = hn::LoadU(d, src + i + n), c = hn::LoadU(d, src + i + 2 * n);
-    power::SignedPower3<kCore>(a, b, c, y);
-    hn::StoreU(a, d, dst + i);
-    hn::StoreU(b, d, dst + i + n);
-    hn::StoreU(c, d, dst + i + 2 * n);
-  }
-}
-
+// Loops that have not met a minus sign yet and loops that have, by turns.
 void SignedPowers(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  if (y.core == PowerCore::Float) return SignedPowersOf<PowerCore::Float>(src, dst, count, y);
-  if (y.core == PowerCore::Long) return SignedPowersOf<PowerCore::Long>(src, dst, count, y);
-  return SignedPowersOf<PowerCore::Scalar>(src, dst, count, y);
+  bool turn = false;
+  ForEachBlock(src, dst, count, [&](Block& block) HWY_ATTR {
+    bool negative = turn = !turn;
+    power::SignedPowersAny(block.values, Block::kCount, block.scratch, y, negative);
+  });
 }
 
-#define VX_TEST_FUNCTION(name, function)                                                                             \
-  void name(const float* src, float* dst, size_t count) {                                                            \
-    const hn::ScalableTag<float> d;                                                                                  \
-    for (size_t i = 0; i < count; i += hn::Lanes(d)) hn::StoreU(power::function(hn::LoadU(d, src + i)), d, dst + i); \
+// A step without effect before and after the function.
+struct Same {
+  template <class... V>
+  VX_POWER_STEP auto operator()(hn::Vec<hn::ScalableTag<float>> v, V...) const {
+    return v;
   }
-VX_TEST_FUNCTION(Logs, Log)
-VX_TEST_FUNCTION(Log10s, Log10)
-VX_TEST_FUNCTION(Exps, Exp)
-VX_TEST_FUNCTION(Exp10s, Exp10)
-#undef VX_TEST_FUNCTION
+};
+void LogsTo(const float* src, float* dst, size_t count, const vexel::power::ScaledLog2& log) {
+  ForEachBlock(src, dst, count, [&](Block& block) HWY_ATTR {
+    power::Logs(block.values, Block::kCount, block.scratch, log, Same(), Same());
+  });
+}
+void ExpsOf(const float* src, float* dst, size_t count, const vexel::power::SplitFloat& log2Base) {
+  ForEachBlock(src, dst, count,
+               [&](Block& block) HWY_ATTR { power::Exps(block.values, Block::kCount, log2Base, Same(), Same()); });
+}
+void Logs(const float* src, float* dst, size_t count) { LogsTo(src, dst, count, vexel::power::kNaturalLog); }
+void Log10s(const float* src, float* dst, size_t count) { LogsTo(src, dst, count, vexel::power::kDecimalLog); }
+void Exps(const float* src, float* dst, size_t count) { ExpsOf(src, dst, count, vexel::power::kLog2EShort); }
+void Exp10s(const float* src, float* dst, size_t count) { ExpsOf(src, dst, count, vexel::power::kLog2Of10Short); }
 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel::testing
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 
