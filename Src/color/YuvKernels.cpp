@@ -2,6 +2,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -24,6 +25,7 @@ constexpr float kP010LumaRange = 56065.0f, kP010ChromaRange = 57345.0f;
 #endif
 }  // namespace vexel
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -84,11 +86,12 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
     return hn::Min(hn::Max(value, hn::Set(d, -0.5f)), hn::Set(d, 0.5f));
   };
   const auto half = [&](const uint16_t* from, ColorVector cb, ColorVector cr, float* to) VX_COLOR_STAGE {
-    const auto code = hn::TableLookupLanes(hn::PromoteTo(di, hn::LoadU(d16, from)), order);
-    const auto y = hn::Div(hn::ConvertTo(d, hn::Sub(code, hn::Set(di, kP010Black))), hn::Set(d, kP010LumaRange));
-    const auto one = hn::Set(d, 1.0f);
-    const RgbVectors c = FromYuv(hn::Min(hn::Max(y, hn::Zero(d)), one), cb, cr);
-    StorePixels(c.b, c.g, c.r, one, to);
+    const auto aboveBlack = hn::SaturatedSub(hn::LoadU(d16, from), hn::Set(d16, kP010Black));
+    const auto inRange = hn::Min(aboveBlack, hn::Set(d16, static_cast<uint16_t>(kP010LumaRange)));
+    const auto code = hn::TableLookupLanes(hn::PromoteTo(di, inRange), order);
+    const auto y = hn::Div(hn::ConvertTo(d, code), hn::Set(d, kP010LumaRange));
+    const RgbVectors c = FromYuv(y, cb, cr);
+    StorePixels(c.b, c.g, c.r, hn::Set(d, 1.0f), to);
   };
   const auto body = [&](const uint16_t* fromLuma, const uint16_t* fromChroma, float* to) VX_COLOR_STAGE {
     // A pair U, V is the low and high half of 32 bits.
@@ -100,7 +103,10 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
          to + 4 * kLanes);
   };
   size_t i = 0;
-  for (; i + 2 * kLanes <= count; i += 2 * kLanes) body(luma + i, chroma + i, dst + 4 * i);
+  for (; i + 2 * kLanes <= count; i += 2 * kLanes) {
+    FetchAhead<8 * kLanes * sizeof(float)>(reinterpret_cast<const uint8_t*>(dst + 4 * i));
+    body(luma + i, chroma + i, dst + 4 * i);
+  }
   if (const size_t rest = count - i) {
     HWY_ALIGN uint16_t lumaBlock[2 * kLanes] = {}, chromaBlock[2 * kLanes] = {};
     HWY_ALIGN float rgbBlock[8 * kLanes];
@@ -114,6 +120,7 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 
