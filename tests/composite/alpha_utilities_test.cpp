@@ -38,7 +38,7 @@ void Put(uint8_t* samples, size_t i, F f, double value) {
   if (Depth(f) == kDepth8u) {
     samples[i] = static_cast<uint8_t>(value);
   } else if (Depth(f) == kDepth15u) {
-    const auto word = static_cast<uint16_t>(value);
+    const auto word = static_cast<uint16_t>(static_cast<int>(value));
     std::memcpy(samples + 2 * i, &word, 2);
   } else {
     const auto real = static_cast<float>(value);
