@@ -76,13 +76,13 @@ class Rows420 {
   void MeanOfRows(const Plane& plane, uint64_t total) const noexcept;
   void MakeLuma(int32_t row) noexcept;
   void MakeChroma(int32_t row) noexcept;
-  void MixChroma(size_t first, size_t end) noexcept;
-  void MixChromaOf(int32_t first, int32_t count) noexcept;
+  void UseChroma(const Tap& a, const Tap& b) noexcept;
+  void MixChroma() noexcept;
   const uint16_t* ResampleLuma() noexcept;
   const uint16_t* ResampleChroma(uint16_t* samples, uint16_t* resampled) noexcept;
 
   Picture420 mSrc{};
-  int32_t mWidth = 0, mHeight = 0;
+  int32_t mWidth = 0, mHeight = 0, mChromaWidth = 0;
   bool mLinear = false;
 
   // Row r is the mean of mLines lines, mLineStep apart, from mAdvance * r + mFirstLine on; its pixels are means of
@@ -95,7 +95,7 @@ class Rows420 {
   decode420::ResampleRow mResample = nullptr;
   decode420::MakePixels mMakePixels = nullptr;
   decode420::Matrix mMatrix{};
-  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false, mMixesInBlocks = false;
+  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false;
 
   // Scratch: averaged rows, resampled ones, a row or two on their way, sums, and what is being averaged.
   uint16_t *mY = nullptr, *mU = nullptr, *mV = nullptr;
@@ -107,8 +107,8 @@ class Rows420 {
 
   // The chroma rows behind mU and mV, where single lines are decoded: lines that share them need them once.
   Tap mHeld[2] = {{-1, 0}, {-1, 0}};
-  // What Pixels reads.
-  const uint8_t *mRowY = nullptr, *mRowU = nullptr, *mRowV = nullptr;
+  // What Pixels reads, from its first pixel on.
+  decode420::PixelRow mRow{};
   ptrdiff_t mLumaBytes = 1, mChromaBytes = 2;  // per pixel; per two or, where not halved, per pixel
 };
 

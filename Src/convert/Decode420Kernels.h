@@ -52,18 +52,25 @@ struct Matrix {
 
 // Pixels of a row. Luma is bytes, or 16-bit samples ("wide", "full"). Chroma is 16-bit samples at half the resolution,
 // the nearest ones or interpolated (which reads one sample more than there are pairs of pixels), or at the pixels' own
-// ("full"); or of a picture's own rows and nearest: bytes, or pairs of them or of 10-bit words, then all in `u`. The
-// fourth channel is written opaque.
+// ("full"). Or it is that of a picture's own rows: bytes, or pairs of them or of 10-bit words, then all in `u`; the
+// nearest samples, or interpolated between those of two rows. The fourth channel is written opaque.
 struct PixelRow {
   const uint8_t *y, *u, *v;
   uint8_t* dst;
   size_t count;
   bool stream;  // past the cache; for dst on a line of it
+  // Of two rows: the second one, the weights of both, 8 in all, and the samples that either has.
+  const uint8_t *uB = nullptr, *vB = nullptr;
+  uint32_t weightA = 8, weightB = 0;
+  size_t chroma = 0;
 };
 using MakePixels = void (*)(const PixelRow& row, const Matrix& matrix);
+struct OwnChromaKernels {
+  KernelVariants<MakePixels> bytes, pairs, swappedPairs, widePairs, swappedWidePairs;
+};
 struct PixelKernels {
-  KernelVariants<MakePixels> nearest, linear, wideNearest, wideLinear, full, bytes, pairs, swappedPairs, widePairs,
-      swappedWidePairs;
+  KernelVariants<MakePixels> wideNearest, wideLinear, full;
+  OwnChromaKernels nearest, mixed;
 };
 extern const PixelKernels kToBgrx, kToVuyx;
 

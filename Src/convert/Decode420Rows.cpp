@@ -11,10 +11,6 @@ namespace {
 // Weights of one line's chroma rows are in eighths.
 constexpr int32_t kLineWeight = 8;
 
-// Pixels made at a time: with the samples that they are made of they stay in the first-level cache.
-constexpr int32_t kBlockPixels = 2048;
-static_assert(kBlockPixels % 2 == 0);
-
 // A block one pixel wide has no chroma bytes.
 constexpr uint16_t kNoChroma = 128 << 8;
 
@@ -37,6 +33,7 @@ VX_Result Rows420::Prepare(const Picture420& src, VX_PixelFormat format, int32_t
                            int32_t quality, KernelVariant variant) noexcept {
   *this = Rows420();
   mSrc = src;
+  mChromaWidth = ChromaWidth(src);
   mWidth = width;
   mHeight = height;
   mLinear = quality >= 2;
@@ -74,24 +71,22 @@ void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   mMixLuma = (wide ? kMixPlane10 : kMixPlane8)[mVariant];
   mMixChroma = (pairs ? wide ? kMixPairs10 : kMixPairs8 : wide ? kMixPlane10 : kMixPlane8)[mVariant];
   mHalfChroma = mColumns == 1 && mRatio == HorizontalRatio::None;
-  mLumaFromSource = mHalfChroma && mLines == 1;
   if (mRatio != HorizontalRatio::None)
     mResample = (mRatio == HorizontalRatio::FourThirds ? kFourThirds : kThreeHalves)[mVariant];
-  // The nearest samples need no stage of their own, if none is missing.
-  mChromaFromSource =
-      mLumaFromSource && !mLinear && (!wide || pairs) && ChromaWidth(mSrc) == (int64_t{mSrc.width} + 1) / 2;
-  mMixesInBlocks = mLumaFromSource && mLinear;
-  const bool wideLuma = wide || !mLumaFromSource;
-  mLumaBytes = wideLuma ? 2 : 1;
+  // One line's own samples need no stage before the pixels, if none is missing.
+  const bool isLine = mHalfChroma && mLines == 1;
+  mChromaFromSource = isLine && (!wide || pairs) && mChromaWidth == (int64_t{mSrc.width} + 1) / 2;
+  mLumaFromSource = isLine && (wide || mChromaFromSource);
+  mLumaBytes = wide || !mLumaFromSource ? 2 : 1;
   mChromaBytes = !mChromaFromSource ? 2 : (wide ? 2 : 1) * (pairs ? 2 : 1);
   const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
+  const OwnChromaKernels& own = mLinear ? pixels.mixed : pixels.nearest;
   const auto kernel = [&]() -> const KernelVariants<MakePixels>& {
     if (!mHalfChroma) return pixels.full;
-    if (mChromaFromSource && !pairs) return pixels.bytes;
-    if (mChromaFromSource && IsReversed(mSrc.format)) return wide ? pixels.swappedWidePairs : pixels.swappedPairs;
-    if (mChromaFromSource) return wide ? pixels.widePairs : pixels.pairs;
-    if (mLinear) return wideLuma ? pixels.wideLinear : pixels.linear;
-    return wideLuma ? pixels.wideNearest : pixels.nearest;
+    if (!mChromaFromSource) return mLinear ? pixels.wideLinear : pixels.wideNearest;
+    if (!pairs) return own.bytes;
+    if (IsReversed(mSrc.format)) return wide ? own.swappedWidePairs : own.swappedPairs;
+    return wide ? own.widePairs : own.pairs;
   };
   mMakePixels = kernel()[mVariant];
   mMatrix = MakeMatrix420(mSrc.format, format);
@@ -196,19 +191,19 @@ const uint16_t* Rows420::ResampleLuma() noexcept {
 
 void Rows420::MakeLuma(int32_t row) noexcept {
   if (mLumaFromSource) {
-    mRowY = mSrc.planes[0] + LineOf(row, 0) * mSrc.rowBytes[0];
+    mRow.y = mSrc.planes[0] + LineOf(row, 0) * mSrc.rowBytes[0];
     return;
   }
   mTapCount = 0;
   for (int32_t i = 0; i < mLines; ++i) mTaps[mTapCount++] = {LineOf(row, i), 1};
   MeanOfRows({mSrc.planes[0], mSrc.rowBytes[0], mMixLuma, {mY, nullptr}, static_cast<size_t>(mSrc.width)},
              static_cast<uint64_t>(mLines));
-  mRowY = reinterpret_cast<const uint8_t*>(ResampleLuma());
+  mRow.y = reinterpret_cast<const uint8_t*>(ResampleLuma());
 }
 
 const uint16_t* Rows420::ResampleChroma(uint16_t* samples, uint16_t* resampled) noexcept {
   const auto width = static_cast<size_t>(mSrc.width), chroma = (width + 1) / 2;
-  const auto readable = static_cast<size_t>(ChromaWidth(mSrc));
+  const auto readable = static_cast<size_t>(mChromaWidth);
   if (readable == 0)
     std::fill_n(samples, chroma + 1, kNoChroma);
   else
@@ -230,53 +225,37 @@ const uint16_t* Rows420::ResampleChroma(uint16_t* samples, uint16_t* resampled) 
 void Rows420::MakeChroma(int32_t row) noexcept {
   mTapCount = 0;
   for (int32_t i = 0; i < mLines; ++i) AddChromaTaps(LineOf(row, i));
-  if (mChromaFromSource) {
-    const bool pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
-    mRowU = mSrc.planes[1] + mTaps[0].row * mSrc.rowBytes[1];
-    mRowV = pairs ? mRowU : mSrc.planes[2] + mTaps[0].row * mSrc.rowBytes[2];
-    if (reversed && !pairs) std::swap(mRowU, mRowV);
-    return;
-  }
-  if (mLines == 1 && !mMixesInBlocks) {
-    const Tap taps[2] = {mTaps[0], mTapCount > 1 ? mTaps[1] : Tap{mTaps[0].row, 0}};
+  const Tap taps[2] = {mTaps[0], mTapCount > 1 ? mTaps[1] : Tap{mTaps[0].row, 0}};
+  if (mChromaFromSource) return UseChroma(taps[0], taps[1]);
+  if (mLines == 1) {
     if (std::equal(taps, taps + 2, mHeld)) return;
     std::copy(taps, taps + 2, mHeld);
   }
-  mRowU = reinterpret_cast<const uint8_t*>(mU);
-  mRowV = reinterpret_cast<const uint8_t*>(mV);
-  if (mMixesInBlocks) return;
-  MixChroma(0, static_cast<size_t>(ChromaWidth(mSrc)));
-  mRowU = reinterpret_cast<const uint8_t*>(ResampleChroma(mU, mWideU));
-  mRowV = reinterpret_cast<const uint8_t*>(ResampleChroma(mV, mWideV));
+  MixChroma();
+  mRow.u = reinterpret_cast<const uint8_t*>(ResampleChroma(mU, mWideU));
+  mRow.v = reinterpret_cast<const uint8_t*>(ResampleChroma(mV, mWideV));
 }
 
-// The chroma samples from `first` to `end` of the rows that MakeChroma has chosen.
-void Rows420::MixChroma(size_t first, size_t end) noexcept {
-  if (first >= end) return;
-  const bool wide = HasWideSamples(mSrc.format), pairs = IsBiplanar(mSrc.format), reversed = IsReversed(mSrc.format);
-  const size_t offset = first * (wide ? 2 : 1) * (pairs ? 2 : 1), samples = end - first;
-  uint16_t *const out0 = (reversed ? mV : mU) + first, *const out1 = (reversed ? mU : mV) + first;
+void Rows420::UseChroma(const Tap& a, const Tap& b) noexcept {
+  const bool pairs = IsBiplanar(mSrc.format);
+  const int first = IsReversed(mSrc.format) && !pairs ? 2 : 1, second = pairs ? 1 : 3 - first;
+  const auto row = [&](int plane, const Tap& tap) { return mSrc.planes[plane] + tap.row * mSrc.rowBytes[plane]; };
+  mRow.u = row(first, a), mRow.uB = row(first, b), mRow.weightA = a.weight;
+  mRow.v = row(second, a), mRow.vB = row(second, b), mRow.weightB = b.weight;
+}
+
+void Rows420::MixChroma() noexcept {
+  const bool reversed = IsReversed(mSrc.format);
+  uint16_t *const out0 = reversed ? mV : mU, *const out1 = reversed ? mU : mV;
+  const auto samples = static_cast<size_t>(mChromaWidth);
+  if (samples == 0) return;
   const uint64_t total = uint64_t{kLineWeight} * static_cast<uint64_t>(mLines);
-  if (pairs) {
-    MeanOfRows({mSrc.planes[1] + offset, mSrc.rowBytes[1], mMixChroma, {out0, out1}, samples}, total);
+  if (IsBiplanar(mSrc.format)) {
+    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out0, out1}, samples}, total);
   } else {
-    MeanOfRows({mSrc.planes[1] + offset, mSrc.rowBytes[1], mMixChroma, {out0, nullptr}, samples}, total);
-    MeanOfRows({mSrc.planes[2] + offset, mSrc.rowBytes[2], mMixChroma, {out1, nullptr}, samples}, total);
+    MeanOfRows({mSrc.planes[1], mSrc.rowBytes[1], mMixChroma, {out0, nullptr}, samples}, total);
+    MeanOfRows({mSrc.planes[2], mSrc.rowBytes[2], mMixChroma, {out1, nullptr}, samples}, total);
   }
-}
-
-// The chroma of some pixels, with the sample behind them. Whole vectors are made, as long as there is something to
-// read: the next pixels' are made again.
-void Rows420::MixChromaOf(int32_t first, int32_t count) noexcept {
-  constexpr size_t kVector = 64;
-  const auto readable = static_cast<size_t>(ChromaWidth(mSrc));
-  const auto begin = static_cast<size_t>(first) / 2,
-             behind = (static_cast<size_t>(first) + static_cast<size_t>(count) + 1) / 2 + 1;
-  const size_t end = std::min(readable, (behind + kVector - 1) / kVector * kVector);
-  MixChroma(std::min(begin, end - std::min<size_t>(end, 1)), end);
-  if (end < readable) return;
-  ResampleChroma(mU, nullptr);
-  ResampleChroma(mV, nullptr);
 }
 
 void Rows420::BeginRow(int32_t row) noexcept {
@@ -285,14 +264,18 @@ void Rows420::BeginRow(int32_t row) noexcept {
 }
 
 void Rows420::Pixels(int32_t first, int32_t count, uint8_t* dst, bool stream) noexcept {
-  for (int32_t done = 0; done < count; done += kBlockPixels) {
-    const int32_t x = first + done, pixels = std::min(kBlockPixels, count - done);
-    if (mMixesInBlocks) MixChromaOf(x, pixels);
-    const ptrdiff_t chroma = (mHalfChroma ? x / 2 : x) * mChromaBytes;
-    mMakePixels({mRowY + x * mLumaBytes, mRowU + chroma, mRowV + chroma, dst + ptrdiff_t{4} * done,
-                 static_cast<size_t>(pixels), stream},
-                mMatrix);
+  const ptrdiff_t sample = mHalfChroma ? first / 2 : first, chroma = sample * mChromaBytes;
+  PixelRow row = mRow;
+  row.y += first * mLumaBytes;
+  row.u += chroma, row.v += chroma;
+  if (mChromaFromSource) {
+    row.uB += chroma, row.vB += chroma;
+    row.chroma = static_cast<size_t>(mChromaWidth - sample);
   }
+  row.dst = dst;
+  row.count = static_cast<size_t>(count);
+  row.stream = stream;
+  mMakePixels(row, mMatrix);
 }
 
 }  // namespace vexel

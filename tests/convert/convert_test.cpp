@@ -408,7 +408,7 @@ TEST(ConvertArena, InvalidIsEightBitWithoutAlpha) {
 
 // Rows whose chain does not fit on the stack.
 TEST(ConvertArena, FailingAllocations) {
-  constexpr int32_t kWidth = 48000;
+  constexpr int32_t kWidth = 72000;
   std::vector<uint8_t> in(4 * kWidth * 16), out(4 * kWidth * 16);  // room for pictures of 32 rows
   const struct {
     F src, dst;

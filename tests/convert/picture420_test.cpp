@@ -353,7 +353,7 @@ TEST(Decode420, MatricesOverAllCodes) {
       for (int u = 0; u < 256; u += all ? 1 : 5)
         for (int v = 0; v < 256; v += all ? 1 : 5) {
           const std::vector<uint8_t> us(128, static_cast<uint8_t>(u)), vs(128, static_cast<uint8_t>(v));
-          kernels.bytes[ActiveKernelVariant()]({luma.data(), us.data(), vs.data(), pixels.data(), 256, false}, matrix);
+          kernels.nearest.bytes[ActiveKernelVariant()]({luma.data(), us.data(), vs.data(), pixels.data(), 256, false}, matrix);
           const auto black = ToCodes({0, double(u), double(v)}, src, dst), step = ToCodes({1, 128, 128}, src, dst),
                      zero = ToCodes({0, 128, 128}, src, dst);
           for (int y = 0; y < 256; ++y)
