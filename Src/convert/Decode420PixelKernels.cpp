@@ -140,9 +140,17 @@ HWY_INLINE Alternating LoadAlternating(const uint8_t* p) {
   return {U16{_mm512_permutex2var_epi16(low.raw, _mm512_load_si512(kFirst.order), high.raw)},
           U16{_mm512_permutex2var_epi16(low.raw, _mm512_load_si512(kSecond.order), high.raw)}};
 #else
-  if constexpr (kOrder == Order::Alternate)
-    return {hn::OddEven(LoadWords(p + HWY_MAX_BYTES - 2), low), hn::OddEven(high, LoadWords(p + 2))};
   const ScalableTag<uint16_t> d;
+  if constexpr (kOrder == Order::Alternate) {
+#if HWY_TARGET == HWY_SSSE3  // has no blends
+    const __m128 start = _mm_castsi128_ps(hn::InterleaveLower(d, low, high).raw);
+    const __m128 end = _mm_castsi128_ps(hn::InterleaveUpper(d, low, high).raw);
+    return {U16{_mm_castps_si128(_mm_shuffle_ps(start, end, 0x88))},
+            U16{_mm_castps_si128(_mm_shuffle_ps(start, end, 0xDD))}};
+#else
+    return {hn::OddEven(LoadWords(p + HWY_MAX_BYTES - 2), low), hn::OddEven(high, LoadWords(p + 2))};
+#endif
+  }
   return {hn::ConcatEven(d, high, low), hn::ConcatOdd(d, high, low)};
 #endif
 }
