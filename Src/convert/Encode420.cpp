@@ -60,8 +60,9 @@ class Lines {
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept;
 
-  // Where a line lies that is read straight from memory.
+  // Where a line is read from, as far as it is in memory before.
   uintptr_t Address(int64_t line) const noexcept {
+    if (mDecodes) return reinterpret_cast<uintptr_t>(mSlots[0]);
     return reinterpret_cast<uintptr_t>(mTop) + static_cast<uintptr_t>(line * mRowBytes);
   }
 

@@ -49,56 +49,64 @@ constexpr size_t kBlock = 4 * kPixels;
 
 HWY_INLINE I32 Set(int32_t value) { return hn::Set(ScalableTag<int32_t>(), value); }
 
-// Words of pixels: channels 0 and 2, and channels 1 and 3, side by side.
-struct Words {
-  U16 outer, inner;
-  static HWY_INLINE Words Of(U8 pixels) {
-    return {AsU16(hn::And(pixels, Dwords(0x00FF00FF))), hn::ShiftRight<8>(AsU16(pixels))};
-  }
-};
-
 template <class W>
-HWY_INLINE U16 WeightedSum(U16 a, U16 b) {
-  const U16 sum = hn::Add(a, b);
+HWY_INLINE I16 WeightedSum(I16 a, I16 b) {
+  const I16 sum = hn::Add(a, b);
   if constexpr (W::kA == 3) return hn::Add(sum, hn::Add(a, a));
   if constexpr (W::kB == 3) return hn::Add(sum, hn::Add(b, b));
   return sum;
 }
 
-// The pixels one to the left: the last one of `before`, then all but the last.
-HWY_INLINE U16 PixelBefore(U16 before, U16 v) {
-#if HWY_TARGET == HWY_AVX3
-  return U16{_mm512_alignr_epi32(v.raw, before.raw, 15)};
-#elif HWY_TARGET == HWY_AVX2
-  return U16{_mm256_alignr_epi8(v.raw, _mm256_permute2x128_si256(before.raw, v.raw, 0x21), 12)};
-#else
-  return U16{_mm_alignr_epi8(v.raw, before.raw, 12)};
-#endif
-}
-
-// Sums of two neighbouring pixels each: those of an even one and the one before, and those with the one behind, meet
-// in the filter about the even pixel. In each 128-bit block the results of `low` come before those of `high`.
-HWY_INLINE U16 AddNeighbours(U16 low, U16 high) {
+// Even and odd pixels of two vectors. In each 128-bit block those of `low` come before those of `high`.
+struct EvenOdd {
+  I16 even, odd;
+};
+HWY_INLINE EvenOdd TakeApart(I16 low, I16 high) {
 #if HWY_TARGET == HWY_AVX3
   const __m512 a = _mm512_castsi512_ps(low.raw), b = _mm512_castsi512_ps(high.raw);
-  const U16 even{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0x88))};
-  const U16 odd{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0xDD))};
+  return {I16{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0x88))},
+          I16{_mm512_castps_si512(_mm512_shuffle_ps(a, b, 0xDD))}};
 #elif HWY_TARGET == HWY_AVX2
   const __m256 a = _mm256_castsi256_ps(low.raw), b = _mm256_castsi256_ps(high.raw);
-  const U16 even{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0x88))};
-  const U16 odd{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0xDD))};
+  return {I16{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0x88))},
+          I16{_mm256_castps_si256(_mm256_shuffle_ps(a, b, 0xDD))}};
 #else
   const __m128 a = _mm_castsi128_ps(low.raw), b = _mm_castsi128_ps(high.raw);
-  const U16 even{_mm_castps_si128(_mm_shuffle_ps(a, b, 0x88))};
-  const U16 odd{_mm_castps_si128(_mm_shuffle_ps(a, b, 0xDD))};
+  return {I16{_mm_castps_si128(_mm_shuffle_ps(a, b, 0x88))}, I16{_mm_castps_si128(_mm_shuffle_ps(a, b, 0xDD))}};
 #endif
-  return hn::Add(even, odd);
 }
 
-// 32-bit results of two vectors of samples each for U and V to bytes in memory order, U in the lower half.
-HWY_INLINE U8 PackChroma(I32 u0, I32 u1, I32 v0, I32 v1) {
-  const ScalableTag<int16_t> d;
-  const U8 packed = PackBlocks(hn::ReorderDemote2To(d, u0, u1), hn::ReorderDemote2To(d, v0, v1));
+// Odd pixels in the places of the even ones behind them, the last one in the first place.
+HWY_INLINE I16 MoveBehind(I16 odd) {
+#if HWY_TARGET == HWY_AVX3
+  return I16{
+      _mm512_permutexvar_epi32(_mm512_setr_epi32(15, 0, 13, 2, 1, 4, 3, 6, 5, 8, 7, 10, 9, 12, 11, 14), odd.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return I16{_mm256_permutevar8x32_epi32(odd.raw, _mm256_setr_epi32(7, 0, 5, 2, 1, 4, 3, 6))};
+#else
+  return I16{_mm_shuffle_epi32(odd.raw, 0x93)};
+#endif
+}
+
+// The first pixel of one vector, the others of another.
+HWY_INLINE I16 ReplaceFirst(I16 first, I16 others) {
+#if HWY_TARGET == HWY_AVX3
+  return I16{_mm512_mask_mov_epi32(others.raw, 1, first.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return I16{_mm256_blend_epi32(others.raw, first.raw, 1)};
+#else
+  return I16{_mm_castps_si128(_mm_move_ss(_mm_castsi128_ps(others.raw), _mm_castsi128_ps(first.raw)))};
+#endif
+}
+
+// Bytes of four vectors of pixels, from words (0, 1) and (2, 3) side by side, to memory order.
+HWY_INLINE U8 PackLuma(I16 words01, I16 words23) {
+  static constexpr ShuffleTable kOrder({0, 2, 4, 6, 1, 3, 5, 7, 8, 10, 12, 14, 9, 11, 13, 15});
+  return OrderPacked4(hn::TableLookupBytes(PackBlocks(words01, words23), kOrder.Load()));
+}
+
+// Bytes of chroma, in each 128-bit block of U and then of V, to memory order, U in the lower half.
+HWY_INLINE U8 OrderChroma(U8 packed) {
 #if HWY_TARGET == HWY_AVX3
   alignas(64) static constexpr uint16_t kOrder[32] = {0, 8,  16, 24, 1, 9,  17, 25, 2, 10, 18, 26, 3, 11, 19, 27,
                                                       4, 12, 20, 28, 5, 13, 21, 29, 6, 14, 22, 30, 7, 15, 23, 31};
@@ -111,46 +119,61 @@ HWY_INLINE U8 PackChroma(I32 u0, I32 u1, I32 v0, I32 v1) {
 #endif
 }
 
-// Luma of a vector of pixels, and chroma of a vector of filtered ones.
+// By the differences of blue and red from green: the factors of chroma sum to 0, those of luma to 1.
 struct FromBgr {
-  I16 lumaOuter, lumaInner, uOuter, uInner, vOuter, vInner;
+  struct Pixels {
+    U8 bgrg;
+    I16 chroma;  // (b - g, r - g)
+  };
+  I16 luma, u, v;
   explicit HWY_INLINE FromBgr(const Factors& f)
-      : lumaOuter(WordPair(f.luma.b, f.luma.r)),
-        lumaInner(WordPair(f.luma.g, 0)),
-        uOuter(WordPair(f.u.b, f.u.r)),
-        uInner(WordPair(f.u.g, 0)),
-        vOuter(WordPair(f.v.b, f.v.r)),
-        vInner(WordPair(f.v.g, 0)) {}
-  template <int kBits>
-  static HWY_INLINE I32 Dot(const Words& pixels, I16 outer, I16 inner, int32_t base) {
-    const I32 sum = hn::Add(MultiplyPairs(AsI16(pixels.outer), outer), MultiplyPairs(AsI16(pixels.inner), inner));
-    return hn::ShiftRight<kBits>(hn::Add(sum, Set((base << kBits) + (1 << (kBits - 1)))));
+      : luma(WordPair(2 * f.luma.b, 2 * f.luma.r)), u(WordPair(f.u.b, f.u.r)), v(WordPair(f.v.b, f.v.r)) {}
+  static HWY_INLINE Pixels Split(U8 pixels) {
+    const U8 bgrg = hn::TableLookupBytes(pixels, ByteOrder<0x1210>());
+    return {bgrg, SubtractOddBytes(bgrg)};
   }
-  HWY_INLINE I32 Luma(const Words& pixels) const { return Dot<kFactorBits>(pixels, lumaOuter, lumaInner, 0); }
-  template <int kBits>
-  HWY_INLINE I32 U(const Words& sums) const {
-    return Dot<kFactorBits + kBits>(sums, uOuter, uInner, 128);
+  // What luma has besides green, in the high words.
+  HWY_INLINE I16 LumaDifference(const Pixels& p) const {
+    return AsI16(hn::Add(MultiplyPairs(p.chroma, luma), Set(1 << kFactorBits)));
+  }
+  // Words of two vectors side by side.
+  HWY_INLINE I16 Luma(const Pixels& p0, const Pixels& p1) const {
+    const U16 green = hn::ShiftRight<8>(hn::OddEven(AsU16(p1.bgrg), AsU16(p0.bgrg)));
+    return hn::Add(AsI16(green), JoinHighWords(LumaDifference(p0), LumaDifference(p1)));
   }
   template <int kBits>
-  HWY_INLINE I32 V(const Words& sums) const {
-    return Dot<kFactorBits + kBits>(sums, vOuter, vInner, 128);
+  static HWY_INLINE I32 Dot(I16 sums, I16 factors) {
+    constexpr int kShift = kFactorBits + kBits;
+    return hn::ShiftRight<kShift>(hn::Add(MultiplyPairs(sums, factors), Set((128 << kShift) + (1 << (kShift - 1)))));
+  }
+  // Of the filtered sums of two vectors.
+  template <int kBits>
+  HWY_INLINE U8 Chroma(I16 low, I16 high) const {
+    const ScalableTag<int16_t> d;
+    return OrderChroma(PackBlocks(hn::ReorderDemote2To(d, Dot<kBits>(low, u), Dot<kBits>(high, u)),
+                                  hn::ReorderDemote2To(d, Dot<kBits>(low, v), Dot<kBits>(high, v))));
   }
 };
 
 struct FromVuy {
+  struct Pixels {
+    U8 vuya;
+    I16 chroma;  // (u, v)
+  };
   explicit HWY_INLINE FromVuy(const Factors&) {}
-  template <int kBits>
-  static HWY_INLINE I32 Round(U16 words) {
-    return hn::ShiftRight<kBits>(hn::Add(hn::And(AsI32(words), Set(0xFFFF)), Set(1 << (kBits - 1))));
+  static HWY_INLINE Pixels Split(U8 pixels) {
+    return {pixels, AsI16(hn::TableLookupBytes(pixels, ByteOrder<0x8081>()))};
   }
-  HWY_INLINE I32 Luma(const Words& pixels) const { return hn::ShiftRight<16>(AsI32(pixels.outer)); }
-  template <int kBits>
-  HWY_INLINE I32 U(const Words& sums) const {
-    return Round<kBits>(sums.inner);
+  HWY_INLINE I16 Luma(const Pixels& p0, const Pixels& p1) const {
+    return hn::And(JoinHighWords(AsI16(p0.vuya), AsI16(p1.vuya)), AsI16(Dwords(0x00FF00FF)));
   }
   template <int kBits>
-  HWY_INLINE I32 V(const Words& sums) const {
-    return Round<kBits>(sums.outer);
+  HWY_INLINE U8 Chroma(I16 low, I16 high) const {
+    static constexpr ShuffleTable kPlanes({0, 2, 4, 6, 8, 10, 12, 14, 1, 3, 5, 7, 9, 11, 13, 15});
+    const auto round = [](I16 sums) HWY_ATTR {
+      return hn::ShiftRight<kBits>(hn::Add(sums, hn::Set(ScalableTag<int16_t>(), 1 << (kBits - 1))));
+    };
+    return OrderChroma(hn::TableLookupBytes(PackBlocks(round(low), round(high)), kPlanes.Load()));
   }
 };
 
@@ -162,50 +185,45 @@ class Encoder {
     uint32_t pixelA, pixelB;
     std::memcpy(&pixelA, a, 4);
     std::memcpy(&pixelB, b, 4);
-    mBefore = Sum(Words::Of(Dwords(pixelA)), Words::Of(Dwords(pixelB)));
+    mBefore = WeightedSum<W>(Op::Split(Dwords(pixelA)).chroma, Op::Split(Dwords(pixelB)).chroma);
   }
 
-  // (A loop over the four vectors would not be unrolled, and go through memory.)
   HWY_INLINE void Block(const uint8_t* a, const uint8_t* b, uint8_t* lumaA, uint8_t* lumaB, uint8_t* u, uint8_t* v) {
     const ScalableTag<uint8_t> d;
     const hn::Half<decltype(d)> dHalf;
-    const Step s0 = Next(a, b, 0), s1 = Next(a, b, 1), s2 = Next(a, b, 2), s3 = Next(a, b, 3);
-    StoreVector(PackTo8(s0.lumaA, s1.lumaA, s2.lumaA, s3.lumaA), lumaA);
-    StoreVector(PackTo8(s0.lumaB, s1.lumaB, s2.lumaB, s3.lumaB), lumaB);
-    const Words low = Filter(s0.pairs, s1.pairs), high = Filter(s2.pairs, s3.pairs);
-    const U8 chroma = PackChroma(mOp.template U<W::kBits>(low), mOp.template U<W::kBits>(high),
-                                 mOp.template V<W::kBits>(low), mOp.template V<W::kBits>(high));
+    const Step low = Next(a, b), high = Next(a + 2 * HWY_MAX_BYTES, b + 2 * HWY_MAX_BYTES);
+    StoreVector(PackLuma(low.lumaA, high.lumaA), lumaA);
+    StoreVector(PackLuma(low.lumaB, high.lumaB), lumaB);
+    const U8 chroma = mOp.template Chroma<W::kBits>(low.chroma, high.chroma);
     hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
     hn::StoreU(hn::UpperHalf(dHalf, chroma), dHalf, v);
   }
 
  private:
-  // Of one vector of pixels of either line: luma, and their sums with those one to the left.
+  using Pixels = typename Op::Pixels;
+  // Of two vectors of pixels of either line: luma, and the filtered sums of chroma.
   struct Step {
-    I32 lumaA, lumaB;
-    Words pairs;
+    I16 lumaA, lumaB, chroma;
   };
-  HWY_INLINE Step Next(const uint8_t* a, const uint8_t* b, size_t index) {
-    const Words wordsA = Words::Of(LoadVector<uint8_t>(a, index)), wordsB = Words::Of(LoadVector<uint8_t>(b, index));
-    const Words sum = Sum(wordsA, wordsB), before = mBefore;
-    mBefore = sum;
-    return {mOp.Luma(wordsA),
-            mOp.Luma(wordsB),
-            {hn::Add(sum.outer, PixelBefore(before.outer, sum.outer)),
-             hn::Add(sum.inner, PixelBefore(before.inner, sum.inner))}};
+  HWY_INLINE Step Next(const uint8_t* a, const uint8_t* b) {
+    const Pixels a0 = Op::Split(LoadVector<uint8_t>(a, 0)), a1 = Op::Split(LoadVector<uint8_t>(a, 1));
+    const Pixels b0 = Op::Split(LoadVector<uint8_t>(b, 0)), b1 = Op::Split(LoadVector<uint8_t>(b, 1));
+    return {mOp.Luma(a0, a1), mOp.Luma(b0, b1),
+            Filter(WeightedSum<W>(a0.chroma, b0.chroma), WeightedSum<W>(a1.chroma, b1.chroma))};
   }
-  static HWY_INLINE Words Sum(const Words& a, const Words& b) {
-    return {WeightedSum<W>(a.outer, b.outer), WeightedSum<W>(a.inner, b.inner)};
-  }
-  static HWY_INLINE Words Filter(const Words& low, const Words& high) {
-    return {AddNeighbours(low.outer, high.outer), AddNeighbours(low.inner, high.inner)};
+  // (1, 2, 1) about the even pixels.
+  HWY_INLINE I16 Filter(I16 low, I16 high) {
+    const EvenOdd sums = TakeApart(low, high);
+    const I16 moved = MoveBehind(sums.odd), before = ReplaceFirst(mBefore, moved);
+    mBefore = moved;
+    return hn::Add(hn::Add(sums.even, sums.even), hn::Add(sums.odd, before));
   }
 
   const Op mOp;
-  Words mBefore;
+  I16 mBefore;  // the odd pixel before, in the first place
 };
 
-// Asks for memory. Addresses that are not there do no harm.
+// Asks for memory. Addresses past its end do no harm.
 template <size_t kBytes>
 HWY_INLINE void Fetch(uintptr_t address) {
   for (size_t offset = 0; offset < kBytes; offset += 64)
