@@ -321,7 +321,7 @@ TEST(Decode420, EveryFormatAndBranch) {
       {16, 8, 16, 8},   {1, 1, 1, 1},     {2, 2, 2, 2},    {5, 3, 5, 3},   {37, 6, 37, 6},  {130, 3, 130, 3},
       {257, 5, 257, 5}, {64, 10, 64, 5},  {7, 7, 7, 3},    {38, 7, 19, 3}, {16, 12, 8, 6},  {16, 16, 16, 4},
       {32, 16, 8, 4},   {64, 32, 8, 2},   {64, 24, 32, 4}, {32, 64, 8, 1}, {34, 40, 17, 2}, {96, 5, 128, 5},
-      {96, 8, 128, 4},  {192, 3, 256, 3}, {16, 5, 24, 5},  {48, 9, 72, 4}, {80, 2, 120, 1},
+      {96, 8, 128, 4},  {192, 3, 256, 3}, {16, 5, 24, 5},  {48, 9, 72, 4}, {80, 2, 120, 1}, {4131, 3, 4131, 3},
   };
   const F destinations[] = {F::BGRA_4444_8u, F::VUYX_4444_8u, F::VUYP_4444_8u_709};
   std::vector<F> formats = Formats420();
@@ -353,7 +353,8 @@ TEST(Decode420, MatricesOverAllCodes) {
       for (int u = 0; u < 256; u += all ? 1 : 5)
         for (int v = 0; v < 256; v += all ? 1 : 5) {
           const std::vector<uint8_t> us(128, static_cast<uint8_t>(u)), vs(128, static_cast<uint8_t>(v));
-          kernels.nearest.bytes[ActiveKernelVariant()]({luma.data(), us.data(), vs.data(), pixels.data(), 256, false}, matrix);
+          kernels.nearest.bytes[ActiveKernelVariant()]({luma.data(), us.data(), vs.data(), pixels.data(), 256, false},
+                                                       matrix);
           const auto black = ToCodes({0, double(u), double(v)}, src, dst), step = ToCodes({1, 128, 128}, src, dst),
                      zero = ToCodes({0, 128, 128}, src, dst);
           for (int y = 0; y < 256; ++y)
