@@ -11,14 +11,14 @@
 
 namespace vexel::testing {
 
-// Runs the active variant over typed rows.
+// Runs a variant over typed rows.
 template <class To, class From>
 std::vector<To> RunKernel(const RowKernelSet& kernels, const std::vector<From>& source, size_t count,
-                          size_t destinationSize) {
+                          size_t destinationSize, KernelVariant variant = ActiveKernelVariant()) {
   std::vector<To> destination(destinationSize);
   const FpModeGuard guard;
-  kernels[ActiveKernelVariant()](reinterpret_cast<const uint8_t*>(source.data()),
-                                 reinterpret_cast<uint8_t*>(destination.data()), count);
+  kernels[variant](reinterpret_cast<const uint8_t*>(source.data()), reinterpret_cast<uint8_t*>(destination.data()),
+                   count);
   return destination;
 }
 

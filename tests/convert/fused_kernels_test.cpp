@@ -38,7 +38,7 @@ TEST(FusedKernels, MovesAreExact) {
   EXPECT_EQ(RunKernel<uint8_t>(kSwap422_8u, bytes, 4, 8), (std::vector<uint8_t>{2, 1, 4, 3, 6, 5, 8, 7}));
 }
 
-TEST(FusedKernels, EqualTheirSteps) {
+TEST(FusedKernels, EqualTheirPlainSteps) {
   constexpr F k8 = F::BGRA_4444_8u, k15 = F::BGRA_4444_15u, k32 = F::BGRA_4444_32f, kPairs8 = F::UYVY_422_8u,
               kPairs32 = F::UYVY_422_32f;
   const struct {
@@ -93,6 +93,7 @@ TEST(FusedKernels, EqualTheirSteps) {
       {kBgra8ToUyvy8_709, {&kPremultiplyLast8u, &kBgra8ToVuya8_709, &kVuyx8ToUyvy8}, k8, kPairs8},
       {kBgrx8ToUyvy8_601, {&kBgrx8ToVuyx8_601, &kVuyx8ToUyvy8}, k8, kPairs8},
       {kBgrx8ToUyvy8_709, {&kBgrx8ToVuyx8_709, &kVuyx8ToUyvy8}, k8, kPairs8},
+      {kVuyx8ToUyvy8, {&kVuyx8ToUyvy8}, k8, kPairs8},
       {kYuyv8ToBgrx8_601, {&kSwap422_8u, &kUyvy8ToBgrx8_601}, kPairs8, k8},
       {kYuyv8ToBgrx8_709, {&kSwap422_8u, &kUyvy8ToBgrx8_709}, kPairs8, k8},
       {kYuyv8ToVuyx8, {&kSwap422_8u, &kUyvy8ToVuyx8}, kPairs8, k8},
@@ -109,13 +110,14 @@ TEST(FusedKernels, EqualTheirSteps) {
       };
       std::vector<uint8_t> source(rowBytes(kernel.from)), steps = source;
       FillSamples(source.data(), source.size(), kernel.from, static_cast<Contents>(count % kContentsCount), random);
-      if (kernel.from == k8) {  // one pixel that is not opaque
+      if (kernel.from == k8) {  // all opaque, all but one, any alphas
         for (size_t i = 0; count % 3 == 0 && i < count; ++i) source[4 * i + 3] = 255;
-        source[count / 2 * 4 + 3] = 77;
+        if (count % 6 != 0) source[count / 2 * 4 + 3] = 77;
       }
       const auto fused = RunKernel<uint8_t>(kernel.fused, source, count, rowBytes(kernel.to));
       steps = source;
-      for (const RowKernelSet* step : kernel.steps) steps = RunKernel<uint8_t>(*step, steps, count, 16 * count + 16);
+      for (const RowKernelSet* step : kernel.steps)
+        steps = RunKernel<uint8_t>(*step, steps, count, 16 * count + 16, KernelVariant::Plain);
       steps.resize(fused.size());
       ASSERT_EQ(fused, steps) << "kernel " << &kernel - kernels << ", " << count << " pixels";
     }
