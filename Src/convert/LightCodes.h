@@ -2,6 +2,7 @@
 #pragma once
 
 #include <bit>
+#include <cstddef>
 #include <cstdint>
 #include <xmmintrin.h>
 
@@ -29,24 +30,30 @@ class DefaultFpMode {
   uint32_t mSaved;
 };
 
-// The light of each 8u code in the three colour channels, and what it is as alpha: the entry of a code holds it at the
-// place of each channel. Made by the first caller; others wait for it.
-struct LinearCodes {
+// The light of each 8u code as a colour, and what it is as alpha, each twice in a row: so a pixel is put together from
+// four unaligned loads of 16 bytes, which may begin one entry early or end one late. Made by the first caller; others
+// wait for it.
+class LinearCodes {
+ public:
   static const LinearCodes& Get() noexcept {
     static const LinearCodes codes;
     return codes;
   }
-  alignas(64) float entries[256][4];
+  float Light(size_t code) const { return mLight[code + 1][0]; }
+  float Alpha(size_t code) const { return mAlpha[code + 1][0]; }
+  const float* Lights() const { return mLight[1]; }
+  const float* Alphas() const { return mAlpha[1]; }
 
  private:
   LinearCodes() noexcept {
     const DefaultFpMode mode;
     for (int c = 0; c < 256; ++c) {
-      const float light = SignedPower(c * k8uTo32f, kToLinear);
-      entries[c][0] = entries[c][1] = entries[c][2] = light;
-      entries[c][3] = c * k8uTo32f;
+      mLight[c + 1][0] = mLight[c + 1][1] = SignedPower(c * k8uTo32f, kToLinear);
+      mAlpha[c + 1][0] = mAlpha[c + 1][1] = c * k8uTo32f;
     }
   }
+  alignas(64) float mLight[258][2] = {};
+  alignas(64) float mAlpha[258][2] = {};
 };
 
 // NarrowLightTo8 as a look-up that gives exactly its results. The function rises from 0 to 255 between 2^-23 and 1,

@@ -20,9 +20,10 @@ struct BytePlanes {
 
  private:
   BytePlanes() noexcept {
-    for (int code = 0; code < 256; ++code) {
+    for (size_t code = 0; code < 256; ++code) {
+      const float value = LinearCodes::Get().Light(code);
       uint8_t light[4];
-      std::memcpy(light, &LinearCodes::Get().entries[code][0], 4);
+      std::memcpy(light, &value, 4);
       for (int k = 0; k < 4; ++k) bytes[k][code] = light[k];
     }
   }

@@ -154,27 +154,33 @@ class LinearToBgra8Body {
 };
 
 #if HWY_TARGET <= HWY_SSE4
-// A pixel is put together from the entries of its four codes, 16 bytes each.
-HWY_ATTR void Bgra8ToLinear(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return LightLookup512(src, dst, count);
-  const float* const entries = LinearCodes::Get().entries[0];
-  const auto entry = [entries](uint64_t offset)
-                         HWY_ATTR { return _mm_load_ps(entries + (offset & 0xFF0) / sizeof(float)); };
+HWY_INLINE void LookUpLight(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+  const LinearCodes& codes = LinearCodes::Get();
+  const float *const lights = codes.Lights(), *const alphas = codes.Alphas();
+  // The third and fourth floats from the entry before, where they are those of this one.
+  const float *const thirdLights = lights - 2, *const fourthAlphas = alphas - 2;
   for (size_t i = 0; i < count; ++i) {
-    uint32_t bits;
-    std::memcpy(&bits, src + 4 * i, 4);
-    const uint64_t pixel = bits;
-    const __m128 blueGreen = _mm_blend_ps(entry(pixel << 4), entry(pixel >> 4), 2);
-    const __m128 redAlpha = _mm_blend_ps(entry(pixel >> 12), entry(pixel >> 20), 8);
+    uint32_t pixel;
+    std::memcpy(&pixel, src + 4 * i, 4);
+    const auto entry = [](const float* table, size_t code) HWY_ATTR { return _mm_loadu_ps(table + 2 * code); };
+    const uint32_t upper = pixel >> 16;
+    const __m128 blueGreen = _mm_blend_ps(entry(lights, pixel & 255), entry(lights, pixel >> 8 & 255), 2);
+    const __m128 redAlpha = _mm_blend_ps(entry(thirdLights, upper & 255), entry(fourthAlphas, upper >> 8), 8);
     _mm_storeu_ps(reinterpret_cast<float*>(dst + 16 * i), _mm_blend_ps(blueGreen, redAlpha, 12));
   }
 }
 #else
-HWY_ATTR void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) { plain::Bgra8ToLinear(src, dst, count); }
+HWY_INLINE void LookUpLight(const uint8_t* src, uint8_t* dst, size_t count) { plain::Bgra8ToLinear(src, dst, count); }
 #endif
+HWY_ATTR void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return LightLookup512(src, dst, count);
+  constexpr size_t kPixels = 64;
+  RowLoop<kPixels, 4, 16>(src, dst, count,
+                          [](const uint8_t* in, uint8_t* out) HWY_ATTR { LookUpLight(in, out, kPixels); });
+}
 
-// Powers of the colours of pixels, block by block, in two passes that load and store pixels themselves: their
-// exponents, then 2^exponent. The steps and special cases are those of frame/Power-inl.h.
+// Powers of the colours of pixels, block by block, in three passes of which the first and the last load and store the
+// pixels. The steps and special cases are those of frame/Power-inl.h.
 template <const PowerExponent& kExponent, AlphaWrite kAlpha>
 class PixelPowers {
  public:
@@ -314,7 +320,8 @@ void Delinearize(const uint8_t* src, uint8_t* dst, size_t count) {
 void Bgra8ToLinear(const uint8_t* src, uint8_t* dst, size_t count) {
   const LinearCodes& codes = LinearCodes::Get();
   MapPixels<uint8_t, float>(src, dst, count, [&](const uint8_t* in, float* out) {
-    ForChannels([&](size_t k) { out[k] = codes.entries[in[k]][k]; });
+    ForChannels<3>([&](size_t k) { out[k] = codes.Light(in[k]); });
+    out[3] = codes.Alpha(in[3]);
   });
 }
 
