@@ -379,6 +379,8 @@ HWY_INLINE void Blocks(const uint8_t* y, const uint8_t* u, const uint8_t* v, con
   constexpr bool kIsExact = S::kIsDirect && !S::kMixes;
   constexpr size_t kChromaStep = (S::kIsFull ? kBlock : kPairs) * (S::kMixes ? 2 * S::kLumaBytes : S::kChromaBytes);
   for (; count >= kBlock; count -= kBlock) {
+    // Beside stores past the cache processors do not keep up with three rows of words.
+    if constexpr (kStream && S::kWideLuma && S::kMixes) FetchAhead<kBlock * S::kLumaBytes>(y);
     Block<S, kStream>(y, u, v, op, dst);
     y += kBlock * S::kLumaBytes, dst += kBlock * 4;
     u += kChromaStep, v += kChromaStep;
