@@ -93,7 +93,7 @@ void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
   const auto misalignment = static_cast<int32_t>(reinterpret_cast<uintptr_t>(job.dst) % kTileBytes);
   const int32_t top = stream && misalignment ? std::min((kTileBytes - misalignment) >> sizeLog, job.height) : 0;
   const int32_t bottom = top + (job.height - top) / tile * tile;
-  const int32_t block = tile * static_cast<int32_t>(kStripTiles(elementSize));
+  const int32_t block = tile * static_cast<int32_t>(kStripTiles);
   const auto edge = [&](int32_t x, int32_t columns, int32_t y, int32_t rows) {
     if (columns > 0 && rows > 0) TransposeEdge(job, elementSize, stored, x, y, columns, rows);
   };

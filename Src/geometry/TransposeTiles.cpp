@@ -179,7 +179,7 @@ HWY_INLINE void Strip(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, p
     const uint8_t* from = src + x * kTileBytes;
     if (gather) {
       const hn::ScalableTag<uint8_t> d;
-      constexpr size_t kTiles = kStripTiles(kSize);
+      constexpr size_t kTiles = kStripTiles;
       alignas(64) uint8_t in[kTiles * kRows * kTileBytes];
       for (size_t i = 0; i < rows; ++i, from += srcRowBytes) {
         if (i % kAhead == 0) fetch(1);

@@ -11,9 +11,9 @@ namespace vexel {
 inline constexpr int kTileBytes = 64;
 
 // Tiles that stand one below the other in the source: their rows are read side by side, and of a destination row they
-// fill at least 256 bytes. Lines that are written far apart are slow even past the cache, most of all a multiple of
+// fill 256 bytes. Lines that are written far apart are slow even past the cache, most of all a multiple of
 // 4,096 bytes apart; four in a row are not.
-constexpr size_t kStripTiles(int elementSize) { return elementSize < 4 ? 4 : static_cast<size_t>(elementSize); }
+inline constexpr size_t kStripTiles = 4;
 
 // Full tiles of kTileBytes / size elements each way, up to kStripTiles `down` and any number `across`.
 using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes,
