@@ -141,10 +141,7 @@ HWY_INLINE void Subsample(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT
   if (rest > 0) std::memcpy(dst + blocks * kDstStep, out, (rest + 1) / 2 * 4);
 }
 
-HWY_ATTR void Vuyx8ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) {
-  if (HWY_TARGET == HWY_AVX3 && HasSubsample512()) return Vuyx8ToUyvy512(src, dst, count);
-  Subsample(src, dst, count, FromVuyx());
-}
+HWY_ATTR void Vuyx8ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) { Subsample(src, dst, count, FromVuyx()); }
 
 template <bool kPremultiply>
 HWY_ATTR void BgraToUyvy(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& m) {

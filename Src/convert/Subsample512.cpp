@@ -242,52 +242,8 @@ VX_SUBSAMPLE bool Subsample(const uint8_t* src, uint8_t* dst, size_t count, cons
   return pipeline.check.AllOpaque();
 }
 
-// Where the bytes of Words come from in 32 pixels VUYX. High bytes of chroma are those of the order itself.
-struct VuyxOrder {
-  constexpr VuyxOrder() : even{}, odd{}, luma{} {
-    for (uint32_t i = 0; i < 64; ++i) {
-      const uint32_t pair = i / 4 * 8;
-      even[i] = static_cast<uint8_t>(i % 2 == 0 ? pair + (i % 4 == 0 ? 1 : 0) : kClamp >> 8);
-      odd[i] = static_cast<uint8_t>(i % 2 == 0 ? even[i] + 4u : kClamp >> 8);
-      luma[i] = static_cast<uint8_t>(pair + (i % 4 < 2 ? 2 : 6));
-    }
-  }
-  alignas(64) uint8_t even[64], odd[64], luma[64];
-};
-constexpr VuyxOrder kVuyx;
-
-VX_SUBSAMPLE_INLINE Words LoadVuyx(const uint8_t* src) {
-  constexpr __mmask64 kChroma = 0x5555555555555555;
-  for (size_t line = 0; line < kBlockBytes; line += 64)
-    __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + line));
-  const __m512i a = _mm512_loadu_si512(src), b = _mm512_loadu_si512(src + 64);
-  const __m512i odd = _mm512_mask2_permutex2var_epi8(a, _mm512_load_si512(kVuyx.odd), kChroma, b);
-  return {_mm512_mask2_permutex2var_epi8(a, _mm512_load_si512(kVuyx.even), kChroma, b),
-          _mm512_add_epi16(odd, _mm512_set1_epi16(1)),
-          _mm512_maskz_permutex2var_epi8(~kChroma, a, _mm512_load_si512(kVuyx.luma), b)};
-}
-
-VX_SUBSAMPLE void SubsampleVuyx(const uint8_t* src, uint8_t* dst, size_t count) {
-  const Row row(src, count);
-  const size_t rest = count % kBlockPixels, steps = row.blocks + (rest > 0);
-  alignas(64) uint8_t out[kPairBytes];
-  Words now = LoadVuyx(row.Block(0)), next = LoadVuyx(row.Block(1));
-  __m512i before = _mm512_set1_epi16(1), details = Details(now, next.even);
-  for (size_t i = 0; i < steps; ++i) {
-    const Words after = LoadVuyx(row.Block(i + 2));
-    const __m512i nextDetails = Details(next, after.even);
-    Store(now, details, before, i < row.blocks ? dst + i * kPairBytes : out);
-    before = details, details = nextDetails;
-    now = next, next = after;
-  }
-  if (rest > 0) std::memcpy(dst + row.blocks * kPairBytes, out, (rest + 1) / 2 * 4);
-}
-
 }  // namespace
 
-void Vuyx8ToUyvy512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
-  if (count > 0) SubsampleVuyx(src, dst, count);
-}
 void Bgra8ToUyvy512(const uint8_t* src, uint8_t* dst, size_t count, const FixedMatrix8& matrix) noexcept {
   if (count == 0 || Subsample<Alpha::Opaque>(src, dst, count, matrix)) return;
   Subsample<Alpha::Premultiplied>(src, dst, count, matrix);
