@@ -108,8 +108,7 @@ const float* PQColorSpace::LuminanceCoeffs() const {
 
 // Neither function clamps: negative light and signals outside the curve give NaN, as the powers do.
 float PQColorSpace::LinearToEOTF(float linear) const {
-  const float y = Power(linear * 0.01f, kPqM1);
-  const float signal = PowerOfOneLess(PqRatioBelowOne(y), kPqM2);
+  const float signal = PowerOfOneLess(PqRatioBelowOne(linear * 0.01f), kPqM2);
   return mRefWhiteSet ? signal / mRefWhite : signal;
 }
 

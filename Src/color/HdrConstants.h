@@ -31,9 +31,13 @@ inline float PqLight(float signal) {
 }
 
 // The ratio of ST 2084 whose power is the signal, (c2 y + c1) / (c3 y + 1), is 1 less this: near 1 it needs more digits
-// than a float has, because the exponent multiplies its error by 79.
+// than a float has, because the exponent multiplies its error by 79. For the same reason y, light in units of 10,000
+// cd/m2 to m1, is not rounded to a float, nor what is made of it.
 inline constexpr float kPqBelowOne = 1.0f - kPqC1;  // And c2 - c3.
-inline float PqRatioBelowOne(float y) { return kPqBelowOne * (1.0f - y) / (kPqC3 * y + 1.0f); }
+inline float PqRatioBelowOne(float light) {
+  const double y = UnroundedPower(light, kPqM1), below = kPqBelowOne, c3 = kPqC3;
+  return static_cast<float>(below * (1.0 - y) / (c3 * y + 1.0));
+}
 
 // BT.2100 writes the logarithmic segment for 12 E; here the 12 is folded into the constants.
 inline constexpr float kHlgA = 0.17883277f, kHlgB = 0.02372241f, kHlgC = 1.0042934f, kHlgInverseA = 5.5918164f;

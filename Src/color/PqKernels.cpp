@@ -20,11 +20,45 @@ HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 
-HWY_INLINE OneLess PqEncodingRatio(ColorVector v) {
+// PqRatioBelowOne of the halves of a vector.
+using HalfColorTag = hn::Half<ColorTag>;
+HWY_INLINE hn::Vec<HalfColorTag> PqRatioBelowOne(hn::Vec<HalfColorTag> root, hn::Vec<HalfColorTag> rest) {
+  const hn::RepartitionToWide<ColorTag> dd;
+  const auto one = hn::Set(dd, 1.0);
+  const auto y = hn::Add(hn::PromoteTo(dd, root), hn::PromoteTo(dd, rest));
+  const auto above = hn::Mul(hn::Set(dd, double{kPqBelowOne}), hn::Sub(one, y));
+  return hn::DemoteTo(HalfColorTag(), hn::Div(above, hn::Add(hn::Mul(hn::Set(dd, double{kPqC3}), y), one)));
+}
+
+// Light, in units of 10,000 cd/m2, becomes PqRatioBelowOne of it. Without kAny it is refused where there are minus
+// signs; with it signs are dropped.
+template <bool kAny>
+HWY_INLINE bool PqRatiosBelowOne(PixelBlock& block) {
   const ColorTag d;
-  const auto one = hn::Set(d, 1.0f);
-  const auto y = hn::Abs(v);
-  return {hn::Div(hn::Mul(hn::Set(d, kPqBelowOne), hn::Sub(one, y)), hn::Add(hn::Mul(hn::Set(d, kPqC3), y), one))};
+  const HalfColorTag dh;
+  return UnroundedPowers<PowerCore::Float, !kAny>(
+      block.colors, 3 * block.pixels, block.scratch, kPqM1,
+      [](ColorVector v) VX_COLOR_STAGE { return kAny ? hn::Abs(v) : v; },
+      [&](const PowerTerms& y, ColorVector) VX_COLOR_STAGE {
+        return hn::Combine(d, PqRatioBelowOne(hn::UpperHalf(dh, y.root), hn::UpperHalf(dh, y.rest)),
+                           PqRatioBelowOne(hn::LowerHalf(dh, y.root), hn::LowerHalf(dh, y.rest)));
+      });
+}
+
+HWY_INLINE void LightToPq(PixelBlock& block, float scale) {
+  const ColorTag d;
+  const auto ratio = [](ColorVector u) VX_COLOR_STAGE { return OneLess{u}; };
+  const auto scaled = [&](ColorVector power, ColorVector) VX_COLOR_STAGE { return hn::Mul(power, hn::Set(d, scale)); };
+  if (HWY_LIKELY(!block.negative) && PqRatiosBelowOne<false>(block))
+    return Powers<PowerCore::Long>(block, kPqM2, ratio, scaled);
+  block.negative = true;
+  const size_t count = 3 * block.pixels;
+  HWY_ALIGN float light[3 * PixelBlock::kPixels];
+  std::memcpy(light, block.colors, count * sizeof(float));
+  PqRatiosBelowOne<true>(block);
+  Powers<PowerCore::Long>(block, kPqM2, ratio, scaled);
+  for (size_t i = 0; i < count; i += hn::Lanes(d))
+    hn::Store(WithSignOf(hn::Load(d, block.colors + i), hn::Load(d, light + i)), d, block.colors + i);
 }
 
 HWY_INLINE ColorVector PqRatioOf(ColorVector t) {
@@ -92,11 +126,7 @@ void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
       const auto scale = hn::Set(d, 0.01f);
       c = {hn::Mul(c.r, scale), hn::Mul(c.g, scale), hn::Mul(c.b, scale)};
     });
-    SignedPowers<PowerCore::Float>(block, kPqM1);
-    Powers<PowerCore::Long>(
-        block, kPqM2, [](ColorVector v) VX_COLOR_STAGE { return PqEncodingRatio(v); },
-        [&](ColorVector power, ColorVector v)
-            VX_COLOR_STAGE { return WithSignOf(hn::Mul(power, hn::Set(d, local.scale)), v); });
+    LightToPq(block, local.scale);
   });
 }
 
@@ -149,8 +179,8 @@ void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
     ForEachChannel(c, [](float v) { return SignedPower(v, kPower2_4); });
     c = Apply(job.matrix, c);
     ForEachChannel(c, [&](float v) {
-      const float light = v * 0.01f, y = Power(std::fabs(light), kPqM1);
-      return WithSignOf(PowerOfOneLess(PqRatioBelowOne(y), kPqM2) * job.scale, light);
+      const float light = v * 0.01f;
+      return WithSignOf(PowerOfOneLess(PqRatioBelowOne(std::fabs(light)), kPqM2) * job.scale, light);
     });
   });
 }

@@ -9,6 +9,7 @@
 #include <bit>
 #include <cstddef>
 #include <cstdint>
+#include <type_traits>
 
 #include <hwy/highway.h>
 
@@ -28,6 +29,11 @@ namespace hn = hwy::HWY_NAMESPACE;
 // An argument 1 - u, as for PowerOfOneLess.
 struct OneLess {
   hn::Vec<hn::ScalableTag<float>> u;
+};
+
+// A power as the sum of two, before that is rounded.
+struct PowerTerms {
+  hn::Vec<hn::ScalableTag<float>> root, rest;
 };
 
 // Tables of eight floats, looked up without memory access. The index is the low three bits of each lane; what stands
@@ -205,22 +211,29 @@ HWY_INLINE Eighths EighthsOf(const LogSum& sum) {
   return {count, hn::Add(kLong ? hn::Add(left, sum.middle) : left, sum.small)};
 }
 
-// The last step: 2^(n / 8 + f + kRootShift). kAll: results that overflow or are denormal too.
-template <bool kAll>
-HWY_INLINE V Exp2Of(const Eighths& t) {
+HWY_INLINE V SumOf(const PowerTerms& terms) { return hn::Add(terms.root, terms.rest); }
+
+// The last step: 2^(n / 8 + f + kRootShift), normal and finite, as a sum.
+HWY_INLINE V Exp2Part(V f) { return hn::Mul(f, Cubic(f, hn::Mul(f, f), vexel::power::kExp2)); }
+HWY_INLINE PowerTerms Exp2Terms(const Eighths& t) {
   const D d;
   const DI di;
-  const V part = hn::Mul(t.f, Cubic(t.f, hn::Mul(t.f, t.f), vexel::power::kExp2));
   const VI bits = hn::BitCast(di, t.count);
-  const EighthIndex index = MakeEighthIndex(bits);
+  // The count shifted to the exponent's place; the eighths that come along are taken out of the table's entries.
+  const VI shifted = hn::BitCast(di, LookupEighth(kShiftedRoot.entries, MakeEighthIndex(bits)));
+  const V root = hn::BitCast(d, hn::Add(shifted, hn::ShiftLeft<20>(bits)));
+  return {root, hn::Mul(root, Exp2Part(t.f))};
+}
+
+// kAll: results that overflow or are denormal too.
+template <bool kAll>
+HWY_INLINE V Exp2Of(const Eighths& t) {
   if constexpr (!kAll) {
-    // The count shifted to the exponent's place; the eighths that come along are taken out of the table's entries.
-    const VI shifted = hn::BitCast(di, LookupEighth(kShiftedRoot.entries, index));
-    const V root = hn::BitCast(d, hn::Add(shifted, hn::ShiftLeft<20>(bits)));
-    return hn::Add(root, hn::Mul(root, part));
+    return SumOf(Exp2Terms(t));
   } else {
-    const V root = LookupEighth(vexel::power::kRoot, index);
-    return ScaleByEighths(hn::Add(root, hn::Mul(root, part)), bits);
+    const VI bits = hn::BitCast(DI(), t.count);
+    const V root = LookupEighth(vexel::power::kRoot, MakeEighthIndex(bits));
+    return ScaleByEighths(hn::Add(root, hn::Mul(root, Exp2Part(t.f))), bits);
   }
 }
 
@@ -272,6 +285,13 @@ HWY_INLINE V MendRare(V fast, V magnitude, const PowerExponent& y) {
   return hn::IfThenElse(hn::RebindMask(d, outside), PowerAll<kCore>(magnitude, y), power);
 }
 
+template <PowerCore kCore>
+HWY_INLINE PowerTerms MendRare(const PowerTerms& fast, V magnitude, const PowerExponent& y) {
+  const V mended = MendRare<kCore>(SumOf(fast), magnitude, y);
+  const auto rare = hn::RebindMask(D(), hn::Gt(AboveFirst(magnitude, y), FastSpan(y)));
+  return {hn::IfThenElse(rare, mended, fast.root), hn::IfThenZeroElse(rare, fast.rest)};
+}
+
 // The power of NaN has no sign.
 template <bool kSigned>
 HWY_INLINE V WithoutSignedNaN(V power, V x) {
@@ -320,6 +340,16 @@ class StepArrays {
   float* HWY_RESTRICT mSecond;
 };
 
+// The last step as a finish takes it: a power or its terms.
+template <class Finish>
+HWY_INLINE auto UsualExp2For(const Eighths& t) {
+  if constexpr (std::is_invocable_v<Finish, PowerTerms, V>) {
+    return Exp2Terms(t);
+  } else {
+    return Exp2Of<false>(t);
+  }
+}
+
 template <PowerCore kCore, Signs kSigns, class Prepare, class Finish>
 HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_RESTRICT scratch,
                            const PowerExponent& y, const Prepare& prepare, const Finish& finish) {
@@ -346,11 +376,11 @@ HWY_INLINE bool PowerLoops(float* HWY_RESTRICT values, size_t count, float* HWY_
     for (size_t i = 0; i < count; i += lanes) steps.Store(EighthsOf<kCore>(LogOf<kCore>(steps.PlaceAt(i), y.log)), i);
     if (HWY_LIKELY(!rare)) {
       for (size_t i = 0; i < count; i += lanes)
-        hn::Store(finish(Exp2Of<false>(steps.EighthsAt(i)), hn::Load(d, values + i)), d, values + i);
+        hn::Store(finish(UsualExp2For<Finish>(steps.EighthsAt(i)), hn::Load(d, values + i)), d, values + i);
     } else {
       for (size_t i = 0; i < count; i += lanes) {
         const V v = hn::Load(d, values + i);
-        const V power = MendRare<kCore>(Exp2Of<false>(steps.EighthsAt(i)), ValueOf(prepare(v)), y);
+        const auto power = MendRare<kCore>(UsualExp2For<Finish>(steps.EighthsAt(i)), ValueOf(prepare(v)), y);
         hn::Store(WithoutSignedNaN<kSigned>(finish(power, v), v), d, values + i);
       }
     }
@@ -456,6 +486,15 @@ template <PowerCore kCore, class Prepare, class Finish>
 HWY_INLINE void Powers(float* values, size_t count, float* scratch, const PowerExponent& y, const Prepare& prepare,
                        const Finish& finish) {
   power_detail::PowerLoops<kCore, power_detail::Signs::ByFinish>(values, count, scratch, y, prepare, finish);
+}
+
+// finish(terms, value) takes the power as PowerTerms. kRefused: false is returned, with nothing done, where a value has
+// a minus sign; otherwise prepare takes signs off.
+template <PowerCore kCore, bool kRefused, class Prepare, class Finish>
+HWY_INLINE bool UnroundedPowers(float* values, size_t count, float* scratch, const PowerExponent& y,
+                                const Prepare& prepare, const Finish& finish) {
+  constexpr auto kSigns = kRefused ? power_detail::Signs::Refused : power_detail::Signs::ByFinish;
+  return power_detail::PowerLoops<kCore, kSigns>(values, count, scratch, y, prepare, finish);
 }
 
 // For arguments that are known to be positive, with normal results.

@@ -28,15 +28,24 @@ SplitArgument Split(float x) {
   return {i >> 20, std::bit_cast<float>((static_cast<uint32_t>(i) & power::kMantissaMask) + power::kFirstBits)};
 }
 
-// 2^(eighths + kRootShift + f), where eighths is a whole number of eighths below 2^18 in magnitude.
-float Exp2Tail(float eighths, float f) {
+// 2^(eighths + kRootShift + f) as (root + rest) * 2^octaves, where eighths is a whole number of eighths below 2^18 in
+// magnitude.
+struct Exp2Terms {
+  float root, rest;
+  int32_t octaves;
+};
+Exp2Terms Exp2TermsOf(float eighths, float f) {
   const uint32_t count = std::bit_cast<uint32_t>(eighths + kEighthsMagic);
-  const uint32_t j = count & 7;
   const float* c = power::kExp2;
   const float series = (c[0] + f * c[1]) + (f * f) * (c[2] + f * c[3]);
-  const float root = power::kRoot[j];
-  const float mantissa = root + root * (f * series);
-  const int32_t n = static_cast<int32_t>(count - power::kEighthsMagicBits) >> 3;
+  const float root = power::kRoot[count & 7];
+  return {root, root * (f * series), static_cast<int32_t>(count - power::kEighthsMagicBits) >> 3};
+}
+
+float Exp2Tail(float eighths, float f) {
+  const Exp2Terms terms = Exp2TermsOf(eighths, f);
+  const float mantissa = terms.root + terms.rest;
+  const int32_t n = terms.octaves;
   if (n > 128) return kInfinity;
   if (n < -125) {
     // The integer part of the result in units of the smallest denormal is its bit pattern.
@@ -47,10 +56,14 @@ float Exp2Tail(float eighths, float f) {
   return std::bit_cast<float>(bits < kInfinityBits ? bits : kInfinityBits);
 }
 
-// 2^(high + low + kRootShift); high has enough trailing zeros that taking eighths off it is exact.
-float Exp2Pair(float high, float low) {
-  const float eighths = ((high + low) + kEighthsMagic) - kEighthsMagic;
-  return Exp2Tail(eighths, (high - eighths) + low);
+// An exponent of 2 in two parts, of which `high` has enough trailing zeros that taking eighths off it is exact.
+struct ExponentPair {
+  float high, low;
+  float Eighths() const { return ((high + low) + kEighthsMagic) - kEighthsMagic; }
+};
+float Exp2Pair(const ExponentPair& t) {
+  const float eighths = t.Eighths();
+  return Exp2Tail(eighths, (t.high - eighths) + t.low);
 }
 
 double Log2Double(float x) {
@@ -67,13 +80,13 @@ float Series(const power::ScaledLog2& log, float w) {
   return (log.series[0] + w * log.series[1]) + (w * w) * (log.series[2] + w * log.series[3]);
 }
 
-float PowerFloat(float x, const power::ScaledLog2& log) {
+ExponentPair LogFloat(float x, const power::ScaledLog2& log) {
   const SplitArgument s = Split(x);
   const int j = s.eighths & 7;
   const float k = static_cast<float>(s.eighths);
   const float w = (s.mantissa - power::kCentre[j]) * log.slopes[j];
   const float rest = w + (w * w) * Series(log, w);
-  return Exp2Pair(log.eighthHigh * k, (log.eighthLow * k + log.offsets[j]) + rest);
+  return {log.eighthHigh * k, (log.eighthLow * k + log.offsets[j]) + rest};
 }
 
 // scale * log2(x) as the sum of three: `large` and `middle` exact and with trailing zeros, `small` below 2^-8 of the
@@ -131,7 +144,7 @@ float ExpOfBase(float x, const power::SplitFloat& log2Base) {
   const float top = std::bit_cast<float>(std::bit_cast<uint32_t>(x) & 0xfffff000);
   const float bottom = x - top;
   const float low = top * log2Base.low + bottom * (log2Base.high + log2Base.low);
-  return Exp2Pair(top * log2Base.high, low - static_cast<float>(power::kRootShift));
+  return Exp2Pair({top * log2Base.high, low - static_cast<float>(power::kRootShift)});
 }
 
 float LogOfBase(float x, const power::ScaledLog2& log) {
@@ -152,10 +165,19 @@ float Power(float x, const PowerExponent& y) noexcept {
   if ((bits & 0x7fffffff) == 0) return 0.0f;
   if (bits == kInfinityBits) return kInfinity;
   if (bits > kInfinityBits) return kQuietNaN;
-  return y.core == PowerCore::Float ? PowerFloat(x, y.log) : PowerLong(x, y.log);
+  return y.core == PowerCore::Float ? Exp2Pair(LogFloat(x, y.log)) : PowerLong(x, y.log);
 }
 
 float Power(float x, float y) noexcept { return Power(x, PowerExponent(y)); }
+
+double UnroundedPower(float x, const PowerExponent& y) noexcept {
+  const uint32_t bits = std::bit_cast<uint32_t>(x);
+  if (bits < y.firstBits || bits > y.lastBits) return static_cast<double>(Power(x, y));
+  const ExponentPair t = LogFloat(x, y.log);
+  const float eighths = t.Eighths();
+  const Exp2Terms terms = Exp2TermsOf(eighths, (t.high - eighths) + t.low);
+  return std::ldexp(static_cast<double>(terms.root) + static_cast<double>(terms.rest), terms.octaves);
+}
 
 float PowerOfOneLess(float u, const PowerExponent& y) noexcept {
   const float x = 1.0f - u;

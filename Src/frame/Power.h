@@ -168,6 +168,9 @@ struct PowerExponent {
 float Power(float x, const PowerExponent& y) noexcept;
 float Power(float x, float y) noexcept;
 
+// The float form before its last rounding, for normal x and results; Power otherwise. To 2^-27 of itself.
+double UnroundedPower(float x, const PowerExponent& y) noexcept;
+
 // (1 - u)^y for exponents with the long core and |u| below 1/2, without the error of rounding 1 - u where that is
 // near 1.
 float PowerOfOneLess(float u, const PowerExponent& y) noexcept;

@@ -276,8 +276,7 @@ TEST(ColorCurves, ScalarFunctionsFollowTheStandards) {
   } kPq[] = {{0.001f, 0.0623369f}, {0.01f, 0.1499457f}, {1, 0.5080784f},
              {2.03f, 0.5806888f},  {10, 0.7518271f},    {100, 1}};
   for (const auto& [light, signal] : kPq) {
-    // The curve's exponent magnifies a rounding of its argument almost eightyfold.
-    EXPECT_NEAR(pq.LinearToEOTF(light), signal, signal * 80 * 0x1p-23) << light;
+    EXPECT_NEAR(pq.LinearToEOTF(light), signal, 2e-7) << light;
     EXPECT_NEAR(pq.EOTFToLinear(signal), light, light * 2e-4) << light;
     // Reference white is a factor of the signal, to the last digit.
     EXPECT_EQ(pqWhite.LinearToEOTF(light), pq.LinearToEOTF(light) / 0.50807786f);
@@ -288,6 +287,10 @@ TEST(ColorCurves, ScalarFunctionsFollowTheStandards) {
     pqWhite.ConvertPixelsFromRec709(pixel, with, 1, false);
     for (int k = 0; k < 3; ++k) EXPECT_EQ(with[k], without[k] * 1.9682022f);
   }
+  // The curve's exponent would magnify a rounding of its argument almost eightyfold.
+  Noise none(0, 0);
+  for (float light = 1e-4f; light < 100; light *= 1.0003f)
+    ASSERT_NEAR(pq.LinearToEOTF(light), PqCurve::Encode(100.0 * (light * 0.01f), none), 6.5e-8) << light;
   EXPECT_NEAR(pqWhite.LinearToEOTF(1), 1, 1e-5);
   EXPECT_NEAR(pqWhite.EOTFToLinear(1), 1, 2e-4);
   EXPECT_TRUE(std::isnan(pq.LinearToEOTF(-1)));  // No clamping.
