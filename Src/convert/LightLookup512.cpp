@@ -32,7 +32,9 @@ struct BytePlanes {
 // Four pixels: their light, with alpha in place of the fourth. `which` repeats the index of each pixel four times.
 VX_VBMI_INLINE void Finish(__m512i light, __m512i codes, __m512i which, uint8_t* dst) {
   const __m512i alpha = _mm512_srli_epi32(_mm512_permutexvar_epi32(which, codes), 24);
-  const __m512 scaled = _mm512_mul_ps(_mm512_cvtepi32_ps(alpha), _mm512_set1_ps(k8uTo32f));
+  // To nearest like the tables, whatever the caller's rounding mode.
+  const __m512 scaled = _mm512_mul_round_ps(_mm512_cvtepi32_ps(alpha), _mm512_set1_ps(k8uTo32f),
+                                            _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC);
   _mm512_storeu_ps(dst, _mm512_mask_mov_ps(_mm512_castsi512_ps(light), 0x8888, scaled));
 }
 

@@ -3,6 +3,7 @@
 #include <climits>
 #include <cstring>
 #include <string>
+#include <utility>
 #include <vector>
 #include <xmmintrin.h>
 
@@ -204,21 +205,25 @@ TEST(Convert, EveryPairStreamsTheSameBytes) {
 
 // A caller's rounding mode reaches every kernel alike and comes back.
 TEST(Convert, RoundingModesGiveTheSameBytesInEveryVariant) {
-  const Image light(F::BGRA_4444_32f_Linear, 259, 1, 5);
   const uint32_t saved = _mm_getcsr();
-  for (const uint32_t mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
-    LineBytes plain;
-    ForEachVariant([&](int variant) {
-      Image codes(F::BGRA_4444_8u, light.width, 1, Contents::Zeros);
-      _mm_setcsr((saved & ~0x6000u) | mode);
-      Convert(light, codes, 2);
-      const uint32_t after = _mm_getcsr();
-      _mm_setcsr(saved);
-      EXPECT_EQ(after & 0x6000u, mode);
-      if (variant == 0) plain = codes.bytes;
-      EXPECT_EQ(codes.bytes, plain) << "mode " << mode;
-    });
-  }
+  const std::pair<F, F> kPairs[] = {{F::BGRA_4444_32f_Linear, F::BGRA_4444_8u},
+                                    {F::BGRA_4444_8u, F::BGRA_4444_32f_Linear}};
+  for (const auto& [from, to] : kPairs)
+    for (const uint32_t mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
+      const Image source(from, 259, 1, 5);
+      const VX_PixelFormat format = to;
+      LineBytes plain;
+      ForEachVariant([&](int variant) {
+        Image result(format, source.width, 1, Contents::Zeros);
+        _mm_setcsr((saved & ~0x6000u) | mode);
+        Convert(source, result, 2);
+        const uint32_t after = _mm_getcsr();
+        _mm_setcsr(saved);
+        EXPECT_EQ(after & 0x6000u, mode);
+        if (variant == 0) plain = result.bytes;
+        EXPECT_EQ(result.bytes, plain) << FormatName(format) << " mode " << mode;
+      });
+    }
 }
 
 // Chains run in blocks, in whole rows or fused into one kernel: always the bytes of their steps one after the other.
