@@ -1,6 +1,8 @@
 #include "frame/Bands.h"
 
 #include <atomic>
+#include <cstdint>
+#include <xmmintrin.h>
 
 #include "frame/FpModeGuard.h"
 #include "frame/Lifecycle.h"
@@ -10,12 +12,13 @@ namespace vexel {
 namespace {
 
 // Workers are the host's threads: their floating-point mode is set and put back per piece, and nothing is thrown at
-// them.
+// them. They round, and take denormals, as the caller does: else results would tell who made which piece.
 class PieceRunner {
  public:
-  explicit PieceRunner(Task& task) noexcept : mTask(task) {}
+  explicit PieceRunner(Task& task) noexcept : mTask(task), mCallersMode(_mm_getcsr() & kResultBits) {}
   void Run(int piece) noexcept try {
     const FpModeGuard guard;
+    _mm_setcsr((_mm_getcsr() & ~kResultBits) | mCallersMode);
     mTask.ExecutePiece(piece);
   } catch (...) {
     mFailed.store(true, std::memory_order_relaxed);
@@ -23,7 +26,10 @@ class PieceRunner {
   bool Succeeded() const noexcept { return !mFailed.load(std::memory_order_relaxed); }
 
  private:
+  static constexpr uint32_t kResultBits = 0x6040;  // rounding, denormals are zeros
+
   Task& mTask;
+  const uint32_t mCallersMode;
   std::atomic<bool> mFailed{false};
 };
 

@@ -96,31 +96,43 @@ TEST(Bands, FewRowsNeedNoTask) {
   vexel_host::SetExecutor(nullptr);
 }
 
-// Pieces see the mode of the entry points whatever the worker's own is, and the worker's own comes back.
+// Runs pieces in a floating-point mode of its own, which must come back.
+class RoundingExecutor : public zovcore::threads::AsyncExecutor {
+ public:
+  void RunPieces(const boost::function<void(int)>& function, int count) override {
+    constexpr unsigned kOwn = 0x3F80;  // round downward, no flush to zero
+    const unsigned callers = _mm_getcsr();
+    _mm_setcsr(kOwn);
+    for (int i = 0; i < count; ++i) {
+      function(i);
+      changed += _mm_getcsr() != kOwn;
+    }
+    _mm_setcsr(callers);
+  }
+  int changed = 0;
+};
+
+// Pieces see the mode of the entry points and the caller's rounding, whatever the worker's own is.
 TEST(Bands, PiecesRunInTheFloatingPointMode) {
-  constexpr unsigned kExceptionFlags = 0x3F;
-  const unsigned callers = _mm_getcsr();
-  _mm_setcsr(0x5F80);  // round toward minus infinity, no flush to zero, all masked
-  const unsigned before = _mm_getcsr();
-  std::atomic<int> wrong{0};
-  ForEachBand(64 * kBandRows, [&](int, int) {
-    if ((_mm_getcsr() & 0x8020) != 0x8020) ++wrong;
-    volatile float tiny = 1e-38f;
-    tiny = tiny * 0.1f;
-    if (tiny != 0) ++wrong;
-  });
-  const unsigned after = _mm_getcsr();
-  _mm_setcsr(callers);
-  EXPECT_EQ(wrong, 0);
-  EXPECT_EQ(after, before) << "exception flags included: " << ((after ^ before) & kExceptionFlags);
-  // The workers' own words: whatever a worker had, flush-to-zero must not stay on.
-  std::atomic<int> left{0};
-  zovcore::threads::ExecuteCPUBoundTaskOnAllProcessors(
-      [&](int) {
-        if (_mm_getcsr() & 0x8000) ++left;
-      },
-      256);
-  EXPECT_EQ(left, 0);
+  const auto executor = boost::make_shared<RoundingExecutor>();
+  for (const unsigned mode : {0x1F80u, 0x5FC0u}) {  // to nearest; upward with denormals as zeros
+    const unsigned callers = _mm_getcsr();
+    vexel_host::SetExecutor(executor);
+    _mm_setcsr(mode);
+    int wrong = 0;
+    ForEachBand(64 * kBandRows, [&](int, int) {
+      wrong += (_mm_getcsr() & 0xFFC0) != (mode | 0x8000);
+      volatile float tiny = 1e-38f;
+      tiny = tiny * 0.1f;
+      wrong += tiny != 0;
+    });
+    const unsigned after = _mm_getcsr();
+    _mm_setcsr(callers);
+    vexel_host::SetExecutor(nullptr);
+    EXPECT_EQ(wrong, 0);
+    EXPECT_EQ(after, mode) << "exception flags included";
+    EXPECT_EQ(executor->changed, 0);
+  }
 }
 
 TEST(Bands, ExceptionsStayInsideAndTheOtherPiecesRun) {
