@@ -184,17 +184,6 @@ HWY_INLINE void StoreBlocks(U32 v0, U32 v1, U32 v2, U32 v3, uint8_t* dst) {
   Write<kStream>(v3, dst, 3);
 }
 
-// Byte 0 of each word times a weight, plus byte 1 times another.
-HWY_INLINE I16 WeighBytes(U8 unsignedBytes, U8 signedBytes) {
-#if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
-#elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
-#else
-  return I16{_mm_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
-#endif
-}
-
 // Luma codes times 128, of bytes negative: signed factors reach no further. The matrix knows.
 template <class S>
 constexpr int kLumaSign = S::kWideLuma ? 1 : -1;

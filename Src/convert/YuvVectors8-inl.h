@@ -54,17 +54,19 @@ HWY_INLINE I32 MultiplyPairs(I16 a, I16 b) {
 #endif
 }
 
-// Byte 0 of each word less byte 1.
-HWY_INLINE I16 SubtractOddBytes(U8 v) {
-  const U8 factors = Dwords(0xFF01FF01);
+// Byte 0 of each word times a weight, plus byte 1 times another.
+HWY_INLINE I16 WeighBytes(U8 unsignedBytes, U8 signedBytes) {
 #if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_maddubs_epi16(v.raw, factors.raw)};
+  return I16{_mm512_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
 #elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_maddubs_epi16(v.raw, factors.raw)};
+  return I16{_mm256_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
 #else
-  return I16{_mm_maddubs_epi16(v.raw, factors.raw)};
+  return I16{_mm_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
 #endif
 }
+
+// Byte 0 of each word less byte 1.
+HWY_INLINE I16 SubtractOddBytes(U8 v) { return WeighBytes(v, Dwords(0xFF01FF01)); }
 
 // sum + the products of pairs. No Highway target has the single instruction without more that processors lack, so the
 // caller says whether the processor has it.
