@@ -66,8 +66,10 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
                                                : (narrow ? Over8u(choice) : Over32f(choice));
   const OverKernel over = kernels[job.Variant()];
   job.KernelStreams();
-  return job.Run(
-      [=](const RowSpan& span) { over(span.src[0], span.src[1], span.dst, span.count, opacity, span.stream); });
+  return job.Run([=](const RowSpan& span) {
+    const NearestRounding rounding(narrow);
+    over(span.src[0], span.src[1], span.dst, span.count, opacity, span.stream);
+  });
 }
 
 }  // namespace

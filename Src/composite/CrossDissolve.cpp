@@ -27,7 +27,9 @@ VX_Result CrossDissolve(const SourceImage& a, const SourceImage& b, const Target
   const VX_Result check = job.CheckBuffers(&done);
   if (check != VX_Success || done) return check;
   const MixKernel kernel = (*MixKernelFor(working))[job.Variant()];
+  const bool ofIntegers = Depth(working) != kDepth32f;
   return job.Run([=](const RowSpan& span) {
+    const NearestRounding rounding(ofIntegers);
     const auto bytes = static_cast<size_t>(UnpaddedRowBytes(working, static_cast<int64_t>(span.count)));
     kernel(span.src[0], span.src[1], span.dst, bytes, mix);
   });

@@ -37,8 +37,8 @@ struct FloatPixel {
 struct BytePixel {
   static constexpr size_t kBytes = 4;
   static BlendPixel Load(const uint8_t* p, const BytePixels& kind) {
-    const auto channel = [&](size_t k) { return p[kind.reversed ? 3 - k : k] * k8uTo32f; };
-    return {{channel(0), channel(1), channel(2)}, kind.opaque ? 1.0f : channel(3)};
+    const auto channel = [&](size_t k, int bits = 0) { return (p[kind.reversed ? 3 - k : k] | bits) * k8uTo32f; };
+    return {{channel(0), channel(1), channel(2)}, channel(3, kind.opaque ? 255 : 0)};
   }
   static void Store(const BlendPixel& pixel, uint8_t* p, const BytePixels& kind) {
     const auto put = [&](size_t k, float value) {

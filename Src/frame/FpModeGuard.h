@@ -24,4 +24,22 @@ class FpModeGuard {
   uint32_t mSaved;
 };
 
+// Rounds to nearest, if `wanted`, whatever the caller does: for kernels of integers, whose codes could run over if
+// sums were rounded upward. Compilers know nothing of it and may move arithmetic of the same function across.
+class NearestRounding {
+ public:
+  explicit NearestRounding(bool wanted) noexcept : mChanged(wanted ? _mm_getcsr() & kRounding : 0) {
+    if (mChanged) _mm_setcsr(_mm_getcsr() ^ mChanged);
+  }
+  ~NearestRounding() {
+    if (mChanged) _mm_setcsr(_mm_getcsr() | mChanged);
+  }
+  NearestRounding(const NearestRounding&) = delete;
+  NearestRounding& operator=(const NearestRounding&) = delete;
+
+ private:
+  static constexpr uint32_t kRounding = 0x6000;
+  uint32_t mChanged;
+};
+
 }  // namespace vexel

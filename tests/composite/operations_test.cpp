@@ -242,6 +242,59 @@ TEST(Operations, Arena) {
     }
 }
 
+// ---- Rounding
+
+// Of every pixel of integers: bytes, words or the three fields of ten bits.
+std::vector<int> Samples(const Image& image) {
+  std::vector<int> samples;
+  const size_t bytes = Depth(image.format) == kDepth8u ? 1 : Depth(image.format) == kDepth15u ? 2 : 4;
+  for (size_t i = 0; i < image.bytes.size(); i += bytes) {
+    uint32_t word = 0;
+    std::memcpy(&word, &image.bytes[i], bytes);
+    if (bytes != 4) samples.push_back(static_cast<int>(word));
+    for (int bit = IsV210(image.format) ? 0 : 2; bytes == 4 && bit < 30; bit += 10)
+      samples.push_back(static_cast<int>(word >> bit & 1023));
+  }
+  return samples;
+}
+
+// A caller's rounding mode reaches every kernel alike, and turns no full sample into an empty one.
+TEST(Operations, RoundingModesGiveTheSameBytesInEveryVariant) {
+  const unsigned callers = _mm_getcsr();
+  const auto check = [&](const Operation& o, F source, F format, int width, Contents contents) {
+    std::vector<Image> images;
+    for (int i = 0; i < o.sources; ++i) images.emplace_back(source, width, 1, contents, images.size() + 1);
+    const std::vector<ArenaFrame> sources(images.begin(), images.end());
+    std::vector<int> nearest;
+    for (const unsigned mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
+      Image plain(format, width, 1, Contents::Zeros);
+      ForEachVariant([&](int variant) {
+        Image out(format, width, 1, Contents::Zeros);
+        _mm_setcsr((callers & ~0x6000u) | mode);
+        EXPECT_EQ(o.call(sources.data(), out), VX_Success);
+        _mm_setcsr(callers);
+        if (variant == 0) plain = out;
+        EXPECT_TRUE(out.bytes == plain.bytes) << "variant " << variant << ", mode " << mode;
+      });
+      const std::vector<int> samples = Samples(plain);
+      if (mode == 0) nearest = samples;
+      for (size_t i = 0; contents == Contents::Maximum && i < samples.size(); ++i)
+        EXPECT_NEAR(samples[i], nearest[i], nearest[i] / 50) << "mode " << mode;
+    }
+  };
+  for (const Operation& o : Operations())
+    for (const F format : RasterFormats())
+      for (const Contents contents : {Contents::Random, Contents::Extremes, Contents::Maximum})
+        for (int width = 540; width < (o.name == "blend" ? 567 : 541); ++width) {
+          if (!o.takes(format) || Depth(format) == kDepth32f) continue;
+          check(o, format, format, width, contents);
+          if (!o.oneFormat && AlphaKind(format) == kAlphaPremultiplied)
+            check(o, FromBits((Bits(format) & ~kAlphaMask) | kAlphaStraight), format, width, contents);
+          ASSERT_FALSE(HasFailure()) << o.name << " to " << FormatName(format) << ", " << width << " pixels, contents "
+                                     << static_cast<int>(contents);
+        }
+}
+
 // ---- Threads
 
 // Whatever their number and the way to memory, rows come out as those of a picture of one row.
