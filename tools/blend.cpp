@@ -55,11 +55,10 @@ Picture BlendPictures(const Picture& back, const Picture& front, const BlendOpti
                 y = OverlapOf(source.Height(), result.Height(), options.y);
   if (x.length == 0 || y.length == 0) return result;
   std::byte* const target = FirstPixel(result, x.back, y.back, y.length);
-  const VX_Result code =
-      VX_CompositeWithBlendMode(FirstPixel(source, x.front, y.front, y.length), source.RowBytes(), format, target,
-                                result.RowBytes(), format, target, result.RowBytes(), format, x.length, y.length,
-                                options.opacity, static_cast<int32_t>(options.mode), 3, false);
-  if (code != VX_Success) throw ToolError(std::string("cannot blend the pictures: ") + VX_ResultName(code));
+  CheckResult(VX_CompositeWithBlendMode(FirstPixel(source, x.front, y.front, y.length), source.RowBytes(), format,
+                                        target, result.RowBytes(), format, target, result.RowBytes(), format, x.length,
+                                        y.length, options.opacity, static_cast<int32_t>(options.mode), 3, false),
+              "cannot blend the pictures");
   return result;
 }
 

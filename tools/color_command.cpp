@@ -107,7 +107,7 @@ class ColorConversion {
       ++done;
       if (!sink->TakesManyFrames()) break;
     }
-    if (done == 0) throw ToolError("cannot read \"" + mCommand.in + "\": it holds no frame");
+    if (done == 0) throw ToolError("cannot read " + SourceName(mCommand.in) + ": it holds no frame");
     sink->Close();
     std::cerr << mCommand.out << ": " << done << (done == 1 ? " frame, " : " frames, ") << mFrom.name << " to "
               << mTo.name << '\n';

@@ -84,8 +84,8 @@ class Conversion {
       while (const int count = RunBatch()) progress.Show(mDone += count);
     }
     if (mDone == 0)
-      throw ToolError(skipped == 0 ? "cannot read \"" + mCommand.in + "\": it holds no frame"
-                                   : "\"" + mCommand.in + "\" has only " + std::to_string(skipped) + " frames");
+      throw ToolError(skipped == 0 ? "cannot read " + SourceName(mCommand.in) + ": it holds no frame"
+                                   : SourceName(mCommand.in) + " has only " + std::to_string(skipped) + " frames");
     mSink->Close();
     Report();
   }
@@ -157,7 +157,8 @@ class Conversion {
     std::cerr << (mCommand.out == "-" ? "standard output" : mCommand.out) << ": " << mDone
               << (mDone == 1 ? " frame, " : " frames, ") << FormatName(mFormat) << ", converted in " << speed << '\n';
     if (mRange.last != kNoEnd && mRange.first + mDone <= mRange.last)
-      std::cerr << "vexel: note: \"" << mCommand.in << "\" ends with frame " << mRange.first + mDone - 1 << '\n';
+      std::cerr << "vexel: note: " << SourceName(mCommand.in) << " ends with frame " << mRange.first + mDone - 1
+                << '\n';
   }
 
   const ConvertCommand& mCommand;
@@ -183,7 +184,8 @@ void AddConvertCommand(CLI::App& app) {
                    "Picture, sequence (out_%04d.png, numbered by frame), .y4m or .raw; - is standard output (raw)")
       ->required();
   command->add_option("--format", options->format, "Pixel format to convert to (see \"vexel formats\")")->required();
-  command->add_option("--quality", options->quality, "Render quality; above 1 interpolates chroma (default 3)");
+  command->add_option("--quality", options->quality, "Render quality; above 1 interpolates chroma (default 3)")
+      ->check(CLI::Range(0, 5));
   command->add_option("--frames", options->frames, "Frames A-B, A- or A, counting from 0 (default: all)");
   command->add_option("--raw-format", options->rawFormat, "IN is raw frames of this pixel format");
   command->add_option("--size", options->size, "WIDTHxHEIGHT of raw frames");

@@ -10,11 +10,25 @@
 namespace tool {
 namespace {
 
+// What the codes of VX_Convert mean for these two.
+std::string ReasonOf(VX_Result result, const std::string& from, const std::string& to) {
+  switch (result) {
+    case VX_ErrUnsupportedFormat:
+      return "; there is no decoder for " + from;
+    case VX_ErrFormatNotHandled:
+      return "; there is no encoder for " + to;
+    case VX_ErrFailed:
+      return "; no chain of formats leads from one to the other";
+    default:
+      return "";
+  }
+}
+
 void Check(VX_Result result, const Picture& source, const Picture& destination) {
   if (result == VX_Success) return;
-  throw ToolError("cannot convert " + FormatName(source.Format()) + " to " + FormatName(destination.Format()) + " at " +
-                  std::to_string(source.Width()) + "x" + std::to_string(source.Height()) + ": " +
-                  VX_ResultName(result) + " (" + std::to_string(result) + ")");
+  const std::string from = FormatName(source.Format()), to = FormatName(destination.Format());
+  throw ToolError("cannot convert " + from + " to " + to + " at " + std::to_string(source.Width()) + "x" +
+                  std::to_string(source.Height()) + ": " + ResultText(result) + ReasonOf(result, from, to));
 }
 
 // The first stored row of the picture rows [top, bottom).
@@ -53,9 +67,7 @@ std::string ExplainConversion(VX_PixelFormat from, VX_PixelFormat to, int qualit
   VX_PixelFormat chain[9];
   int32_t count = 0;
   const VX_Result result = VX_ExplainConversion(from, to, quality, chain, &count);
-  if (result != VX_Success)
-    return FormatName(from) + " > " + FormatName(to) + ": no plan, " + VX_ResultName(result) + " (" +
-           std::to_string(result) + ")";
+  if (result != VX_Success) return FormatName(from) + " > " + FormatName(to) + ": no plan, " + ResultText(result);
   std::string text;
   for (int i = 0; i < count; ++i) text += (i ? " > " : "") + FormatName(chain[i]);
   return text;

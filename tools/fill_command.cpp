@@ -71,9 +71,7 @@ void FillPicture(const Picture& picture, const std::string& color) {
     result = VX_FillWithColor(picture.Pixels(), picture.RowBytes(), picture.Width(), picture.Height(), picture.Format(),
                               bgra.bytes, VX_PixelFormat::BGRA_4444_8u);
   }
-  if (result != VX_Success)
-    throw ToolError("cannot fill " + format + " with " + color + ": " + VX_ResultName(result) + " (" +
-                    std::to_string(result) + ")");
+  CheckResult(result, "cannot fill " + format + " with " + color);
 }
 
 void RunFill(const FillCommand& command) {
@@ -118,12 +116,10 @@ void RunDissolve(const DissolveCommand& command) {
                     "; a dissolve takes pictures of one size");
   const VX_PixelFormat format = command.format.empty() ? a.Format() : ParseFormat(command.format);
   const Picture out(format, a.Width(), a.Height());
-  const VX_Result result =
+  CheckResult(
       VX_CrossDissolve(a.Pixels(), a.RowBytes(), a.Format(), b.Pixels(), b.RowBytes(), b.Format(), out.Pixels(),
-                       out.RowBytes(), format, out.Width(), out.Height(), command.mix, command.quality);
-  if (result != VX_Success)
-    throw ToolError("cannot mix " + FormatName(a.Format()) + " and " + FormatName(b.Format()) + " into " +
-                    FormatName(format) + ": " + VX_ResultName(result) + " (" + std::to_string(result) + ")");
+                       out.RowBytes(), format, out.Width(), out.Height(), command.mix, command.quality),
+      "cannot mix " + FormatName(a.Format()) + " and " + FormatName(b.Format()) + " into " + FormatName(format));
   SavePicture(out, command.out);
 }
 
@@ -154,7 +150,8 @@ void AddDissolveCommand(CLI::App& app) {
   command->add_option("--mix", options->mix, "0 gives A, 1 gives B")->required()->check(FromZeroToOne());
   command->add_option("--format", options->format,
                       "Pixel format of the result (default: A's; 8-bit or float RGB for 4:2:0)");
-  command->add_option("--quality", options->quality, "Render quality; 2 mixes in the depth of the result (default 3)");
+  command->add_option("--quality", options->quality, "Render quality; 2 mixes in the depth of the result (default 3)")
+      ->check(CLI::Range(0, 5));
   options->run.AddTo(*command);
   command->callback([options] { RunDissolve(*options); });
 }

@@ -39,6 +39,9 @@ class FrameSource {
 // `path` may be "-" for standard input. Throws ToolError, saying why, when it cannot be read.
 std::unique_ptr<FrameSource> OpenSource(const std::string& path, const SourceOptions& options);
 
+// What messages call it: standard input, or the path in quotes.
+std::string SourceName(const std::string& path);
+
 // What a file holds, one entry per stream.
 struct StreamDescription {
   int index = 0;
@@ -50,6 +53,7 @@ struct StreamDescription {
   int64_t frameCount = 0;          // 0 if unknown
   std::string fileFormat;          // libav's name of the pixel format
   std::string colour;              // matrix, range and transfer as coded
+  int displayAngle = 0;            // degrees clockwise to be turned for display
   VX_PixelFormat libraryFormat{};  // Invalid where there is none
   std::string refusal;             // why there is none
 };

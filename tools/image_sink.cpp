@@ -1,8 +1,6 @@
 // Pictures through libavcodec's encoders: one file, or one per frame.
-#include <cerrno>
 #include <cinttypes>
 #include <cstdio>
-#include <cstring>
 
 extern "C" {
 #include <libavutil/opt.h>
@@ -11,6 +9,7 @@ extern "C" {
 #include "format_catalogue.h"
 #include "frame_export.h"
 #include "frame_sink.h"
+#include "output_file.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -81,11 +80,6 @@ Storage StorageOf(const ImageKind& kind, VX_PixelFormat format) {
   return deep ? (alpha ? kind.alphaDeep : kind.opaqueDeep) : (alpha ? kind.alpha8 : kind.opaque8);
 }
 
-void WriteAll(std::FILE* file, const std::vector<uint8_t>& bytes, const std::string& path) {
-  if (std::fwrite(bytes.data(), 1, bytes.size(), file) != bytes.size() || std::fflush(file) != 0)
-    throw ToolError("cannot write \"" + path + "\": " + std::strerror(errno));
-}
-
 // "out_%04d.png" and a number; the one conversion of the pattern is checked before.
 std::string NumberedPath(const std::string& pattern, int64_t number) {
   const size_t percent = pattern.find('%'), d = pattern.find('d', percent);
@@ -146,12 +140,9 @@ class ImageSink : public FrameSink {
   }
 
   void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
-    if (mPath == "-") return WriteAll(stdout, encoded, mPath);
-    const std::string path = mPattern ? NumberedPath(mPath, mNumber++) : mPath;
-    const auto close = [](std::FILE* file) { std::fclose(file); };
-    const std::unique_ptr<std::FILE, decltype(close)> file(std::fopen(path.c_str(), "wb"), close);
-    if (!file) throw ToolError("cannot write \"" + path + "\": " + std::strerror(errno));
-    WriteAll(file.get(), encoded, path);
+    OutputFile file(mPattern ? NumberedPath(mPath, mNumber++) : mPath);
+    file.Write(encoded.data(), encoded.size());
+    file.Close();
   }
 
   bool TakesManyFrames() const override { return mPattern || mPath == "-"; }

@@ -27,6 +27,7 @@ void PrintStream(const StreamDescription& stream) {
   if (stream.frameCount > 0) std::cout << ", " << stream.frameCount << (stream.frameCount == 1 ? " frame" : " frames");
   std::cout << '\n';
   if (!stream.fileFormat.empty()) std::cout << "    coded as " << stream.fileFormat << ", " << stream.colour << '\n';
+  if (stream.displayAngle) std::cout << "    to be shown turned by " << stream.displayAngle << " degrees clockwise\n";
   if (stream.refusal.empty())
     std::cout << "    library format " << FormatName(stream.libraryFormat) << '\n';
   else

@@ -1,7 +1,12 @@
 // Frames of pictures and video files, read by libavformat and libavcodec.
+#include <cmath>
+#include <filesystem>
+#include <iostream>
 #include <string_view>
+#include <system_error>
 
 extern "C" {
+#include <libavutil/display.h>
 #include <libavutil/pixdesc.h>
 }
 
@@ -15,30 +20,32 @@ namespace {
 
 InputContext OpenInput(const std::string& path) {
   CollectAvMessages();
+  std::error_code error;
+  if (path != "-" && std::filesystem::is_regular_file(path, error) && std::filesystem::file_size(path, error) == 0)
+    throw ToolError("cannot read " + SourceName(path) + ": the file is empty");
   AVFormatContext* context = nullptr;
   const std::string url = path == "-" ? "pipe:0" : path;
-  CheckAv(avformat_open_input(&context, url.c_str(), nullptr, nullptr),
-          "cannot read " + (path == "-" ? std::string("standard input") : "\"" + path + "\""));
+  CheckAv(avformat_open_input(&context, url.c_str(), nullptr, nullptr), "cannot read " + SourceName(path));
   InputContext input(context);
-  CheckAv(avformat_find_stream_info(context, nullptr), "cannot read \"" + path + "\"");
+  CheckAv(avformat_find_stream_info(context, nullptr), "cannot read " + SourceName(path));
   return input;
 }
 
 // Decodes one video stream of an open file.
 class StreamDecoder {
  public:
-  StreamDecoder(AVFormatContext* input, int streamIndex, int threads, std::string path)
-      : mInput(input), mStream(streamIndex), mPath(std::move(path)), mPacket(NewPacket()) {
+  StreamDecoder(AVFormatContext* input, int streamIndex, int threads, const std::string& path)
+      : mInput(input), mStream(streamIndex), mName(SourceName(path)), mPacket(NewPacket()) {
     const AVStream* stream = input->streams[streamIndex];
     const AVCodec* codec = avcodec_find_decoder(stream->codecpar->codec_id);
     if (!codec)
-      throw ToolError("cannot read \"" + mPath + "\": there is no decoder for " +
+      throw ToolError("cannot read " + mName + ": there is no decoder for " +
                       avcodec_get_name(stream->codecpar->codec_id));
     mCodec.reset(avcodec_alloc_context3(codec));
     if (!mCodec) throw std::bad_alloc();
-    CheckAv(avcodec_parameters_to_context(mCodec.get(), stream->codecpar), "cannot read \"" + mPath + "\"");
+    CheckAv(avcodec_parameters_to_context(mCodec.get(), stream->codecpar), "cannot read " + mName);
     mCodec->thread_count = threads;
-    CheckAv(avcodec_open2(mCodec.get(), codec, nullptr), "cannot read \"" + mPath + "\"");
+    CheckAv(avcodec_open2(mCodec.get(), codec, nullptr), "cannot read " + mName);
   }
 
   // The next frame into `frame`; false after the last.
@@ -47,10 +54,10 @@ class StreamDecoder {
       const int received = avcodec_receive_frame(mCodec.get(), frame);
       if (received >= 0) return mFoundFrame = true;
       if (received == AVERROR_EOF) {
-        if (!mFoundFrame) throw ToolError("cannot decode \"" + mPath + "\": it holds no whole frame" + TakeAvMessage());
+        if (!mFoundFrame) throw ToolError("cannot decode " + mName + ": it holds no whole frame" + TakeAvMessage());
         return false;
       }
-      if (received != AVERROR(EAGAIN)) CheckAv(received, "cannot decode \"" + mPath + "\"");
+      if (received != AVERROR(EAGAIN)) CheckAv(received, "cannot decode " + mName);
       FeedPacket();
     }
   }
@@ -66,18 +73,18 @@ class StreamDecoder {
         avcodec_send_packet(mCodec.get(), nullptr);
         return;
       }
-      CheckAv(read, "cannot read \"" + mPath + "\"");
+      CheckAv(read, "cannot read " + mName);
       const bool mine = mPacket->stream_index == mStream;
       const int sent = mine ? avcodec_send_packet(mCodec.get(), mPacket.get()) : 0;
       av_packet_unref(mPacket.get());
-      CheckAv(sent, "cannot decode \"" + mPath + "\"");
+      CheckAv(sent, "cannot decode " + mName);
       if (mine) return;
     }
   }
 
   AVFormatContext* mInput;
   int mStream;
-  std::string mPath;
+  std::string mName;
   Packet mPacket;
   CodecContext mCodec;
   bool mFoundFrame = false;
@@ -90,19 +97,29 @@ int64_t FrameCountOf(const AVFormatContext* input, const AVStream* stream) {
   return av_rescale_q(input->duration, AV_TIME_BASE_Q, av_inv_q(rate));
 }
 
+// How far clockwise a file asks a frame to be turned for display, in its header or in the frame itself (Exif).
+int DisplayAngle(const AVStream* stream, const AVFrame& frame) {
+  const uint8_t* matrix = av_stream_get_side_data(stream, AV_PKT_DATA_DISPLAYMATRIX, nullptr);
+  if (const AVFrameSideData* data = av_frame_get_side_data(&frame, AV_FRAME_DATA_DISPLAYMATRIX)) matrix = data->data;
+  if (!matrix) return 0;
+  const double counterclockwise = av_display_rotation_get(reinterpret_cast<const int32_t*>(matrix));
+  return std::isnan(counterclockwise) ? 0 : static_cast<int>(std::lrint(360 - counterclockwise)) % 360;
+}
+
 class MediaSource : public FrameSource {
  public:
   MediaSource(const std::string& path, const SourceOptions& options)
-      : mPath(path), mOptions(options), mInput(OpenInput(path)), mFrame(NewFrame()) {
+      : mName(SourceName(path)), mOptions(options), mInput(OpenInput(path)), mFrame(NewFrame()) {
     const int index = av_find_best_stream(mInput.get(), AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
-    if (index == AVERROR_STREAM_NOT_FOUND)
-      throw ToolError("cannot read \"" + path + "\": it holds no picture or video");
-    CheckAv(index, "cannot read \"" + path + "\"");
+    if (index == AVERROR_STREAM_NOT_FOUND) throw ToolError("cannot read " + mName + ": it holds no picture or video");
+    CheckAv(index, "cannot read " + SourceName(path));
     mDecoder = std::make_unique<StreamDecoder>(mInput.get(), index, options.threads, path);
+    TakeAvMessage();  // what could be opened all the same
   }
 
   Picture Next() override {
     if (!mDecoder->Next(mFrame.get())) return {};
+    NoteOddities();
     const VX_PixelFormat format = LibraryFormatOf(*mFrame, mDecoder->Codec(), mOptions.matrix);
     return ImportFrame(*mFrame, format);
   }
@@ -116,11 +133,25 @@ class MediaSource : public FrameSource {
  private:
   const AVStream* Stream() const { return mInput->streams[mDecoder->StreamIndex()]; }
 
-  std::string mPath;
+  // What a picture that looks wrong would come from. Said once, of the first frame that has it.
+  void NoteOddities() {
+    if (const int angle = DisplayAngle(Stream(), *mFrame); angle != 0 && !mNotedAngle) {
+      std::cerr << "vexel: note: " << mName << " asks to be shown turned by " << angle
+                << " degrees; its frames are taken as stored (\"vexel rotate --angle " << angle << "\" turns one)\n";
+      mNotedAngle = true;
+    }
+    const std::string message = TakeAvMessage();
+    if (message.empty() || mNotedDamage) return;
+    std::cerr << "vexel: note: " << mName << " is damaged; what could be decoded is used" << message << '\n';
+    mNotedDamage = true;
+  }
+
+  std::string mName;
   SourceOptions mOptions;
   InputContext mInput;
   Frame mFrame;
   std::unique_ptr<StreamDecoder> mDecoder;
+  bool mNotedAngle = false, mNotedDamage = false;
 };
 
 const char* NameOr(const char* name, const char* otherwise) { return name ? name : otherwise; }
@@ -152,6 +183,7 @@ void DescribeFirstFrame(const std::string& path, const SourceOptions& options, S
     description.height = frame->height;
     description.fileFormat = NameOr(av_get_pix_fmt_name(static_cast<AVPixelFormat>(frame->format)), "unknown");
     description.colour = ColourOf(*frame);
+    description.displayAngle = DisplayAngle(input->streams[description.index], *frame);
     description.libraryFormat = LibraryFormatOf(*frame, decoder.Codec(), options.matrix);
   } catch (const ToolError& error) {
     description.refusal = error.what();

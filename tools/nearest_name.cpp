@@ -7,6 +7,14 @@
 namespace tool {
 namespace {
 
+char Lower(char c) { return static_cast<char>(std::tolower(static_cast<unsigned char>(c))); }
+
+// A part of a name stands for it.
+bool Contains(const std::string& name, const std::string& part) {
+  return std::search(name.begin(), name.end(), part.begin(), part.end(),
+                     [](char x, char y) { return Lower(x) == Lower(y); }) != name.end();
+}
+
 // The number of insertions, deletions and replacements that turn one text into the other, ignoring case.
 int EditDistance(const std::string& a, const std::string& b) {
   std::vector<int> row(b.size() + 1);
@@ -15,9 +23,7 @@ int EditDistance(const std::string& a, const std::string& b) {
     int diagonal = row[0];
     row[0] = static_cast<int>(i) + 1;
     for (size_t j = 0; j < b.size(); ++j) {
-      const bool same =
-          std::tolower(static_cast<unsigned char>(a[i])) == std::tolower(static_cast<unsigned char>(b[j]));
-      const int replaced = diagonal + (same ? 0 : 1);
+      const int replaced = diagonal + (Lower(a[i]) == Lower(b[j]) ? 0 : 1);
       diagonal = row[j + 1];
       row[j + 1] = std::min({replaced, row[j] + 1, diagonal + 1});
     }
@@ -28,13 +34,13 @@ int EditDistance(const std::string& a, const std::string& b) {
 }  // namespace
 
 bool SameName(const std::string& a, const std::string& b) {
-  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
-                    [](unsigned char x, unsigned char y) { return std::tolower(x) == std::tolower(y); });
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) { return Lower(x) == Lower(y); });
 }
 
 std::string NearestNames(const std::string& name, const std::vector<std::string>& names) {
   std::vector<std::pair<int, std::string>> ranked;
-  for (const std::string& candidate : names) ranked.emplace_back(EditDistance(name, candidate), candidate);
+  for (const std::string& candidate : names)
+    ranked.emplace_back(Contains(candidate, name) ? 0 : EditDistance(name, candidate), candidate);
   std::stable_sort(ranked.begin(), ranked.end(), [](auto& a, auto& b) { return a.first < b.first; });
   std::string text = ranked.at(0).second;
   for (size_t i = 1; i < std::min<size_t>(3, ranked.size()) && ranked[i].first <= ranked[0].first + 1; ++i)

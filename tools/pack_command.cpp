@@ -31,7 +31,7 @@ SourceOptions SourceOptionsOf(const PackOptions& options) {
 }
 
 void Report(const PackOptions& options, int64_t frames, const std::string& what) {
-  if (frames == 0) throw ToolError("cannot read \"" + options.in + "\": it holds no frame");
+  if (frames == 0) throw ToolError("cannot read " + SourceName(options.in) + ": it holds no frame");
   std::cerr << (options.out == "-" ? "standard output" : options.out) << ": " << frames
             << (frames == 1 ? " frame, " : " frames, ") << what << '\n';
 }

@@ -6,7 +6,7 @@ namespace tool {
 
 Picture LoadPicture(const std::string& path, const SourceOptions& options) {
   Picture picture = OpenSource(path, options)->Next();
-  if (!picture) throw ToolError("cannot read \"" + path + "\": it holds no frame");
+  if (!picture) throw ToolError("cannot read " + SourceName(path) + ": it holds no frame");
   return picture;
 }
 

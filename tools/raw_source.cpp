@@ -3,11 +3,9 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
-#include <tuple>
 
 #include "format_catalogue.h"
 #include "frame_source.h"
-#include "parse_size.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -21,9 +19,9 @@ struct FileCloser {
 
 class RawSource : public FrameSource {
  public:
-  RawSource(const std::string& path, const SourceOptions& options) : mPath(path), mOptions(options) {
+  RawSource(const std::string& path, const SourceOptions& options) : mName(SourceName(path)), mOptions(options) {
     mFile.reset(path == "-" ? stdin : std::fopen(path.c_str(), "rb"));
-    if (!mFile) throw ToolError("cannot read \"" + path + "\": " + std::strerror(errno));
+    if (!mFile) throw ToolError("cannot read " + mName + ": " + std::strerror(errno));
     if (options.width < 1 || options.height < 1) throw ToolError("raw frames need their size: --size WIDTHxHEIGHT");
   }
 
@@ -48,9 +46,9 @@ class RawSource : public FrameSource {
         first = false;
         return true;
       }
-      if (std::ferror(mFile.get())) throw ToolError("cannot read \"" + mPath + "\": " + std::strerror(errno));
+      if (std::ferror(mFile.get())) throw ToolError("cannot read " + mName + ": " + std::strerror(errno));
       if (got == 0 && first) return false;
-      throw ToolError("\"" + mPath + "\" ends in the middle of a frame (check --size and --raw-format)");
+      throw ToolError(mName + " ends in the middle of a frame (check --size and --raw-format)");
     };
     if (Is420(picture.Format())) {
       for (int p = 0; p < picture.PlaneCount(); ++p) {
@@ -67,31 +65,15 @@ class RawSource : public FrameSource {
     return true;
   }
 
-  std::string mPath;
+  std::string mName;
   SourceOptions mOptions;
   std::unique_ptr<std::FILE, FileCloser> mFile;
 };
 
 }  // namespace
 
-SourceOptions ParseSourceOptions(const std::string& rawFormat, const std::string& size, const std::string& matrix,
-                                 int threads) {
-  SourceOptions options;
-  options.threads = threads;
-  if (!matrix.empty()) options.matrix = ParseMatrix(matrix);
-  if (!size.empty()) std::tie(options.width, options.height) = ParseSize(size);
-  if (!rawFormat.empty()) options.rawFormat = ParseFormat(rawFormat);
-  if (options.width && !options.rawFormat)
-    throw ToolError("--size belongs to raw frames (--raw-format); nothing is ever scaled");
-  return options;
-}
-
 std::unique_ptr<FrameSource> OpenRawSource(const std::string& path, const SourceOptions& options) {
   return std::make_unique<RawSource>(path, options);
-}
-
-std::unique_ptr<FrameSource> OpenSource(const std::string& path, const SourceOptions& options) {
-  return options.rawFormat ? OpenRawSource(path, options) : OpenMediaSource(path, options);
 }
 
 }  // namespace tool

@@ -1,7 +1,5 @@
 // Raw frames and Y4M: one stream of bytes.
-#include <cerrno>
 #include <cstdio>
-#include <cstring>
 #include <iostream>
 
 extern "C" {
@@ -12,52 +10,24 @@ extern "C" {
 #include "frame_export.h"
 #include "frame_import.h"
 #include "frame_sink.h"
-#include "tool_error.h"
+#include "output_file.h"
 
 namespace tool {
 namespace {
 
-// The stream that frames are appended to; a file is made when its first frame is complete.
-class ByteStream {
- public:
-  explicit ByteStream(const std::string& path) : mPath(path) {}
-  ~ByteStream() {
-    if (mFile && mFile != stdout) std::fclose(mFile);
-  }
-  ByteStream(const ByteStream&) = delete;
-
-  void Write(const void* bytes, size_t count) {
-    if (!mFile) mFile = mPath == "-" ? stdout : std::fopen(mPath.c_str(), "wb");
-    if (!mFile || std::fwrite(bytes, 1, count, mFile) != count) Fail();
-  }
-  void Close() {
-    if (!mFile) return;
-    std::FILE* file = std::exchange(mFile, nullptr);
-    if ((file == stdout ? std::fflush(file) : std::fclose(file)) != 0) Fail();
-  }
-
- private:
-  [[noreturn]] void Fail() const {
-    const std::string name = mPath == "-" ? "standard output" : "\"" + mPath + "\"";
-    throw ToolError("cannot write " + name + ": " + std::strerror(errno));
-  }
-  std::string mPath;
-  std::FILE* mFile = nullptr;
-};
-
 class RawSink : public FrameSink {
  public:
-  explicit RawSink(const std::string& path) : mStream(path) {}
+  explicit RawSink(const std::string& path) : mFile(path) {}
   VX_PixelFormat StorageFormat(VX_PixelFormat format, int) const override { return format; }
   std::vector<uint8_t> Encode(const Picture& picture) const override { return RawBytes(picture); }
   void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
-    mStream.Write(encoded.data(), encoded.size());
+    mFile.Write(encoded.data(), encoded.size());
   }
   bool TakesManyFrames() const override { return true; }
-  void Close() override { mStream.Close(); }
+  void Close() override { mFile.Close(); }
 
  private:
-  ByteStream mStream;
+  OutputFile mFile;
 };
 
 // How Y4M names a coding, and the frame layout of its planes.
@@ -77,7 +47,7 @@ Y4mCoding Y4mCodingOf(VX_PixelFormat format) {
 
 class Y4mSink : public FrameSink {
  public:
-  Y4mSink(const std::string& path, std::pair<int, int> frameRate) : mStream(path), mFrameRate(frameRate) {}
+  Y4mSink(const std::string& path, std::pair<int, int> frameRate) : mFile(path), mFrameRate(frameRate) {}
 
   // Y4M has no straight or premultiplied alpha beyond 8 bits, and does not name its matrix: RGB takes the one that
   // readers assume.
@@ -113,11 +83,11 @@ class Y4mSink : public FrameSink {
 
   void Append(const Picture& picture, const std::vector<uint8_t>& encoded) override {
     if (!mHeaderWritten) WriteHeader(picture);
-    mStream.Write("FRAME\n", 6);
-    mStream.Write(encoded.data(), encoded.size());
+    mFile.Write("FRAME\n", 6);
+    mFile.Write(encoded.data(), encoded.size());
   }
   bool TakesManyFrames() const override { return true; }
-  void Close() override { mStream.Close(); }
+  void Close() override { mFile.Close(); }
 
  private:
   void WriteHeader(const Picture& picture) {
@@ -127,7 +97,7 @@ class Y4mSink : public FrameSink {
     const int length = std::snprintf(header, sizeof header, "YUV4MPEG2 W%d H%d F%d:%d I%c A1:1 C%s XCOLORRANGE=%s\n",
                                      picture.Width(), picture.Height(), mFrameRate.first, mFrameRate.second,
                                      field ? 't' : 'p', Y4mCodingOf(picture.Format()).name, range);
-    mStream.Write(header, static_cast<size_t>(length));
+    mFile.Write(header, static_cast<size_t>(length));
     const bool is709 = (Bits(picture.Format()) & 0x600) != 0;
     if (is709 != (UnnamedMatrix(picture.Height()) == Matrix::Bt709))
       std::cerr << "vexel: note: Y4M does not name its matrix; read this one with --matrix " << (is709 ? "709" : "601")
@@ -135,7 +105,7 @@ class Y4mSink : public FrameSink {
     mHeaderWritten = true;
   }
 
-  ByteStream mStream;
+  OutputFile mFile;
   std::pair<int, int> mFrameRate;
   bool mHeaderWritten = false;
 };

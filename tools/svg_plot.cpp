@@ -1,13 +1,11 @@
 #include "svg_plot.h"
 
-#include <cerrno>
 #include <cmath>
 #include <cstdarg>
 #include <cstdio>
-#include <cstring>
-#include <fstream>
+#include <sstream>
 
-#include "tool_error.h"
+#include "output_file.h"
 
 namespace tool {
 namespace {
@@ -71,8 +69,7 @@ void SvgPlot::Mark(const std::string& label, double x, double y) {
 }
 
 void SvgPlot::Write(const std::string& path) const {
-  std::ofstream out(path);
-  if (!out) throw ToolError("cannot write \"" + path + "\": " + std::strerror(errno));
+  std::ostringstream out;
   const int right = mWidth - kRight, bottom = mHeight - kBottom;
   out << Text(
              "<svg xmlns='http://www.w3.org/2000/svg' width='%d' height='%d' font-family='sans-serif' "
@@ -94,8 +91,10 @@ void SvgPlot::Write(const std::string& path) const {
       << Text("<text transform='translate(20 %d) rotate(-90)' text-anchor='middle'>", (kTop + bottom) / 2) << mY.label
       << "</text>\n"
       << mBody << mLegend << "</svg>\n";
-  out.flush();
-  if (!out) throw ToolError("cannot write \"" + path + "\"");
+  OutputFile file(path);
+  const std::string text = out.str();
+  file.Write(text.data(), text.size());
+  file.Close();
 }
 
 }  // namespace tool

@@ -2,6 +2,9 @@
 #pragma once
 
 #include <stdexcept>
+#include <string>
+
+#include "vexel/vexel.h"
 
 namespace tool {
 
@@ -9,5 +12,15 @@ class ToolError : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
 };
+
+// A result for the user: "VX_ErrFormatNotHandled (-1000)".
+inline std::string ResultText(VX_Result result) {
+  return std::string(VX_ResultName(result)) + " (" + std::to_string(result) + ")";
+}
+
+// Throws ToolError, "WHAT: RESULT", unless the library did it.
+inline void CheckResult(VX_Result result, const std::string& what) {
+  if (result != VX_Success) throw ToolError(what + ": " + ResultText(result));
+}
 
 }  // namespace tool

@@ -31,9 +31,7 @@ Picture LoadFourChannels(const std::string& path) {
   return ConvertPicture(picture, isDeep ? VX_PixelFormat::BGRX_4444_32f : VX_PixelFormat::BGRX_4444_8u, {});
 }
 
-void Check(VX_Result result) {
-  if (result != VX_Success) throw ToolError(std::string("cannot turn the picture: ") + VX_ResultName(result));
-}
+void Check(VX_Result result) { CheckResult(result, "cannot turn the picture"); }
 
 // Mirrors what is seen, so both pictures are walked from their top rows.
 void RunTranspose(const TurnOptions& options) {

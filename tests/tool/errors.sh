@@ -6,6 +6,7 @@ head -c 12288 "$clip420" >noise.raw  # 64 x 48 pixels of 4 bytes
 convert noise.raw picture.png --raw-format BGRA_4444_8u --size 64x48 --format BGRA_4444_8u
 head -c 600 picture.png >torn.png
 echo 'no picture' >text.png
+: >empty.png
 to_bgra=(--format BGRA_4444_8u)
 raw=(--raw-format BGRA_4444_8u --size 64x48)
 
@@ -35,12 +36,53 @@ refuses 1 'nothing is ever scaled' convert picture.png x.png "${to_bgra[@]}" --s
 refuses 1 'cannot hold a 2147483647x2147483647' convert noise.raw x.raw --raw-format BGRA_4444_8u --size 2147483647x2147483647 "${to_bgra[@]}"
 refuses 1 'cannot convert BGRA_4444_8u to PALDV25 at 64x48: VX_ErrFormatNotHandled \(-1000\)' convert noise.raw x.raw "${raw[@]}" --format PALDV25
 refuses 1 'cannot convert BGRA_4444_8u to YUV_420_MPEG4_FRAME at 64x48: VX_ErrFormatNotHandled \(-1000\)' convert noise.raw x.raw "${raw[@]}" --format YUV_420_MPEG4_FRAME
+refuses 1 'unknown format "BGRX"; did you mean BGRX_4444_8u' convert picture.png x.png --format BGRX
+refuses 1 'cannot read "empty.png": the file is empty' convert empty.png x.png "${to_bgra[@]}"
+refuses 2 '--quality.*range 0 to 5' convert picture.png x.png "${to_bgra[@]}" --quality x
+refuses 1 'cannot read standard input' convert - x.png "${to_bgra[@]}"
 refuses 1 'unknown matrix "907"' convert "$clip420" x.png "${to_bgra[@]}" --matrix 907
 refuses 1 'no library format holds yuv422p10le frames coded with the BT.2020 matrix' convert "$clip422" x.png "${to_bgra[@]}" --matrix 2020
 
 # Fewer frames than asked for are written, and said to be.
 convert "$clip420" short.raw --format BGRA_4444_8u --frames 22-30
 grep -q 'note: .* ends with frame 23' log || fail "a short file goes unnoticed: $(cat log)"
+
+# A failure after the first frame leaves nothing behind, and an older file as it was; so does an interruption.
+ls >before
+refuses 1 'ends in the middle of a frame' convert noise.raw x.raw --raw-format BGRA_4444_8u --size 64x40 "${to_bgra[@]}"
+cp picture.png kept.raw
+refuses 1 'ends in the middle of a frame' convert noise.raw kept.raw --raw-format BGRA_4444_8u --size 64x40 "${to_bgra[@]}"
+same picture.png kept.raw "a failed conversion over a file"
+mkfifo endless
+"$vexel" convert endless kept.raw "${raw[@]}" "${to_bgra[@]}" --threads 1 >log 2>&1 &
+{
+  cat noise.raw noise.raw
+  for ((i = 0; i < 100; ++i)); do [ -n "$(ls *.part 2>/dev/null)" ] && break || sleep 0.1; done
+  kill $!
+} >endless
+wait $!
+[ $? = 143 ] || fail "an interruption goes unnoticed: $(cat log)"
+same picture.png kept.raw "an interrupted conversion over a file"
+rm -f endless kept.raw
+[ "$(ls | grep -vx -e err -e out -e before)" = "$(grep -vx -e err -e out -e before before)" ] || fail "left behind: $(ls)"
+
+# A file converted onto itself, through a link, keeps its permissions; what is not a file is written in place.
+cp noise.raw self.raw && chmod 640 self.raw && ln -s self.raw link.raw
+convert link.raw link.raw "${raw[@]}" --format BGRX_4444_8u
+convert noise.raw other.raw "${raw[@]}" --format BGRX_4444_8u
+same self.raw other.raw "a file converted onto itself"
+[ -L link.raw ] && [ "$(stat -c %a self.raw)" = 640 ] || fail "a file converted onto itself: $(ls -l)"
+mkfifo pipe.raw && cat pipe.raw >piped &
+until [ -p pipe.raw ]; do sleep 0.01; done
+convert noise.raw pipe.raw "${raw[@]}" --format BGRX_4444_8u
+[ -p pipe.raw ] && wait $! && same piped other.raw "a named pipe"
+rm -f pipe.raw
+
+# What is used of a damaged file is said to be.
+convert "$clip422" torn.jpg --format BGRX_4444_8u
+head -c 9000 torn.jpg >torn2.jpg
+convert torn2.jpg x.png "${to_bgra[@]}"
+grep -q 'note: "torn2.jpg" is damaged' log || fail "a damaged file goes unnoticed: $(cat log)"
 
 # A write error that only shows when the data leaves the buffers.
 if [ -e /dev/full ]; then

@@ -1,0 +1,104 @@
+#include "output_file.h"
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <filesystem>
+#include <random>
+#include <system_error>
+#include <utility>
+
+#include "tool_error.h"
+
+namespace tool {
+namespace {
+
+namespace fs = std::filesystem;
+
+// The unfinished file, for a program that is interrupted: one is written at a time.
+char gUnfinished[4096];
+
+extern "C" void RemoveUnfinished(int signal) {
+  std::remove(gUnfinished);
+  std::signal(signal, SIG_DFL);
+  std::raise(signal);
+}
+
+// Signals that are ignored stay so.
+void WhenInterrupted(void (*handler)(int)) {
+  for (const int signal : {SIGINT, SIGTERM})
+    if (std::signal(signal, handler) == SIG_IGN) std::signal(signal, SIG_IGN);
+}
+
+void RemoveWhenInterrupted(const std::string& path) {
+  if (path.size() >= sizeof gUnfinished) return;
+  std::memcpy(gUnfinished, path.c_str(), path.size() + 1);
+  WhenInterrupted(RemoveUnfinished);
+}
+
+std::string UnfinishedName(const std::string& target) {
+  char number[16];
+  std::snprintf(number, sizeof number, "%08x", static_cast<unsigned>(std::random_device()()));
+  return target + '.' + number + ".part";
+}
+
+// Whether a file that is there may be written to; renaming would replace it all the same.
+bool IsWritable(const std::string& path) {
+  std::FILE* const file = std::fopen(path.c_str(), "r+b");
+  return file && std::fclose(file) == 0;
+}
+
+}  // namespace
+
+OutputFile::~OutputFile() {
+  if (mFile && mFile != stdout) std::fclose(mFile);
+  if (mUnfinished.empty()) return;
+  std::remove(mUnfinished.c_str());
+  WhenInterrupted(SIG_DFL);
+}
+
+void OutputFile::Open() {
+  if (mPath == "-") {
+    mFile = stdout;
+    return;
+  }
+  std::error_code error;
+  const fs::path canonical = fs::canonical(mPath, error);
+  mTarget = error ? mPath : canonical.string();
+  const bool exists = fs::exists(mTarget, error);
+  if (exists && !fs::is_regular_file(mTarget, error)) {
+    mFile = std::fopen(mTarget.c_str(), "wb");
+  } else if (!exists || IsWritable(mTarget)) {
+    const std::string unfinished = UnfinishedName(mTarget);
+    mFile = std::fopen(unfinished.c_str(), "wbx");
+    if (mFile) mUnfinished = unfinished;
+  }
+  if (!mFile) Fail(std::strerror(errno));
+  if (mUnfinished.empty()) return;
+  RemoveWhenInterrupted(mUnfinished);
+  if (exists) fs::permissions(mUnfinished, fs::status(mTarget, error).permissions(), error);
+}
+
+void OutputFile::Write(const void* bytes, size_t count) {
+  if (!mFile) Open();
+  if (std::fwrite(bytes, 1, count, mFile) != count) Fail(std::strerror(errno));
+}
+
+void OutputFile::Close() {
+  if (!mFile) return;
+  if (mFile == stdout ? std::fflush(mFile) != 0 : std::fclose(std::exchange(mFile, nullptr)) != 0)
+    Fail(std::strerror(errno));
+  if (mUnfinished.empty()) return;
+  std::error_code error;
+  fs::rename(mUnfinished, mTarget, error);
+  if (error) Fail(error.message());
+  mUnfinished.clear();
+  WhenInterrupted(SIG_DFL);
+}
+
+void OutputFile::Fail(const std::string& reason) const {
+  const std::string name = mPath == "-" ? "standard output" : "\"" + mPath + "\"";
+  throw ToolError("cannot write " + name + ": " + reason);
+}
+
+}  // namespace tool
