@@ -109,8 +109,8 @@ class ColorConversion {
     }
     if (done == 0) throw ToolError("cannot read " + SourceName(mCommand.in) + ": it holds no frame");
     sink->Close();
-    std::cerr << mCommand.out << ": " << done << (done == 1 ? " frame, " : " frames, ") << mFrom.name << " to "
-              << mTo.name << '\n';
+    std::cerr << SinkName(mCommand.out) << ": " << done << (done == 1 ? " frame, " : " frames, ") << mFrom.name
+              << " to " << mTo.name << '\n';
   }
 
  private:

@@ -154,8 +154,8 @@ class Conversion {
     char speed[96];
     std::snprintf(speed, sizeof speed, "%.2f ms per frame, %.0f Mpixel/s", mSeconds * 1e3 / static_cast<double>(mDone),
                   static_cast<double>(mPixels) / std::max(mSeconds, 1e-9) * 1e-6);
-    std::cerr << (mCommand.out == "-" ? "standard output" : mCommand.out) << ": " << mDone
-              << (mDone == 1 ? " frame, " : " frames, ") << FormatName(mFormat) << ", converted in " << speed << '\n';
+    std::cerr << SinkName(mCommand.out) << ": " << mDone << (mDone == 1 ? " frame, " : " frames, ")
+              << FormatName(mFormat) << ", converted in " << speed << '\n';
     if (mRange.last != kNoEnd && mRange.first + mDone <= mRange.last)
       std::cerr << "vexel: note: " << SourceName(mCommand.in) << " ends with frame " << mRange.first + mDone - 1
                 << '\n';

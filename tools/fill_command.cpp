@@ -71,7 +71,7 @@ void FillPicture(const Picture& picture, const std::string& color) {
     result = VX_FillWithColor(picture.Pixels(), picture.RowBytes(), picture.Width(), picture.Height(), picture.Format(),
                               bgra.bytes, VX_PixelFormat::BGRA_4444_8u);
   }
-  CheckResult(result, "cannot fill " + format + " with " + color);
+  CheckResult(result, "cannot fill " + format + " with " + color + ", for which there is no encoder");
 }
 
 void RunFill(const FillCommand& command) {
@@ -85,10 +85,11 @@ void RunFill(const FillCommand& command) {
   const Picture picture(format, width, height);
   FillPicture(picture, command.color);
   SinkOptions options;
-  if (!command.container.empty())
-    options.container = ParseContainer(command.container);
-  else if (isDv)
-    options.container = Container::Raw;
+  options.container = command.container.empty() ? ContainerByExtension(command.out) : ParseContainer(command.container);
+  if (isDv && options.container.value_or(Container::Raw) != Container::Raw)
+    throw ToolError("\"" + command.out +
+                    "\" would hold pictures; a DV frame is a file of its own, for instance out.dv");
+  if (isDv) options.container = Container::Raw;
   SavePicture(picture, command.out, {}, options);
 }
 
@@ -128,7 +129,7 @@ void RunDissolve(const DissolveCommand& command) {
 void AddFillCommand(CLI::App& app) {
   const auto options = std::make_shared<FillCommand>();
   CLI::App* command = app.add_subcommand("fill", "Write a picture of one colour");
-  command->add_option("out", options->out, "Picture, .y4m or .raw; - is standard output (raw); any name for DV")
+  command->add_option("out", options->out, "Picture, .y4m or .raw; - is standard output (raw); other names for DV")
       ->required();
   command->add_option("--format", options->format, "Pixel format to fill (see \"vexel formats\")")->required();
   command->add_option("--size", options->size, "WIDTHxHEIGHT; DV frames have one of their own");

@@ -35,11 +35,16 @@ Container ParseContainer(const std::string& name) {
   throw ToolError("unknown container \"" + name + "\"; it is " + ContainerNames());
 }
 
-Container ContainerOf(const std::string& path) {
+std::optional<Container> ContainerByExtension(const std::string& path) {
   if (path == "-") return Container::Raw;
   const size_t dot = path.find_last_of("./");
   if (dot != std::string::npos && path[dot] == '.')
     if (const ContainerName* entry = FindContainer(path.substr(dot + 1))) return entry->container;
+  return std::nullopt;
+}
+
+Container ContainerOf(const std::string& path) {
+  if (const auto container = ContainerByExtension(path)) return *container;
   throw ToolError("cannot tell from its name what to write to \"" + path + "\"; its extension may be " +
                   ContainerNames());
 }
@@ -50,6 +55,8 @@ std::unique_ptr<FrameSink> OpenSink(const std::string& path, const SinkOptions& 
     return OpenStreamSink(path, container, options.frameRate);
   return OpenImageSink(path, container, firstNumber);
 }
+
+std::string SinkName(const std::string& path) { return path == "-" ? "standard output" : path; }
 
 std::vector<uint8_t> RawBytes(const Picture& picture) {
   std::vector<uint8_t> bytes;

@@ -17,6 +17,8 @@ enum class Container { Png, Jpeg, Tiff, Exr, Dpx, Y4m, Raw };
 // By name ("png"), or by the extension of a path. "-" is raw. Throws ToolError for others.
 Container ParseContainer(const std::string& name);
 Container ContainerOf(const std::string& path);
+// The same, nothing where the extension does not tell.
+std::optional<Container> ContainerByExtension(const std::string& path);
 const char* ContainerNames();
 
 struct SinkOptions {
@@ -45,6 +47,9 @@ class FrameSink {
 // `path` may be "-" for standard output, or a printf pattern ("out_%04d.png") for a sequence numbered from
 // `firstNumber`.
 std::unique_ptr<FrameSink> OpenSink(const std::string& path, const SinkOptions& options, int64_t firstNumber = 0);
+
+// What reports call it: standard output, or the path.
+std::string SinkName(const std::string& path);
 
 // The frame's bytes as a raw file holds them: rows from the top, no padding (V210 rows padded to 128 bytes).
 std::vector<uint8_t> RawBytes(const Picture& picture);

@@ -32,8 +32,7 @@ SourceOptions SourceOptionsOf(const PackOptions& options) {
 
 void Report(const PackOptions& options, int64_t frames, const std::string& what) {
   if (frames == 0) throw ToolError("cannot read " + SourceName(options.in) + ": it holds no frame");
-  std::cerr << (options.out == "-" ? "standard output" : options.out) << ": " << frames
-            << (frames == 1 ? " frame, " : " frames, ") << what << '\n';
+  std::cerr << SinkName(options.out) << ": " << frames << (frames == 1 ? " frame, " : " frames, ") << what << '\n';
 }
 
 // A file that nothing is known about is likely to be raw.

@@ -50,6 +50,7 @@ convert first.png first.raw --format BGRX_4444_8u
 same same.raw first.raw "a picture mixed with itself"
 
 run fill small.png --format BGRX_4444_8u --size 7x4 --color black
+refuses 1 "a DV frame is a file of its own" fill f.png --format PALDV25 --color black
 refuses 1 'UYVY_422_8u has no alpha.*--color black' fill x.raw --format UYVY_422_8u --size 4x4 --color transparent-black
 refuses 1 '"red" is not a colour; write black' fill x.raw --format BGRA_4444_8u --size 4x4 --color red
 refuses 1 '"#12345g" is not a colour' fill x.raw --format BGRA_4444_8u --size 4x4 --color '#12345g'
