@@ -11,7 +11,7 @@ namespace tool {
 namespace {
 
 // What the codes of VX_Convert mean for these two.
-std::string ReasonOf(VX_Result result, const std::string& from, const std::string& to) {
+std::string MeaningOf(VX_Result result, const std::string& from, const std::string& to) {
   switch (result) {
     case VX_ErrUnsupportedFormat:
       return "; there is no decoder for " + from;
@@ -25,10 +25,12 @@ std::string ReasonOf(VX_Result result, const std::string& from, const std::strin
 }
 
 void Check(VX_Result result, const Picture& source, const Picture& destination) {
-  if (result == VX_Success) return;
+  if (result == VX_Success) return;  // before any text is made: a band is small
   const std::string from = FormatName(source.Format()), to = FormatName(destination.Format());
-  throw ToolError("cannot convert " + from + " to " + to + " at " + std::to_string(source.Width()) + "x" +
-                  std::to_string(source.Height()) + ": " + ResultText(result) + ReasonOf(result, from, to));
+  CheckResult(result,
+              "cannot convert " + from + " to " + to + " at " + std::to_string(source.Width()) + "x" +
+                  std::to_string(source.Height()),
+              MeaningOf(result, from, to));
 }
 
 // The first stored row of the picture rows [top, bottom).

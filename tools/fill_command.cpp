@@ -71,7 +71,8 @@ void FillPicture(const Picture& picture, const std::string& color) {
     result = VX_FillWithColor(picture.Pixels(), picture.RowBytes(), picture.Width(), picture.Height(), picture.Format(),
                               bgra.bytes, VX_PixelFormat::BGRA_4444_8u);
   }
-  CheckResult(result, "cannot fill " + format + " with " + color + ", for which there is no encoder");
+  CheckResult(result, "cannot fill " + format + " with " + color,
+              result == VX_ErrFormatNotHandled ? "; there is no encoder for that" : "");
 }
 
 void RunFill(const FillCommand& command) {

@@ -18,9 +18,9 @@ inline std::string ResultText(VX_Result result) {
   return std::string(VX_ResultName(result)) + " (" + std::to_string(result) + ")";
 }
 
-// Throws ToolError, "WHAT: RESULT", unless the library did it.
-inline void CheckResult(VX_Result result, const std::string& what) {
-  if (result != VX_Success) throw ToolError(what + ": " + ResultText(result));
+// Throws ToolError, "WHAT: RESULT" and what it means here, unless the library did it.
+inline void CheckResult(VX_Result result, const std::string& what, const std::string& meaning = {}) {
+  if (result != VX_Success) throw ToolError(what + ": " + ResultText(result) + meaning);
 }
 
 }  // namespace tool
