@@ -5,8 +5,9 @@
 
 #include "convert/PlainYuv.h"
 #include "convert/StudioScale.h"
+#include "convert/V210Fixed.h"
+#include "convert/V210Upsample512.h"
 #include "convert/YuvKernels.h"
-#include "convert/YuvMatrices.h"
 
 #undef HWY_TARGET_INCLUDE
 #define HWY_TARGET_INCLUDE "convert/V210Kernels.cpp"
@@ -27,38 +28,6 @@ constexpr size_t GroupsOf(size_t pixels) { return (pixels + 5) / 6; }
 
 // Black pairs for what a last group holds beyond the row. In float and as zero samples of a read row they need no fill.
 constexpr uint32_t kBlackUyvy8 = 0x10801080;
-
-// Fixed point: products of a 16-bit value and a coefficient in units of 2^-15, rounded. Factors are 10-bit codes times
-// 64 less 2^15, which is zero chroma; results are 8-bit codes times 64.
-constexpr int16_t ToFixed(double factor) {
-  const double v = factor / 4 * 32768;
-  return static_cast<int16_t>(v < 0 ? v - 0.5 : v + 0.5);
-}
-
-struct BgrFixed {
-  int16_t y, offset, bU, gU, gV, rV;
-};
-constexpr BgrFixed MakeBgrFixed(const YuvMatrix& m) {
-  constexpr double kLuma = 255.0 / kLumaRange8, kChroma = 255.0 / kChromaRange8;
-  constexpr double kOffset = (128 - kLumaBlack8) * kLuma * 64 + 0.5;
-  return {ToFixed(kLuma),          static_cast<int16_t>(kOffset), ToFixed(m.bU * kChroma),
-          ToFixed(m.gU * kChroma), ToFixed(m.gV * kChroma),       ToFixed(m.rV * kChroma)};
-}
-inline constexpr BgrFixed kBgrFixed601 = MakeBgrFixed(kBt601), kBgrFixed709 = MakeBgrFixed(kBt709);
-
-struct RecodingFixed {
-  int16_t vU, vV, uU, uV, yU, yV;
-};
-constexpr RecodingFixed MakeRecodingFixed(const YuvRecoding& r) {
-  constexpr double kLuma = double{kLumaRange8} / kChromaRange8;
-  return {ToFixed(r.vU), ToFixed(r.vV), ToFixed(r.uU), ToFixed(r.uV), ToFixed(r.yU * kLuma), ToFixed(r.yV * kLuma)};
-}
-inline constexpr RecodingFixed kRecodingFixed709To601 = MakeRecodingFixed(k709To601);
-
-// The two bytes that hold sample `index` of a group, and the factor that moves it to the top of their 16 bits, where
-// the bits above it fall out.
-constexpr uint8_t FirstByte(size_t index) { return static_cast<uint8_t>(index / 3 * 4 + index % 3); }
-constexpr uint16_t ToTop(size_t index) { return static_cast<uint16_t>(64 >> 2 * (index % 3)); }
 
 // How kVectors vectors of kBlocks 128-bit blocks take their samples, kLanes of kBytes bytes to a block, from the groups
 // in order. A sample ends at the top of its lane.
@@ -482,14 +451,19 @@ HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRI
   }
 }
 
-void V210ToBgrx8_601(const uint8_t* src, uint8_t* dst, size_t count) {
-  UpsampleRow<ToBgr8<kBgrFixed601>>(src, dst, count);
+template <const BgrFixed& kM>
+HWY_INLINE void ToBgrx8(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return V210ToBgrx512(src, dst, count, kM);
+  UpsampleRow<ToBgr8<kM>>(src, dst, count);
 }
-void V210ToBgrx8_709(const uint8_t* src, uint8_t* dst, size_t count) {
-  UpsampleRow<ToBgr8<kBgrFixed709>>(src, dst, count);
+void V210ToBgrx8_601(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8<kBgrFixed601>(src, dst, count); }
+void V210ToBgrx8_709(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8<kBgrFixed709>(src, dst, count); }
+void V210ToVuyx8(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return V210ToVuyx512(src, dst, count);
+  UpsampleRow<ToVuy8>(src, dst, count);
 }
-void V210ToVuyx8(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<ToVuy8>(src, dst, count); }
 void V210_709ToVuyx8_601(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return RecodeV210ToVuyx512(src, dst, count, kRecodingFixed709To601);
   UpsampleRow<RecodeToVuy8<kRecodingFixed709To601>>(src, dst, count);
 }
 

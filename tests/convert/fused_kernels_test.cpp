@@ -40,7 +40,7 @@ TEST(FusedKernels, MovesAreExact) {
 
 TEST(FusedKernels, EqualTheirPlainSteps) {
   constexpr F k8 = F::BGRA_4444_8u, k15 = F::BGRA_4444_15u, k32 = F::BGRA_4444_32f, kPairs8 = F::UYVY_422_8u,
-              kPairs32 = F::UYVY_422_32f;
+              kPairs32 = F::UYVY_422_32f, kV210 = F::V210_422_10u;
   const struct {
     const RowKernelSet& fused;
     Steps steps;
@@ -101,6 +101,15 @@ TEST(FusedKernels, EqualTheirPlainSteps) {
       {kYuyv8_709To601, {&kSwap422_8u, &kUyvy8_709To601, &kSwap422_8u}, kPairs8, kPairs8},
       {kYuyv8To32f, {&kSwap422_8u, &kUyvy8To32f, &kSwap422_32f}, kPairs8, kPairs32},
       {kYuyv32fTo8, {&kSwap422_32f, &kUyvy32fTo8, &kSwap422_8u}, kPairs32, kPairs8},
+      {kUyvy32fToVuyx32f, {&kUyvy32fToVuyx32f}, kPairs32, k32},
+      {kUyvy32fToVuyx32fNearest, {&kUyvy32fToVuyx32fNearest}, kPairs32, k32},
+      {kVuyx32fToUyvy32f, {&kVuyx32fToUyvy32f}, k32, kPairs32},
+      {kUyvy32fToV210, {&kUyvy32fToV210}, kPairs32, kV210},
+      {kV210ToUyvy8, {&kV210ToUyvy8}, kV210, kPairs8},
+      {kV210ToBgrx8_601, {&kV210ToBgrx8_601}, kV210, k8},
+      {kV210ToBgrx8_709, {&kV210ToBgrx8_709}, kV210, k8},
+      {kV210ToVuyx8, {&kV210ToVuyx8}, kV210, k8},
+      {kV210_709ToVuyx8_601, {&kV210_709ToVuyx8_601}, kV210, k8},
   };
   for (const auto& kernel : kernels)
     for (size_t count = 1; count <= 1100; count += count < 72 ? 1 : count < 262 ? 19 : 73) {

@@ -1,0 +1,205 @@
+// The arithmetic is that of V210Kernels.cpp. 16 groups have as many samples of luma and of chroma as three vectors have
+// words, so that no lane is idle.
+#include "convert/V210Upsample512.h"
+
+#include <cstring>
+
+namespace vexel {
+namespace {
+
+constexpr size_t kBlockPixels = 96, kBlockBytes = 256, kStepBytes = 64, kFetchAhead = 8192;
+constexpr size_t PairsOf(size_t pixels) { return (pixels + 1) / 2; }
+constexpr size_t GroupsOf(size_t pixels) { return (pixels + 5) / 6; }
+
+// The bytes of the luma (kFirst 1) or chroma (0) samples of step kStep, counted from kStep vectors into the block, and
+// the factors that move the samples to the top of their words.
+template <size_t kStep, size_t kFirst>
+struct Samples {
+  constexpr Samples() : bytes{}, factors{} {
+    for (size_t i = 0; i < 32; ++i) {
+      const size_t sample = 64 * kStep + 2 * i + kFirst;
+      for (size_t k = 0; k < 2; ++k) bytes[2 * i + k] = static_cast<uint8_t>(FirstByte(sample) - 64 * kStep + k);
+      factors[i] = ToTop(sample);
+    }
+  }
+  alignas(64) uint8_t bytes[64];
+  alignas(64) uint16_t factors[32];
+};
+
+template <size_t kStep, size_t kFirst>
+VX_VBMI_INLINE __m512i AtTop(const uint8_t* block) {
+  static constexpr Samples<kStep, kFirst> kSamples;
+  const __m512i words =
+      _mm512_permutex2var_epi8(_mm512_loadu_si512(block + kStep * kStepBytes), _mm512_load_si512(kSamples.bytes),
+                               _mm512_loadu_si512(block + (kStep + 1) * kStepBytes));
+  return _mm512_mullo_epi16(words, _mm512_load_si512(kSamples.factors));
+}
+
+VX_VBMI_INLINE __m512i Words(int value) { return _mm512_set1_epi16(static_cast<int16_t>(value)); }
+
+// Codes times 64; what is below a sample is left in the words of luma.
+template <size_t kStep>
+VX_VBMI_INLINE __m512i Luma(const uint8_t* block) {
+  return AtTop<kStep, 1>(block);
+}
+template <size_t kStep>
+VX_VBMI_INLINE __m512i Chroma(const uint8_t* block) {
+  return _mm512_and_si512(AtTop<kStep, 0>(block), Words(0xFFC0));
+}
+
+// Bytes of 32 pixels, from those of their first and third channel in each 16 bytes and of their second and fourth.
+struct PixelOrder {
+  constexpr PixelOrder() : bytes{} {
+    for (uint32_t i = 0; i < 128; ++i) {
+      const uint32_t pixel = i / 4, channel = i % 4, at = pixel / 8 * 16 + pixel % 8;
+      bytes[i] = static_cast<uint8_t>(at + channel / 2 * 8 + channel % 2 * 64);
+    }
+  }
+  alignas(64) uint8_t bytes[128];
+};
+
+VX_VBMI_INLINE void StoreOrdered(__m512i a, const uint8_t* order, __m512i b, uint8_t* dst) {
+  _mm512_storeu_si512(dst, _mm512_permutex2var_epi8(a, _mm512_load_si512(order), b));
+  _mm512_storeu_si512(dst + 64, _mm512_permutex2var_epi8(a, _mm512_load_si512(order + 64), b));
+}
+
+VX_VBMI_INLINE void StoreChannels(__m512i c0, __m512i c1, __m512i c2, uint8_t* dst) {
+  static constexpr PixelOrder kOrder;
+  StoreOrdered(_mm512_packus_epi16(c0, c2), kOrder.bytes, _mm512_packus_epi16(c1, Words(255)), dst);
+}
+
+// Chroma of the pixels about 0, from pairs of words (U, V) for the even and for the odd pixels.
+struct PixelChroma {
+  VX_VBMI_INLINE PixelChroma(__m512i even, __m512i odd) {
+    const __m512i low = _mm512_set4_epi32(0x0D0C0D0C, 0x09080908, 0x05040504, 0x01000100),
+                  high = _mm512_set4_epi32(0x0F0E0F0E, 0x0B0A0B0A, 0x07060706, 0x03020302);
+    even = _mm512_xor_si512(even, Words(0x8000)), odd = _mm512_xor_si512(odd, Words(0x8000));
+    u = _mm512_mask_shuffle_epi8(even, 0xCCCCCCCCCCCCCCCC, odd, low);
+    v = _mm512_mask_shuffle_epi8(odd, 0x3333333333333333, even, high);
+  }
+  __m512i u, v;
+};
+
+// (luma & ~63) ^ 2^15
+VX_VBMI_INLINE __m512i SignedLuma(__m512i luma) {
+  return _mm512_ternarylogic_epi32(luma, Words(0xFFC0), Words(0x8000), 0x6A);
+}
+
+struct ToBgr {
+  VX_VBMI_INLINE explicit ToBgr(const BgrFixed& m)
+      : y(Words(m.y)),
+        offset(Words(m.offset + 32)),
+        bU(Words(m.bU)),
+        gU(Words(m.gU)),
+        gV(Words(m.gV)),
+        rV(Words(m.rV)) {}
+  VX_VBMI_INLINE void Store(__m512i luma, __m512i even, __m512i odd, uint8_t* dst) const {
+    const PixelChroma c(even, odd);
+    const __m512i grey = _mm512_add_epi16(_mm512_mulhrs_epi16(SignedLuma(luma), y), offset);
+    const auto channel = [&](__m512i chroma) VX_VBMI { return _mm512_srai_epi16(_mm512_adds_epi16(grey, chroma), 6); };
+    StoreChannels(channel(_mm512_mulhrs_epi16(c.u, bU)),
+                  channel(_mm512_add_epi16(_mm512_mulhrs_epi16(c.u, gU), _mm512_mulhrs_epi16(c.v, gV))),
+                  channel(_mm512_mulhrs_epi16(c.v, rV)), dst);
+  }
+  __m512i y, offset, bU, gU, gV, rV;
+};
+
+// Rounded codes are the upper bytes of words.
+struct ToVuy {
+  struct Order {
+    constexpr Order() : chroma{}, pixels{} {
+      for (uint32_t i = 0; i < 64; ++i)  // V and U of each pixel
+        chroma[i] = static_cast<uint8_t>(i / 4 * 4 + 3 - i % 2 * 2 + i / 2 % 2 * 64);
+      for (uint32_t i = 0; i < 128; ++i)
+        pixels[i] = static_cast<uint8_t>(i / 4 * 2 + (i % 4 < 2 ? i % 2 : 64 + 1 - i % 2));
+    }
+    alignas(64) uint8_t chroma[64], pixels[128];
+  };
+  VX_VBMI_INLINE void Store(__m512i luma, __m512i even, __m512i odd, uint8_t* dst) const {
+    static constexpr Order kOrder;
+    const __m512i half = Words(128);
+    const auto round = [&](__m512i v) VX_VBMI { return _mm512_adds_epu16(v, half); };
+    StoreOrdered(_mm512_permutex2var_epi8(round(even), _mm512_load_si512(kOrder.chroma), round(odd)), kOrder.pixels,
+                 _mm512_or_si512(round(luma), Words(255)), dst);
+  }
+};
+
+struct RecodeToVuy {
+  VX_VBMI_INLINE explicit RecodeToVuy(const RecodingFixed& m)
+      : vU(Words(m.vU)), vV(Words(m.vV)), uU(Words(m.uU)), uV(Words(m.uV)), yU(Words(m.yU)), yV(Words(m.yV)) {}
+  VX_VBMI_INLINE void Store(__m512i luma, __m512i even, __m512i odd, uint8_t* dst) const {
+    const PixelChroma c(even, odd);
+    const __m512i half = Words(128 * 64 + 32);
+    const auto channel = [&](__m512i fromU, __m512i fromV, __m512i rest) VX_VBMI {
+      const __m512i sum = _mm512_add_epi16(_mm512_mulhrs_epi16(c.u, fromU), _mm512_mulhrs_epi16(c.v, fromV));
+      return _mm512_srai_epi16(_mm512_add_epi16(sum, rest), 6);
+    };
+    const __m512i grey = _mm512_add_epi16(_mm512_srai_epi16(SignedLuma(luma), 2), half);
+    StoreChannels(channel(vU, vV, half), channel(uU, uV, half), channel(yU, yV, grey), dst);
+  }
+  __m512i vU, vV, uU, uV, yU, yV;
+};
+
+// Sets a sample of a row.
+void SetSample(uint8_t* row, size_t index, uint32_t code) {
+  uint32_t word;
+  std::memcpy(&word, row + index / 3 * 4, 4);
+  word = (word & ~(uint32_t{0x3FF} << index % 3 * 10)) | code << index % 3 * 10;
+  std::memcpy(row + index / 3 * 4, &word, 4);
+}
+uint32_t GetSample(const uint8_t* row, size_t index) {
+  uint32_t word;
+  std::memcpy(&word, row + index / 3 * 4, 4);
+  return word >> index % 3 * 10 & 0x3FF;
+}
+
+// The pixels of a block. Needs the chroma of its first step and returns that of the block that follows.
+template <class Pixels>
+VX_VBMI_INLINE __m512i UpsampleBlock(const Pixels& pixels, const uint8_t* block, const uint8_t* following,
+                                     __m512i first, uint8_t* dst) {
+  const auto store = [&](__m512i luma, __m512i own, __m512i next, uint8_t* to) VX_VBMI {
+    pixels.Store(luma, own, _mm512_avg_epu16(own, _mm512_alignr_epi32(next, own, 1)), to);
+  };
+  const __m512i second = Chroma<1>(block), third = Chroma<2>(block), after = Chroma<0>(following);
+  store(Luma<0>(block), first, second, dst);
+  store(Luma<1>(block), second, third, dst + 128);
+  store(Luma<2>(block), third, after, dst + 256);
+  return after;
+}
+
+// The row continues with its last chroma.
+template <class Pixels>
+VX_VBMI void Upsample(const uint8_t* src, uint8_t* dst, size_t count, const Pixels& pixels) {
+  if (count == 0) return;
+  const size_t blocks = count / kBlockPixels, rest = count % kBlockPixels;
+  alignas(64) uint8_t tail[kBlockBytes + 2 * kStepBytes] = {};
+  std::memcpy(tail, src + blocks * kBlockBytes, GroupsOf(rest) * 16);
+  for (size_t channel = 0; channel <= 2; channel += 2)
+    SetSample(tail, 4 * PairsOf(rest) + channel, GetSample(src, 4 * (PairsOf(count) - 1) + channel));
+
+  __m512i first = Chroma<0>(blocks > 0 ? src : tail);
+  for (size_t i = 0; i < blocks; ++i, src += kBlockBytes, dst += 4 * kBlockPixels) {
+    for (size_t k = 0; k < kBlockBytes; k += 64)
+      __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + k));
+    first = UpsampleBlock(pixels, src, i + 1 < blocks ? src + kBlockBytes : tail, first, dst);
+  }
+  if (rest > 0) {
+    alignas(64) uint8_t out[4 * kBlockPixels];
+    UpsampleBlock(pixels, tail, tail + kBlockBytes, first, out);
+    std::memcpy(dst, out, 4 * rest);
+  }
+}
+
+}  // namespace
+
+VX_VBMI void V210ToBgrx512(const uint8_t* src, uint8_t* dst, size_t count, const BgrFixed& matrix) noexcept {
+  Upsample(src, dst, count, ToBgr(matrix));
+}
+VX_VBMI void V210ToVuyx512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
+  Upsample(src, dst, count, ToVuy());
+}
+VX_VBMI void RecodeV210ToVuyx512(const uint8_t* src, uint8_t* dst, size_t count, const RecodingFixed& matrix) noexcept {
+  Upsample(src, dst, count, RecodeToVuy(matrix));
+}
+
+}  // namespace vexel
