@@ -2,6 +2,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <type_traits>
 
 #include "convert/PlainYuv.h"
 #include "convert/StudioScale.h"
@@ -12,6 +13,7 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
+#include "convert/FloatPairs-inl.h"
 #include "convert/FloatPixels-inl.h"
 #include "frame/KernelTable.h"
 
@@ -25,15 +27,6 @@ constexpr size_t PairsOf(size_t pixels) { return (pixels + 1) / 2; }
 // The interpolated chroma between c0 and c1.
 inline float Between(float before, float c0, float c1, float after) {
   return (9.0f * (c0 + c1) - (before + after)) * 0.0625f;
-}
-
-// A row as it continues beyond its ends: pairs first ... first + count - 1, whose indices may lie outside of the row.
-inline void ExtendPairs(const uint8_t* row, size_t pixels, ptrdiff_t first, size_t count, uint8_t* out) {
-  const auto last = static_cast<ptrdiff_t>(PairsOf(pixels)) - 1;
-  for (size_t i = 0; i < count; ++i) {
-    const ptrdiff_t pair = first + static_cast<ptrdiff_t>(i);
-    std::memcpy(out + 16 * i, row + 16 * (pair < 0 ? 0 : pair > last ? last : pair), 16);
-  }
 }
 
 }  // namespace
@@ -89,182 +82,100 @@ void Yuyv32fTo8(const uint8_t* src, uint8_t* dst, size_t count) {
   RowLoop<kBlockPairs, 16, 4>(src, dst, PairsOf(count), NarrowBlock<kYuyv8Scale>());
 }
 
-// kVectorPairs pixel pairs from their even and their odd pixels.
-HWY_INLINE void StorePixelPairs(F32 even, F32 odd, uint8_t* HWY_RESTRICT p) {
-#if HWY_TARGET == HWY_AVX3
-  const __m512i lower = _mm512_setr_epi64(0, 1, 8, 9, 2, 3, 10, 11),
-                upper = _mm512_setr_epi64(4, 5, 12, 13, 6, 7, 14, 15);
-  const __m512d e = _mm512_castps_pd(even.raw), o = _mm512_castps_pd(odd.raw);
-  StoreVector(F32{_mm512_castpd_ps(_mm512_permutex2var_pd(e, lower, o))}, p, 0);
-  StoreVector(F32{_mm512_castpd_ps(_mm512_permutex2var_pd(e, upper, o))}, p, 1);
-#elif HWY_TARGET == HWY_AVX2
-  StoreVector(F32{_mm256_permute2f128_ps(even.raw, odd.raw, 0x20)}, p, 0);
-  StoreVector(F32{_mm256_permute2f128_ps(even.raw, odd.raw, 0x31)}, p, 1);
-#else
-  StoreVector(even, p, 0);
-  StoreVector(odd, p, 1);
-#endif
+// Between of the pairs of `own` and the ones after them.
+HWY_INLINE F32 PairsBetween(F32 before, F32 own, F32 next) {
+  const FloatTag d;
+  const F32 inner = hn::Add(own, ShiftPairsIn<1>(own, next));
+  const F32 outer = hn::Add(ShiftPairsOut(before, own), ShiftPairsIn<2>(own, next));
+  return hn::Mul(hn::Sub(hn::Mul(hn::Set(d, 9.0f), inner), outer), hn::Set(d, 0.0625f));
 }
 
-// Between of all lanes of four vectors.
-template <class V>
-HWY_INLINE V VectorBetween(V before, V c0, V c1, V after) {
-  const hn::DFromV<V> d;
-  return hn::Mul(hn::Sub(hn::Mul(hn::Set(d, 9.0f), hn::Add(c0, c1)), hn::Add(before, after)), hn::Set(d, 0.0625f));
-}
+constexpr size_t kPlanePixels = 2 * kPlanePairs;
 
-struct Interpolated {
-  static constexpr size_t kBefore = 1, kAfter = 2;
-  static HWY_INLINE void Apply(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
-    const auto own = LoadVector<float>(src);
-    const auto between =
-        VectorBetween(LoadVector<float>(src - 16), own, LoadVector<float>(src + 16), LoadVector<float>(src + 32));
-    const auto even = PermuteChannels<2, 0, 1, 3>(own);
-    const auto odd = PermuteChannels<2, 0, 3, 3>(TakeChannels<8>(between, own));
-    StorePixelPairs(FinishAlpha<true>(even, even), FinishAlpha<true>(odd, odd), dst);
-  }
-};
-
-struct Nearest {
-  static constexpr size_t kBefore = 0, kAfter = 0;
-  static HWY_INLINE void Apply(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
-    const auto own = LoadVector<float>(src);
-    const auto even = PermuteChannels<2, 0, 1, 3>(own), odd = PermuteChannels<2, 0, 3, 3>(own);
-    StorePixelPairs(FinishAlpha<true>(even, even), FinishAlpha<true>(odd, odd), dst);
-  }
-};
-
-// Calls Step::Apply for blocks of pairs that may look at their neighbours; where those are not in the row, on a copy
-// that continues beyond its ends.
-template <class Step>
-HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-  constexpr size_t kBlock = kVectorPairs, kSeen = Step::kBefore + kBlock + Step::kAfter;
-  for (size_t pair = 0; 2 * pair < count; pair += kBlock) {
-    if (pair >= Step::kBefore)
-      for (; 2 * (pair + kBlock + Step::kAfter) <= count; pair += kBlock) Step::Apply(src + 16 * pair, dst + 32 * pair);
-    if (2 * pair >= count) break;
-    alignas(64) uint8_t in[16 * kSeen];
-    alignas(64) uint8_t out[32 * kBlock];
-    ExtendPairs(src, count, static_cast<ptrdiff_t>(pair) - static_cast<ptrdiff_t>(Step::kBefore), kSeen, in);
-    Step::Apply(in + 16 * Step::kBefore, out);
-    const size_t left = 16 * (count - 2 * pair);
-    std::memcpy(dst + 32 * pair, out, left < sizeof out ? left : sizeof out);
-  }
-}
-
-void Uyvy32fToVuyx32f(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<Interpolated>(src, dst, count); }
-void Uyvy32fToVuyx32fNearest(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<Nearest>(src, dst, count); }
-
-// Channels 0 and 1 of the even and of the odd pixels of two pairs, or channels 2 and 3.
-struct PixelHalves {
-  hn::Vec128<float> even, odd;
-};
-template <bool kUpper>
-HWY_INLINE PixelHalves LoadHalves(const uint8_t* HWY_RESTRICT p) {
-#if HWY_TARGET <= HWY_AVX2
-  const auto* doubles = reinterpret_cast<const double*>(p);
-  const __m256d first = _mm256_loadu_pd(doubles), second = _mm256_loadu_pd(doubles + 4);
-  const __m256 both = _mm256_castpd_ps(kUpper ? _mm256_unpackhi_pd(first, second) : _mm256_unpacklo_pd(first, second));
-  return {hn::Vec128<float>{_mm256_castps256_ps128(both)}, hn::Vec128<float>{_mm256_extractf128_ps(both, 1)}};
-#else
-  const hn::Full128<double> d;
-  const hn::Full128<float> df;
-  const auto* doubles = reinterpret_cast<const double*>(p);
-  const auto join = [d](const double* first, const double* second) HWY_ATTR {
-    const auto a = hn::LoadU(d, first), b = hn::LoadU(d, second);
-    return kUpper ? hn::InterleaveUpper(d, a, b) : hn::InterleaveLower(d, a, b);
-  };
-  return {hn::BitCast(df, join(doubles, doubles + 4)), hn::BitCast(df, join(doubles + 2, doubles + 6))};
-#endif
-}
-
-// Runs of a row in planes of V U V U ... that stay in the cache, so that every lane of the filter has work. The planes
-// have room for a last vector that is not full.
-class ChromaFilter {
+// A row in blocks of kPlanePixels pixels, and what follows it: `repeated`, of 16 bytes, over and over.
+template <size_t kBlockBytes>
+class BlockRow {
  public:
-  void Row(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
-    const size_t pairs = PairsOf(count), wholePairs = count / 2;
-    if (count > 0) Move(src, Even(-1));
-    for (size_t first = 0; first < pairs; first += kRun, src += 32 * kRun, dst += 16 * kRun) {
-      mRun = pairs - first < kRun ? pairs - first : kRun;
-      mWhole = wholePairs - first < kRun ? wholePairs - first : kRun;
-      if (first > 0) {
-        Move(Even(kRun - 1), Even(-1));
-        Move(Detail(kRun - 1), Detail(-1));
-      }
-      Split(src);
-      for (size_t i = mRun; i < mRun + 2; ++i)
-        Move(src + 32 * (first + i < pairs ? i : pairs - 1 - first), Even(static_cast<ptrdiff_t>(i)));
-      Filter();
-      Join(src, dst);
-    }
+  BlockRow(const uint8_t* HWY_RESTRICT src, size_t blocks, size_t restBytes, const uint8_t* HWY_RESTRICT repeated)
+      : mSrc(src), mBlocks(blocks) {
+    for (size_t i = 0; i < sizeof mTail; i += 16) std::memcpy(mTail + i, repeated, 16);
+    std::memcpy(mTail, src + blocks * kBlockBytes, restBytes);
+  }
+  HWY_INLINE const uint8_t* Block(size_t i) const {
+    return i < mBlocks ? mSrc + i * kBlockBytes : i == mBlocks ? mTail : mTail + kBlockBytes;
   }
 
  private:
-  static constexpr size_t kRun = 64, kPair = 2 * sizeof(float), kSpare = HWY_MAX_BYTES;
-
-  uint8_t* Even(ptrdiff_t pair) { return mEven + kPair * static_cast<size_t>(pair + 1); }
-  uint8_t* Odd(ptrdiff_t pair) { return mOdd + kPair * static_cast<size_t>(pair); }
-  uint8_t* Detail(ptrdiff_t pair) { return mDetail + kPair * static_cast<size_t>(pair + 1); }
-  static void Move(const uint8_t* from, uint8_t* to) { std::memcpy(to, from, kPair); }
-
-  HWY_INLINE void Split(const uint8_t* HWY_RESTRICT src) {
-    const hn::Full128<float> d;
-    const size_t paired = mWhole / 2 * 2;
-    size_t i = 0;
-    for (; i < paired; i += 2) {
-      const PixelHalves chroma = LoadHalves<false>(src + 32 * i);
-      hn::StoreU(chroma.even, d, reinterpret_cast<float*>(Even(static_cast<ptrdiff_t>(i))));
-      hn::StoreU(chroma.odd, d, reinterpret_cast<float*>(Odd(static_cast<ptrdiff_t>(i))));
-    }
-    for (; i < mRun; ++i) {
-      Move(src + 32 * i, Even(static_cast<ptrdiff_t>(i)));
-      if (i < mWhole) Move(src + 32 * i + 16, Odd(static_cast<ptrdiff_t>(i)));
-    }
-  }
-
-  // Leaves the row's chroma where that of the odd pixels was.
-  HWY_INLINE void Filter() {
-    const size_t vectors = (mRun * kPair + HWY_MAX_BYTES - 1) / HWY_MAX_BYTES;
-    for (size_t i = 0; i < vectors; ++i) {
-      const auto middle = VectorBetween(LoadVector<float>(Even(-1), i), LoadVector<float>(Even(0), i),
-                                        LoadVector<float>(Even(1), i), LoadVector<float>(Even(2), i));
-      StoreVector(hn::Sub(middle, LoadVector<float>(mOdd, i)), Detail(0), i);
-    }
-    if (mWhole < mRun) std::memset(Detail(static_cast<ptrdiff_t>(mWhole)), 0, kPair);
-    const auto quarter = hn::Set(FloatTag(), 0.25f);
-    for (size_t i = 0; i < vectors; ++i) {
-      const auto details = hn::Add(LoadVector<float>(Detail(-1), i), LoadVector<float>(Detail(0), i));
-      StoreVector(hn::Sub(LoadVector<float>(Even(0), i), hn::Mul(details, quarter)), mOdd, i);
-    }
-  }
-
-  HWY_INLINE void Join(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst) {
-    const hn::Full128<float> d;
-    const size_t paired = mWhole / 2 * 2;
-    size_t i = 0;
-    for (; i < paired; i += 2) {
-      const PixelHalves upper = LoadHalves<true>(src + 32 * i);
-      const auto luma = hn::OddEven(hn::DupEven(upper.odd), upper.even);
-      const auto chroma = hn::Shuffle2301(hn::LoadU(d, reinterpret_cast<const float*>(Odd(static_cast<ptrdiff_t>(i)))));
-      auto* out = reinterpret_cast<float*>(dst + 16 * i);
-      hn::StoreU(hn::InterleaveLower(d, chroma, luma), d, out);
-      hn::StoreU(hn::InterleaveUpper(d, chroma, luma), d, out + 4);
-    }
-    for (; i < mRun; ++i) {
-      const uint8_t* parts[4] = {mOdd + kPair * i + 4, src + 32 * i + 8, mOdd + kPair * i,
-                                 src + 32 * i + (i < mWhole ? 24 : 8)};
-      for (size_t c = 0; c < 4; ++c) std::memcpy(dst + 16 * i + 4 * c, parts[c], 4);
-    }
-  }
-
-  alignas(64) uint8_t mEven[kPair * (kRun + 3) + kSpare] = {};
-  alignas(64) uint8_t mOdd[kPair * kRun + kSpare] = {};
-  alignas(64) uint8_t mDetail[kPair * (kRun + 1) + kSpare] = {};
-  size_t mRun = 0, mWhole = 0;
+  const uint8_t* mSrc;
+  size_t mBlocks;
+  alignas(64) uint8_t mTail[2 * kBlockBytes];
 };
 
-void Vuyx32fToUyvy32f(const uint8_t* src, uint8_t* dst, size_t count) { ChromaFilter().Row(src, dst, count); }
+// The same chroma for all pairs.
+HWY_INLINE F32 RepeatChroma(const uint8_t* v, const uint8_t* u) {
+  const FloatTag d;
+  float chroma[2];
+  std::memcpy(&chroma[0], v, sizeof(float));
+  std::memcpy(&chroma[1], u, sizeof(float));
+  return hn::OddEven(hn::Set(d, chroma[1]), hn::Set(d, chroma[0]));
+}
+
+template <bool kInterpolate>
+HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+  constexpr size_t kSrcBlock = 16 * kPlanePairs, kDstBlock = 16 * kPlanePixels;
+  if (count == 0) return;
+  const size_t blocks = count / kPlanePixels, rest = count % kPlanePixels;
+  const BlockRow<kSrcBlock> row(src, blocks, 16 * PairsOf(rest), src + 16 * (PairsOf(count) - 1));
+  F32 before = RepeatChroma(src + 8, src), own = LoadPairChroma(row.Block(0));
+  const auto step = [&](const uint8_t* HWY_RESTRICT block, size_t i, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const F32 next = LoadPairChroma(row.Block(i + 1));
+    StorePixelPlanes(own, kInterpolate ? PairsBetween(before, own, next) : own, block, out);
+    before = own;
+    own = next;
+  };
+  for (size_t i = 0; i < blocks; ++i) {
+    FetchAhead<kSrcBlock>(src + i * kSrcBlock);
+    step(src + i * kSrcBlock, i, dst + i * kDstBlock);
+  }
+  if (rest > 0) {
+    alignas(64) uint8_t out[kDstBlock];
+    step(row.Block(blocks), blocks, out);
+    std::memcpy(dst + blocks * kDstBlock, out, 16 * rest);
+  }
+}
+
+void Uyvy32fToVuyx32f(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<true>(src, dst, count); }
+void Uyvy32fToVuyx32fNearest(const uint8_t* src, uint8_t* dst, size_t count) { UpsampleRow<false>(src, dst, count); }
+
+void Vuyx32fToUyvy32f(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+  constexpr size_t kSrcBlock = 16 * kPlanePixels, kDstBlock = 16 * kPlanePairs;
+  if (count == 0) return;
+  const FloatTag d;
+  const size_t blocks = count / kPlanePixels, rest = count % kPlanePixels;
+  const BlockRow<kSrcBlock> row(src, blocks, 16 * rest, src + 32 * (PairsOf(count) - 1));
+  F32 before = RepeatChroma(src, src + 4), detailsBefore = hn::Zero(d);
+  PixelPlanes own = LoadPixelPlanes(row.Block(0));
+  // Details are those of pairs that have an odd pixel.
+  const auto step = [&](size_t i, auto lacksOdd, uint8_t* HWY_RESTRICT out) HWY_ATTR {
+    const PixelPlanes next = LoadPixelPlanes(row.Block(i + 1));
+    F32 details = hn::Sub(PairsBetween(before, own.even, next.even), own.odd);
+    if constexpr (lacksOdd) details = hn::IfThenElseZero(hn::FirstN(d, rest / 2 * 2), details);
+    const F32 sum = hn::Add(ShiftPairsOut(detailsBefore, details), details);
+    StorePairs(hn::Sub(own.even, hn::Mul(sum, hn::Set(d, 0.25f))), own.luma, out);
+    before = own.even;
+    detailsBefore = details;
+    own = next;
+  };
+  for (size_t i = 0; i < blocks; ++i) {
+    FetchAhead<kSrcBlock>(src + i * kSrcBlock);
+    step(i, std::false_type(), dst + i * kDstBlock);
+  }
+  if (rest > 0) {
+    alignas(64) uint8_t out[kDstBlock];
+    step(blocks, std::true_type(), out);
+    std::memcpy(dst + blocks * kDstBlock, out, 16 * PairsOf(rest));
+  }
+}
 
 }  // namespace
 }  // namespace HWY_NAMESPACE
@@ -309,9 +220,8 @@ struct Chroma {
 
 // Chroma of a pair of a UYVY row that continues beyond its ends.
 Chroma PairChroma(const uint8_t* row, size_t pixels, ptrdiff_t pair) {
-  uint8_t bytes[16];
-  ExtendPairs(row, pixels, pair, 1, bytes);
-  const Quad quad = LoadQuad(bytes);
+  const auto last = static_cast<ptrdiff_t>(PairsOf(pixels)) - 1;
+  const Quad quad = LoadQuad(row + 16 * (pair < 0 ? 0 : pair > last ? last : pair));
   return {quad.c[2], quad.c[0]};
 }
 

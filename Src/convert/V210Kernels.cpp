@@ -195,28 +195,39 @@ void V210ToUyvy8(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 
 #if HWY_TARGET == HWY_AVX3
-// Four groups at once. Of three vectors of samples, the ones with the same place in their words stand in different
-// lanes, every third of each vector.
+// Four groups at once.
 constexpr size_t kPackGroups = 4;
 
 struct PackFloats {
-  static HWY_INLINE __m512i Codes(const uint8_t* HWY_RESTRICT in, size_t index) {
-    const hn::ScalableTag<int32_t> d;
-    const auto codes = ScaleToCodes<kUyvy10Scale>(LoadVector<float>(in, index));
-    return hn::Min(hn::Max(codes, hn::Zero(d)), hn::Set(d, 1023)).raw;
+  // Of the words of three vectors of samples, packed to two block by block: the lower two of each word of V210, and the
+  // third in an upper half.
+  struct Order {
+    constexpr Order() : two{}, third{} {
+      for (size_t i = 0; i < 48; ++i) {
+        const size_t at = i / 16 * 4 + i / 32 * 24 + i % 16 / 4 * 8 + i % 4, word = i / 3 * 2;
+        if (i % 3 == 2)
+          third[word + 1] = static_cast<uint16_t>(at);
+        else
+          two[word + i % 3] = static_cast<uint16_t>(at);
+      }
+    }
+    alignas(64) uint16_t two[32], third[32];
+  };
+  static HWY_INLINE I32 Codes(const uint8_t* HWY_RESTRICT in, size_t index) {
+    return ScaleToCodes<kUyvy10Scale>(LoadVector<float>(in, index));
   }
-  // Lanes 0, 3, 6, ... of x, 1, 4, 7, ... of y and 2, 5, 8, ... of z, where sample `place` of each word is, in order.
-  static HWY_INLINE __m512i Samples(__m512i x, __m512i y, __m512i z, int place) {
-    const __m512i from = _mm512_add_epi32(_mm512_setr_epi32(0, 3, 6, 9, 12, 15, 2, 5, 8, 11, 14, 1, 4, 7, 10, 13),
-                                          _mm512_set1_epi32(place));
-    return _mm512_permutexvar_epi32(from, _mm512_mask_blend_epi32(0x4924, _mm512_mask_blend_epi32(0x2492, x, y), z));
+  static HWY_INLINE __m512i Saturate(I32 a, I32 b) {
+    return hn::Min(PackBlocks(a, b), hn::Set(hn::ScalableTag<uint16_t>(), 1023)).raw;
   }
   HWY_INLINE void operator()(const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) const {
-    const __m512i a = Codes(in, 0), b = Codes(in, 1), c = Codes(in, 2);
-    const __m512i first = Samples(a, c, b, 0), second = Samples(b, a, c, 1), third = Samples(c, b, a, 2);
-    StoreVector(
-        U32{_mm512_or_si512(_mm512_or_si512(first, _mm512_slli_epi32(second, 10)), _mm512_slli_epi32(third, 20))}, out,
-        0);
+    static constexpr Order kOrder;
+    const I32 c = Codes(in, 2);
+    const __m512i first = Saturate(Codes(in, 0), Codes(in, 1)), last = Saturate(c, c);
+    const __m512i two = _mm512_permutex2var_epi16(first, _mm512_load_si512(kOrder.two), last);
+    const __m512i third = _mm512_maskz_permutex2var_epi16(0xAAAAAAAA, first, _mm512_load_si512(kOrder.third), last);
+    // A sum of products puts the second sample above the first.
+    const __m512i lower = _mm512_madd_epi16(two, _mm512_set1_epi32(1 | 1024 << 16));
+    StoreVector(U32{_mm512_or_si512(lower, _mm512_slli_epi32(third, 4))}, out);
   }
 };
 #else
