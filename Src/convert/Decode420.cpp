@@ -43,6 +43,19 @@ VX_PixelFormat WorkingFormat(VX_PixelFormat src, VX_PixelFormat dst) noexcept {
   return PlanDecode420(src, 0, 0, dst, 0, 0, 0).format;
 }
 
+// The 4:2:2 codes that a conversion reaches first and goes on from as it would with them for a source; else `Invalid`.
+VX_PixelFormat FirstPairs(VX_PixelFormat from, VX_PixelFormat to, int32_t quality) noexcept {
+  const auto pairs = Colorimetry(from) == 0 ? VX_PixelFormat::UYVY_422_8u : VX_PixelFormat::UYVY_422_8u_709;
+  Plan whole, rest;
+  if (MakePlan(from, to, quality, &whole) != VX_Success || whole.steps[0].to != pairs) return VX_PixelFormat::Invalid;
+  if (to == pairs) return pairs;
+  if (MakePlan(pairs, to, quality, &rest) != VX_Success || rest.stepCount != whole.stepCount - 1)
+    return VX_PixelFormat::Invalid;
+  for (int i = 0; i < rest.stepCount; ++i)
+    if (rest.steps[i].kernel != whole.steps[i + 1].kernel) return VX_PixelFormat::Invalid;
+  return pairs;
+}
+
 VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
   for (int i = 0; i < (IsBiplanar(src.format) ? 2 : 3); ++i)
     if (!src.planes[i]) return VX_ErrNullSource;
@@ -54,6 +67,7 @@ VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
 void WriteRows(Rows420& rows, const TopDown& dst, uint8_t* staging) noexcept {
   const bool aligned = ((reinterpret_cast<uintptr_t>(dst.top) | static_cast<uintptr_t>(dst.rowBytes)) & 63) == 0;
   const KernelVariant variant = ActiveKernelVariant();
+  const int64_t pairBytes = UnpaddedRowBytes(dst.format, 2);
   for (int32_t y = 0; y < dst.height; ++y) {
     uint8_t* const row = dst.top + y * dst.rowBytes;
     rows.BeginRow(y);
@@ -64,7 +78,7 @@ void WriteRows(Rows420& rows, const TopDown& dst, uint8_t* staging) noexcept {
     for (int32_t x = 0; x < dst.width; x += kStreamPixels) {
       const int32_t count = std::min(kStreamPixels, dst.width - x);
       rows.Pixels(x, count, staging);
-      StreamCopy(row + ptrdiff_t{4} * x, staging, static_cast<size_t>(count) * 4, variant);
+      StreamCopy(row + x / 2 * pairBytes, staging, static_cast<size_t>(UnpaddedRowBytes(dst.format, count)), variant);
     }
   }
 }
@@ -77,13 +91,19 @@ void ConvertRows(Rows420& rows, const TopDown& dst, const RowConverter& converte
   }
 }
 
-// By way of `working`, which the decoder makes.
+// By way of `working`, of which the decoder makes four channels.
 VX_Result Decode(const Picture420& src, const TopDown& dst, VX_PixelFormat working, int32_t field,
                  int32_t quality) noexcept {
   if (!CanDecode420(src.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
   Rows420 rows;
-  if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) return result;
+  const VX_PixelFormat pairs = FirstPairs(working, dst.format, quality);
+  if (pairs != VX_PixelFormat::Invalid &&
+      rows.Prepare(src, pairs, dst.width, dst.height, field, quality) == VX_Success) {
+    working = pairs;
+  } else if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) {
+    return result;
+  }
   RowConverter converter;
   const bool converts = working != dst.format;
   if (converts)

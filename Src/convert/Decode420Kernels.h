@@ -48,6 +48,7 @@ struct Matrix {
   int16_t luma;          // the same for all channels that have luma: B, G and R, or Y
   int16_t lumaBias;      // with half a unit for rounding
   int16_t chroma[3][2];  // of each channel, for (U, V)
+  constexpr bool operator==(const Matrix&) const = default;
 };
 
 // Pixels of a row. Luma is bytes, or 16-bit samples ("wide", "full"). Chroma is 16-bit samples at half the resolution,
@@ -73,5 +74,16 @@ struct PixelKernels {
   OwnChromaKernels nearest, mixed;
 };
 extern const PixelKernels kToBgrx, kToVuyx;
+
+// Of a picture's own bytes, chroma interpolated, codes kept but for rounding: the matrix must be kSameCodes.
+struct ByteKernels {
+  KernelVariants<MakePixels> bytes, pairs, swappedPairs;
+};
+inline constexpr Matrix kSameCodes = {16384, 32, {{0, 8192}, {8192, 0}, {0, 0}}};
+extern const ByteKernels kToCodes;  // pixels of V, U and Y
+// Pairs of pixels (U, Y, V, Y), chroma being that of the first one. It is what interpolated codes give when they are
+// subsampled: an odd pixel has the mean of its neighbours, rounded up, or one less, and a low-pass that adds a quarter
+// of two such differences rounds them away.
+extern const ByteKernels kToUyvy;
 
 }  // namespace vexel::decode420

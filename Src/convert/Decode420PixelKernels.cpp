@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <type_traits>
 
 #include "convert/Decode420Kernels.h"
 
@@ -155,33 +156,23 @@ HWY_INLINE Alternating LoadAlternating(const uint8_t* p) {
 #endif
 }
 
-// Into the cache, or past it where dst is aligned.
-template <bool kStream>
-HWY_INLINE void Write(U32 v, uint8_t* dst, size_t index) {
-  const ScalableTag<uint8_t> d;
-  if constexpr (kStream)
-    hn::Stream(hn::BitCast(d, v), d, dst + index * HWY_MAX_BYTES);
-  else
-    StoreVector(v, dst, index);
-}
-
 template <Order kOrder, bool kStream>
 HWY_INLINE void StoreBlocks(U32 v0, U32 v1, U32 v2, U32 v3, uint8_t* dst) {
 #if HWY_TARGET == HWY_AVX2
   if constexpr (kOrder != Order::Dealt) {
     constexpr size_t kUpper = kOrder == Order::Natural ? 2 : 1;
     const ScalableTag<uint32_t> d;
-    Write<kStream>(hn::ConcatLowerLower(d, v1, v0), dst, 0);
-    Write<kStream>(hn::ConcatLowerLower(d, v3, v2), dst, 3 - kUpper);
-    Write<kStream>(hn::ConcatUpperUpper(d, v1, v0), dst, kUpper);
-    Write<kStream>(hn::ConcatUpperUpper(d, v3, v2), dst, 3);
+    WriteVector<kStream>(hn::ConcatLowerLower(d, v1, v0), dst, 0);
+    WriteVector<kStream>(hn::ConcatLowerLower(d, v3, v2), dst, 3 - kUpper);
+    WriteVector<kStream>(hn::ConcatUpperUpper(d, v1, v0), dst, kUpper);
+    WriteVector<kStream>(hn::ConcatUpperUpper(d, v3, v2), dst, 3);
     return;
   }
 #endif
-  Write<kStream>(v0, dst, 0);
-  Write<kStream>(v1, dst, 1);
-  Write<kStream>(v2, dst, 2);
-  Write<kStream>(v3, dst, 3);
+  WriteVector<kStream>(v0, dst, 0);
+  WriteVector<kStream>(v1, dst, 1);
+  WriteVector<kStream>(v2, dst, 2);
+  WriteVector<kStream>(v3, dst, 3);
 }
 
 // Luma codes times 128, of bytes negative: signed factors reach no further. The matrix knows.
@@ -335,12 +326,11 @@ HWY_INLINE U8 Narrow(I16 even, I16 odd) {
       PackBlocks(hn::ShiftRight<kFractionBits>(even), hn::MulHigh(odd, Set(1 << (16 - kFractionBits)))));
 }
 
+// Bytes of the channels, in the order of their pixels within the 128-bit blocks.
 template <Order kOrder, bool kStream>
-HWY_INLINE void StorePixels(const Channels& even, const Channels& odd, uint8_t* dst) {
+HWY_INLINE void StoreBytes(U8 c0, U8 c1, U8 c2, uint8_t* dst) {
   const ScalableTag<uint8_t> d8;
   const ScalableTag<uint16_t> d16;
-  const U8 c0 = Narrow<kOrder>(even.c0, odd.c0), c1 = Narrow<kOrder>(even.c1, odd.c1),
-           c2 = Narrow<kOrder>(even.c2, odd.c2);
   const U8 opaque = hn::Set(d8, 255);
   const U16 low01 = AsU16(hn::InterleaveLower(d8, c0, c1)), high01 = AsU16(hn::InterleaveUpper(d8, c0, c1));
   const U16 low23 = AsU16(hn::InterleaveLower(d8, c2, opaque)), high23 = AsU16(hn::InterleaveUpper(d8, c2, opaque));
@@ -350,16 +340,39 @@ HWY_INLINE void StorePixels(const Channels& even, const Channels& odd, uint8_t* 
       pixels(hn::InterleaveLower(d16, high01, high23)), pixels(hn::InterleaveUpper(d16, high01, high23)), dst);
 }
 
+template <Order kOrder, bool kStream>
+HWY_INLINE void StorePixels(const Channels& even, const Channels& odd, uint8_t* dst) {
+  StoreBytes<kOrder, kStream>(Narrow<kOrder>(even.c0, odd.c0), Narrow<kOrder>(even.c1, odd.c1),
+                              Narrow<kOrder>(even.c2, odd.c2), dst);
+}
+
+// What VuyOp makes where the matrix is the identity: luma as it is, and chroma mixed of bytes, rounded.
+struct CodesOp {
+  HWY_INLINE CodesOp(const Matrix&, int) {}
+  // Of even and odd pixels, from halves as a mixer makes them.
+  static HWY_INLINE U8 Chroma(const uint8_t* halves) {
+    const U16 half = LoadWords(halves), biased = hn::Add(half, SetWord(128 * 256 + 128));
+    const U16 even = hn::Add(biased, half), odd = hn::Add(biased, LoadWords(halves + 2));
+    return AsU8(Deal<Order::Dealt>(hn::OrAnd(hn::ShiftRight<8>(even), odd, SetWord(0xFF00))));
+  }
+  template <bool kStream>
+  static HWY_INLINE void Block(const uint8_t* y, const uint8_t* u, const uint8_t* v, uint8_t* dst) {
+    StoreBytes<Order::Dealt, kStream>(Chroma(v), Chroma(u), AsU8(Deal<Order::Dealt>(LoadWords(y))), dst);
+  }
+};
+
 template <class S, bool kStream, class Op>
 HWY_INLINE void Block(const uint8_t* y, const uint8_t* u, const uint8_t* v, const Op& op, uint8_t* dst) {
-  constexpr Order kOrder = OrderOf<S>();
-  const EvenOdd luma = LoadLuma<S>(y);
-  const Chroma chroma = LoadChroma<S>(u, v);
-  const Channels even = op.Chroma(chroma.u.even, chroma.v.even);
-  if constexpr (S::kIsShared)
-    StorePixels<kOrder, kStream>(op.Add(luma.even, even), op.Add(luma.odd, even), dst);
-  else
-    StorePixels<kOrder, kStream>(op.Add(luma.even, even), op.Add(luma.odd, op.Chroma(chroma.u.odd, chroma.v.odd)), dst);
+  if constexpr (std::is_same_v<Op, CodesOp>) {
+    Op::template Block<kStream>(y, u, v, dst);
+  } else {
+    constexpr Order kOrder = OrderOf<S>();
+    const EvenOdd luma = LoadLuma<S>(y);
+    const Chroma chroma = LoadChroma<S>(u, v);
+    const Channels even = op.Chroma(chroma.u.even, chroma.v.even);
+    const Channels odd = S::kIsShared ? even : op.Chroma(chroma.u.odd, chroma.v.odd);
+    StorePixels<kOrder, kStream>(op.Add(luma.even, even), op.Add(luma.odd, odd), dst);
+  }
 }
 
 // Rows of the picture itself are read exactly, like the destination is written; scratch rows have slack.
@@ -516,6 +529,10 @@ template <class S>
 void ToVuyx(const PixelRow& row, const Matrix& matrix) {
   Row<S, VuyOp>(row, matrix);
 }
+template <class S>
+void ToCodes(const PixelRow& row, const Matrix& matrix) {
+  Row<S, CodesOp>(row, matrix);
+}
 
 }  // namespace
 }  // namespace HWY_NAMESPACE
@@ -593,6 +610,10 @@ template <class S>
 void ToVuyx(const PixelRow& row, const Matrix& matrix) {
   Row<S, 4>(row, matrix);
 }
+template <class S>
+void ToCodes(const PixelRow& row, const Matrix& matrix) {
+  ToVuyx<S>(row, matrix);
+}
 
 }  // namespace
 }  // namespace plain
@@ -611,6 +632,8 @@ void ToVuyx(const PixelRow& row, const Matrix& matrix) {
 const PixelKernels kToBgrx = VX_PIXEL_KERNELS(ToBgrx);
 const PixelKernels kToVuyx = VX_PIXEL_KERNELS(ToVuyx);
 #undef VX_PIXEL_KERNELS
+const ByteKernels kToCodes = {VX_KERNEL_VARIANTS(ToCodes<MixedBytes>), VX_KERNEL_VARIANTS(ToCodes<MixedPairs>),
+                              VX_KERNEL_VARIANTS(ToCodes<MixedSwappedPairs>)};
 
 }  // namespace vexel::decode420
 #endif

@@ -39,8 +39,7 @@ VX_Result Rows420::Prepare(const Picture420& src, VX_PixelFormat format, int32_t
   mLinear = quality >= 2;
   mVariant = variant;
   if (const VX_Result result = ChooseLines(field, quality)) return result;
-  ChooseKernels(format);
-  return VX_Success;
+  return ChooseKernels(format) ? VX_Success : VX_ErrUnsupportedConversion;
 }
 
 VX_Result Rows420::ChooseLines(int32_t field, int32_t quality) noexcept {
@@ -66,7 +65,7 @@ VX_Result Rows420::ChooseLines(int32_t field, int32_t quality) noexcept {
   return VX_Success;
 }
 
-void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
+bool Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   const bool wide = HasWideSamples(mSrc.format), pairs = IsBiplanar(mSrc.format);
   mMixLuma = (wide ? kMixPlane10 : kMixPlane8)[mVariant];
   mMixChroma = (pairs ? wide ? kMixPairs10 : kMixPairs8 : wide ? kMixPlane10 : kMixPlane8)[mVariant];
@@ -81,15 +80,23 @@ void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   mChromaBytes = !mChromaFromSource ? 2 : (wide ? 2 : 1) * (pairs ? 2 : 1);
   const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
   const OwnChromaKernels& own = mLinear ? pixels.mixed : pixels.nearest;
+  mMatrix = MakeMatrix420(mSrc.format, format);
+  const bool keepsCodes = mChromaFromSource && mLinear && !wide && IsYuv(format) && mMatrix == kSameCodes;
+  const bool is422 = Layout(format) == kLayout422;
+  if (is422 && !keepsCodes) return false;
   const auto kernel = [&]() -> const KernelVariants<MakePixels>& {
     if (!mHalfChroma) return pixels.full;
     if (!mChromaFromSource) return mLinear ? pixels.wideLinear : pixels.wideNearest;
+    if (keepsCodes) {
+      const ByteKernels& codes = is422 ? kToUyvy : kToCodes;
+      return !pairs ? codes.bytes : IsReversed(mSrc.format) ? codes.swappedPairs : codes.pairs;
+    }
     if (!pairs) return own.bytes;
     if (IsReversed(mSrc.format)) return wide ? own.swappedWidePairs : own.swappedPairs;
     return wide ? own.widePairs : own.pairs;
   };
   mMakePixels = kernel()[mVariant];
-  mMatrix = MakeMatrix420(mSrc.format, format);
+  return true;
 }
 
 size_t Rows420::PlaceRows(uint8_t* scratch) noexcept {

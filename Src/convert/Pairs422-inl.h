@@ -33,23 +33,24 @@ HWY_INLINE U16 WordBytes256(U8 v) {
 }
 
 // Stores low[0] high[0] low[1] high[1] ...
+template <bool kStream = false>
 HWY_INLINE void StoreWordPairs(U8 low, U8 high, uint8_t* out) {
 #if HWY_TARGET == HWY_AVX3
   alignas(64) static constexpr uint16_t kFirst[32] = {0, 32, 1, 33, 2,  34, 3,  35, 4,  36, 5,  37, 6,  38, 7,  39,
                                                       8, 40, 9, 41, 10, 42, 11, 43, 12, 44, 13, 45, 14, 46, 15, 47};
   const __m512i first = _mm512_load_si512(kFirst);
   const __m512i second = _mm512_add_epi16(first, _mm512_set1_epi16(16));
-  StoreVector(U8{_mm512_permutex2var_epi16(low.raw, first, high.raw)}, out, 0);
-  StoreVector(U8{_mm512_permutex2var_epi16(low.raw, second, high.raw)}, out, 1);
+  WriteVector<kStream>(U8{_mm512_permutex2var_epi16(low.raw, first, high.raw)}, out, 0);
+  WriteVector<kStream>(U8{_mm512_permutex2var_epi16(low.raw, second, high.raw)}, out, 1);
 #else
   const hn::ScalableTag<uint16_t> d;
   const auto a = hn::InterleaveLower(d, AsU16(low), AsU16(high)), b = hn::InterleaveUpper(d, AsU16(low), AsU16(high));
 #if HWY_TARGET == HWY_AVX2
-  StoreVector(U16{_mm256_permute2x128_si256(a.raw, b.raw, 0x20)}, out, 0);
-  StoreVector(U16{_mm256_permute2x128_si256(a.raw, b.raw, 0x31)}, out, 1);
+  WriteVector<kStream>(U16{_mm256_permute2x128_si256(a.raw, b.raw, 0x20)}, out, 0);
+  WriteVector<kStream>(U16{_mm256_permute2x128_si256(a.raw, b.raw, 0x31)}, out, 1);
 #else
-  StoreVector(a, out, 0);
-  StoreVector(b, out, 1);
+  WriteVector<kStream>(a, out, 0);
+  WriteVector<kStream>(b, out, 1);
 #endif
 #endif
 }

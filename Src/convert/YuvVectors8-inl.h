@@ -36,6 +36,16 @@ HWY_INLINE U8 AsU8(V v) {
   return hn::BitCast(hn::ScalableTag<uint8_t>(), v);
 }
 
+// Into the cache, or past it where dst is aligned.
+template <bool kStream, class V>
+HWY_INLINE void WriteVector(V v, uint8_t* dst, size_t index) {
+  const hn::ScalableTag<uint8_t> d;
+  if constexpr (kStream)
+    hn::Stream(AsU8(v), d, dst + index * HWY_MAX_BYTES);
+  else
+    StoreVector(v, dst, index);
+}
+
 // The same pair of words, or dword, in all lanes.
 HWY_INLINE I16 WordPair(int low, int high) {
   return AsI16(hn::Set(hn::ScalableTag<uint32_t>(),

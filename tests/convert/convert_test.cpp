@@ -289,7 +289,7 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
     for (const F to : all) {
       F formats[9];
       int32_t count = 0;
-      const int32_t quality = turn % 3 + 1;
+      const int32_t quality = turn / 3 % 3 + 1;
       if (!Is420(from) && !Is420(to)) continue;
       if (VX_ExplainConversion(from, to, quality, formats, &count) != VX_Success) continue;
       if (Is420(from) && HasWideSamples(from) && !IsBiplanar(from)) continue;
