@@ -43,17 +43,14 @@ VX_PixelFormat WorkingFormat(VX_PixelFormat src, VX_PixelFormat dst) noexcept {
   return PlanDecode420(src, 0, 0, dst, 0, 0, 0).format;
 }
 
-// The 4:2:2 codes that a conversion reaches first and goes on from as it would with them for a source; else `Invalid`.
-VX_PixelFormat FirstPairs(VX_PixelFormat from, VX_PixelFormat to, int32_t quality) noexcept {
-  const auto pairs = Colorimetry(from) == 0 ? VX_PixelFormat::UYVY_422_8u : VX_PixelFormat::UYVY_422_8u_709;
-  Plan whole, rest;
-  if (MakePlan(from, to, quality, &whole) != VX_Success || whole.steps[0].to != pairs) return VX_PixelFormat::Invalid;
-  if (to == pairs) return pairs;
-  if (MakePlan(pairs, to, quality, &rest) != VX_Success || rest.stepCount != whole.stepCount - 1)
-    return VX_PixelFormat::Invalid;
-  for (int i = 0; i < rest.stepCount; ++i)
-    if (rest.steps[i].kernel != whole.steps[i + 1].kernel) return VX_PixelFormat::Invalid;
-  return pairs;
+// Whether a plan goes on from its first step as a conversion from there would.
+bool BeginsWithStep(const Plan& plan, VX_PixelFormat to, int32_t quality) noexcept {
+  if (plan.steps[0].to == to) return true;
+  Plan rest;
+  if (MakePlan(plan.steps[0].to, to, quality, &rest) != VX_Success || rest.stepCount != plan.stepCount - 1)
+    return false;
+  const auto isSame = [](const PlannedStep& a, const PlannedStep& b) { return a.kernel == b.kernel; };
+  return std::equal(rest.steps.begin(), rest.steps.begin() + rest.stepCount, plan.steps.begin() + 1, isSame);
 }
 
 VX_Result CheckPlanes(const Picture420& src, const void* dst) noexcept {
@@ -97,13 +94,11 @@ VX_Result Decode(const Picture420& src, const TopDown& dst, VX_PixelFormat worki
   if (!CanDecode420(src.format)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
   Rows420 rows;
-  const VX_PixelFormat pairs = FirstPairs(working, dst.format, quality);
-  if (pairs != VX_PixelFormat::Invalid &&
-      rows.Prepare(src, pairs, dst.width, dst.height, field, quality) == VX_Success) {
-    working = pairs;
-  } else if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) {
-    return result;
-  }
+  if (const VX_Result result = rows.Prepare(src, working, dst.width, dst.height, field, quality)) return result;
+  Plan plan;
+  if (working != dst.format && MakePlan(working, dst.format, quality, &plan) == VX_Success &&
+      BeginsWithStep(plan, dst.format, quality) && rows.TakeStep(plan.steps[0]))
+    working = plan.steps[0].to;
   RowConverter converter;
   const bool converts = working != dst.format;
   if (converts)

@@ -3,6 +3,7 @@
 
 #include "convert/Decode420Kernels.h"
 #include "convert/Planar420.h"
+#include "convert/Planner.h"
 #include "frame/KernelVariant.h"
 
 namespace vexel {
@@ -24,9 +25,7 @@ bool CanDecode420(VX_PixelFormat format) noexcept;
 void TraceFullSize420(const Picture420& src) noexcept;
 
 // Makes the rows of a decoded picture one at a time, top line first: the caller may hand each one on and needs no whole
-// frame between. It makes 8-bit BGR or video-range VUY with a fourth channel last, written opaque; and 8-bit UYVY with
-// the bytes that subsampling such VUY gives, but only of 8-bit lines with interpolated chroma, one by one, of the same
-// colorimetry and range.
+// frame between. It makes 8-bit BGR or video-range VUY with a fourth channel last, written opaque.
 //
 // A decoded row is the mean of one or more picture lines as the full-size decoder would show them before rounding, and
 // a reduced pixel the mean of its pixels in those lines. Lines: full size, the line itself. Half height, the line of
@@ -37,13 +36,16 @@ void TraceFullSize420(const Picture420& src) noexcept;
 // covers it (in field pictures the one of its own field).
 class Rows420 {
  public:
-  // Whether it makes the four channels of a format.
   static bool CanMake(VX_PixelFormat format) noexcept;
 
-  // Checks the sizes and chooses the kernels. VX_ErrUnsupportedConversion for sizes that are not reached and for UYVY
-  // that is not made; planes are not looked at. An empty size is legal where the rules reach it.
+  // Checks the sizes and chooses the kernels. VX_ErrUnsupportedConversion for sizes that are not reached; planes are
+  // not looked at. An empty size is legal where the rules reach it.
   VX_Result Prepare(const Picture420& src, VX_PixelFormat format, int32_t width, int32_t height, int32_t field,
                     int32_t quality, KernelVariant variant = ActiveKernelVariant()) noexcept;
+
+  // Takes over a step that a conversion of the rows begins with, if a kernel makes its bytes at once: the rows then
+  // have the step's format.
+  bool TakeStep(const PlannedStep& step) noexcept;
 
   // 64-byte-aligned memory is fastest; none is read before it is written.
   size_t ScratchBytes() const noexcept;
@@ -70,7 +72,8 @@ class Rows420 {
   };
 
   VX_Result ChooseLines(int32_t field, int32_t quality) noexcept;
-  bool ChooseKernels(VX_PixelFormat format) noexcept;
+  void ChooseKernels(VX_PixelFormat format) noexcept;
+  decode420::ByteChroma OwnChroma() const noexcept;
   size_t PlaceRows(uint8_t* scratch) noexcept;
 
   int32_t LineOf(int32_t row, int32_t index) const noexcept { return row * mAdvance + mFirstLine + index * mLineStep; }
@@ -98,7 +101,7 @@ class Rows420 {
   decode420::ResampleRow mResample = nullptr;
   decode420::MakePixels mMakePixels = nullptr;
   decode420::Matrix mMatrix{};
-  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false;
+  bool mHalfChroma = true, mLumaFromSource = true, mChromaFromSource = false, mKeepsCodes = false;
 
   // Scratch: averaged rows, resampled ones, a row or two on their way, sums, and what is being averaged.
   uint16_t *mY = nullptr, *mU = nullptr, *mV = nullptr;

@@ -76,8 +76,10 @@ struct PixelKernels {
 extern const PixelKernels kToBgrx, kToVuyx;
 
 // Of a picture's own bytes, chroma interpolated, codes kept but for rounding: the matrix must be kSameCodes.
+enum class ByteChroma : uint8_t { Planes, Pairs, SwappedPairs };  // (U, V), (V, U)
 struct ByteKernels {
-  KernelVariants<MakePixels> bytes, pairs, swappedPairs;
+  KernelVariants<MakePixels> kernels[3];
+  const KernelVariants<MakePixels>& operator[](ByteChroma chroma) const { return kernels[static_cast<int>(chroma)]; }
 };
 inline constexpr Matrix kSameCodes = {16384, 32, {{0, 8192}, {8192, 0}, {0, 0}}};
 extern const ByteKernels kToCodes;  // pixels of V, U and Y

@@ -13,17 +13,6 @@
 #include "convert/Pairs422-inl.h"
 #include "frame/KernelTable.h"
 
-#ifndef VEXEL_CONVERT_DECODE420PAIRKERNELS_CHROMA
-#define VEXEL_CONVERT_DECODE420PAIRKERNELS_CHROMA
-namespace vexel::decode420 {
-namespace {
-
-enum class ByteChroma : uint8_t { Planes, Pairs, SwappedPairs };
-
-}  // namespace
-}  // namespace vexel::decode420
-#endif
-
 #if HWY_TARGET != HWY_BASELINE_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::decode420 {
@@ -137,9 +126,9 @@ void ToUyvy(const PixelRow& row, const Matrix&) {
 }  // namespace
 }  // namespace plain
 
-const ByteKernels kToUyvy = {VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::Planes>),
-                             VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::Pairs>),
-                             VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::SwappedPairs>)};
+const ByteKernels kToUyvy = {{VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::Planes>),
+                              VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::Pairs>),
+                              VX_KERNEL_VARIANTS(ToUyvy<ByteChroma::SwappedPairs>)}};
 
 }  // namespace vexel::decode420
 #endif

@@ -632,8 +632,8 @@ void ToCodes(const PixelRow& row, const Matrix& matrix) {
 const PixelKernels kToBgrx = VX_PIXEL_KERNELS(ToBgrx);
 const PixelKernels kToVuyx = VX_PIXEL_KERNELS(ToVuyx);
 #undef VX_PIXEL_KERNELS
-const ByteKernels kToCodes = {VX_KERNEL_VARIANTS(ToCodes<MixedBytes>), VX_KERNEL_VARIANTS(ToCodes<MixedPairs>),
-                              VX_KERNEL_VARIANTS(ToCodes<MixedSwappedPairs>)};
+const ByteKernels kToCodes = {{VX_KERNEL_VARIANTS(ToCodes<MixedBytes>), VX_KERNEL_VARIANTS(ToCodes<MixedPairs>),
+                               VX_KERNEL_VARIANTS(ToCodes<MixedSwappedPairs>)}};
 
 }  // namespace vexel::decode420
 #endif

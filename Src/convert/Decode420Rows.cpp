@@ -1,6 +1,9 @@
 #include <algorithm>
 
 #include "convert/Decode420.h"
+#include "convert/Decode420Rgb512.h"
+#include "convert/Vbmi.h"
+#include "convert/YuvKernels.h"
 
 namespace vexel {
 
@@ -39,7 +42,8 @@ VX_Result Rows420::Prepare(const Picture420& src, VX_PixelFormat format, int32_t
   mLinear = quality >= 2;
   mVariant = variant;
   if (const VX_Result result = ChooseLines(field, quality)) return result;
-  return ChooseKernels(format) ? VX_Success : VX_ErrUnsupportedConversion;
+  ChooseKernels(format);
+  return VX_Success;
 }
 
 VX_Result Rows420::ChooseLines(int32_t field, int32_t quality) noexcept {
@@ -65,7 +69,7 @@ VX_Result Rows420::ChooseLines(int32_t field, int32_t quality) noexcept {
   return VX_Success;
 }
 
-bool Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
+void Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   const bool wide = HasWideSamples(mSrc.format), pairs = IsBiplanar(mSrc.format);
   mMixLuma = (wide ? kMixPlane10 : kMixPlane8)[mVariant];
   mMixChroma = (pairs ? wide ? kMixPairs10 : kMixPairs8 : wide ? kMixPlane10 : kMixPlane8)[mVariant];
@@ -81,21 +85,32 @@ bool Rows420::ChooseKernels(VX_PixelFormat format) noexcept {
   const PixelKernels& pixels = IsYuv(format) ? kToVuyx : kToBgrx;
   const OwnChromaKernels& own = mLinear ? pixels.mixed : pixels.nearest;
   mMatrix = MakeMatrix420(mSrc.format, format);
-  const bool keepsCodes = mChromaFromSource && mLinear && !wide && IsYuv(format) && mMatrix == kSameCodes;
-  const bool is422 = Layout(format) == kLayout422;
-  if (is422 && !keepsCodes) return false;
+  mKeepsCodes = mChromaFromSource && mLinear && !wide && IsYuv(format) && mMatrix == kSameCodes;
   const auto kernel = [&]() -> const KernelVariants<MakePixels>& {
     if (!mHalfChroma) return pixels.full;
     if (!mChromaFromSource) return mLinear ? pixels.wideLinear : pixels.wideNearest;
-    if (keepsCodes) {
-      const ByteKernels& codes = is422 ? kToUyvy : kToCodes;
-      return !pairs ? codes.bytes : IsReversed(mSrc.format) ? codes.swappedPairs : codes.pairs;
-    }
+    if (mKeepsCodes) return kToCodes[OwnChroma()];
     if (!pairs) return own.bytes;
     if (IsReversed(mSrc.format)) return wide ? own.swappedWidePairs : own.swappedPairs;
     return wide ? own.widePairs : own.pairs;
   };
   mMakePixels = kernel()[mVariant];
+}
+
+ByteChroma Rows420::OwnChroma() const noexcept {
+  if (!IsBiplanar(mSrc.format)) return ByteChroma::Planes;
+  return IsReversed(mSrc.format) ? ByteChroma::SwappedPairs : ByteChroma::Pairs;
+}
+
+bool Rows420::TakeStep(const PlannedStep& step) noexcept {
+  if (!mKeepsCodes) return false;
+  const bool to601 = step.kernel == &kVuyx8ToBgrx8_601, to709 = step.kernel == &kVuyx8ToBgrx8_709;
+  if (step.kernel == &kVuyx8ToUyvy8)
+    mMakePixels = kToUyvy[OwnChroma()][mVariant];
+  else if ((to601 || to709) && mVariant == KernelVariant::Avx512 && HasVbmi())
+    mMakePixels = CodesToBgrx512(OwnChroma(), to709);
+  else
+    return false;
   return true;
 }
 
