@@ -5,7 +5,7 @@
 #include <cstring>
 #include <xmmintrin.h>
 
-#include "convert/StagedRows.h"
+#include "convert/StreamedRows.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
@@ -54,15 +54,18 @@ const float* CanonLog3ToDisplay() {
 }
 
 // Byte-swapping a whole pixel A R G B also reverses its samples.
-template <bool kSwap>
+template <bool kSwap, bool kStream>
 void CanonLog3Row(const float* table, const uint8_t* src, uint8_t* dst, size_t count) {
   for (size_t i = 0; i < count; ++i, src += 8, dst += 16) {
     uint64_t pixel;
     std::memcpy(&pixel, src, sizeof pixel);
     if (kSwap) pixel = __builtin_bswap64(pixel);
     const auto sample = [&](int shift) { return table[pixel >> shift & 0xFFFF]; };
-    const float bgrx[4] = {sample(kSwap ? 0 : 48), sample(kSwap ? 16 : 32), sample(kSwap ? 32 : 16), 1.0f};
-    std::memcpy(dst, bgrx, sizeof bgrx);
+    const __m128 bgrx = _mm_setr_ps(sample(kSwap ? 0 : 48), sample(kSwap ? 16 : 32), sample(kSwap ? 32 : 16), 1.0f);
+    if (kStream)
+      _mm_stream_ps(reinterpret_cast<float*>(dst), bgrx);
+    else
+      _mm_storeu_ps(reinterpret_cast<float*>(dst), bgrx);
   }
 }
 
@@ -76,9 +79,11 @@ VX_Result VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(const void* s
                                                                    uint8_t bigEndian) noexcept {
   if (width < 1 || height < 1) return VX_Success;
   const float* table = CanonLog3ToDisplay();
-  const auto convert = bigEndian ? CanonLog3Row<true> : CanonLog3Row<false>;
-  ConvertStaged(SourceRows(src, srcRowBytes, 8), DestinationRows(dst, dstRowBytes, 16), static_cast<size_t>(width),
-                height, ActiveKernelVariant(),
-                [=](const uint8_t* from, uint8_t* to, size_t count) { convert(table, from, to, count); });
+  const auto store = bigEndian ? CanonLog3Row<true, false> : CanonLog3Row<false, false>;
+  const auto stream = bigEndian ? CanonLog3Row<true, true> : CanonLog3Row<false, true>;
+  ConvertRows(
+      SourceRows(src, srcRowBytes, 8), DestinationRows(dst, dstRowBytes, 16), static_cast<size_t>(width), height,
+      [=](const uint8_t* from, uint8_t* to, size_t count) { store(table, from, to, count); },
+      [=](const uint8_t* from, uint8_t* to, size_t count) { stream(table, from, to, count); });
   return VX_Success;
 }

@@ -5,7 +5,7 @@
 #include <cstring>
 
 #include "convert/PackerKernels.h"
-#include "convert/StagedRows.h"
+#include "convert/StreamedRows.h"
 #include "frame/FpModeGuard.h"
 #include "vexel/vexel.h"
 
@@ -20,10 +20,10 @@ void ConvertInPlace(Function convert, void* base, ptrdiff_t rowBytes, size_t cou
 
 constexpr size_t AtLeast0(int32_t n) { return static_cast<size_t>(std::max(n, 0)); }
 
-VX_Result ConvertPixels(const RowKernelSet& kernels, const SourceRows& src, const DestinationRows& dst, int32_t width,
+VX_Result ConvertPixels(const PackerKernels& kernels, const SourceRows& src, const DestinationRows& dst, int32_t width,
                         int32_t height) {
   const KernelVariant variant = ActiveKernelVariant();
-  ConvertStaged(src, dst, AtLeast0(width), height, variant, kernels[variant]);
+  ConvertRows(src, dst, AtLeast0(width), height, kernels.stored[variant], kernels.streamed[variant]);
   return VX_Success;
 }
 
@@ -72,15 +72,15 @@ VX_Result VX_ConvertUYVY_422_10uToV210_422_10u(const void* src, int32_t srcRowBy
   const SourceRows from(src, srcRowBytes, kUyvy16GroupBytes);
   const DestinationRows to(dst, dstRowBytes, kV210GroupBytes);
   const size_t groups = AtLeast0(width) / kV210GroupPixels, rest = AtLeast0(width) % kV210GroupPixels;
-  ConvertStaged(from, to, groups, height, variant, kUyvy10ToV210[variant]);
+  ConvertRows(from, to, groups, height, kUyvy10ToV210.stored[variant], kUyvy10ToV210.streamed[variant]);
 
   const auto neededBytes = static_cast<int64_t>((groups + 1) * kV210GroupBytes);
   if (rest == 0 || neededBytes > std::abs(int64_t{dstRowBytes})) return VX_Success;
   for (int32_t row = 0; row < height; ++row) {
     uint16_t group[] = {512, 64, 512, 64, 512, 64, 512, 64, 512, 64, 512, 64};
     std::memcpy(group, from.base + row * from.rowBytes + groups * kUyvy16GroupBytes, rest * 4);
-    kUyvy10ToV210[variant](reinterpret_cast<const uint8_t*>(group),
-                           to.base + row * to.rowBytes + groups * kV210GroupBytes, 1);
+    kUyvy10ToV210.stored[variant](reinterpret_cast<const uint8_t*>(group),
+                                  to.base + row * to.rowBytes + groups * kV210GroupBytes, 1);
   }
   return VX_Success;
 }
@@ -91,12 +91,12 @@ VX_Result VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(const void* src, int32_t
   const SourceRows from(src, srcRowBytes, kV210GroupBytes);
   const DestinationRows to(dst, dstRowBytes, kUyvy16GroupBytes);
   const size_t groups = AtLeast0(width) / kV210GroupPixels, rest = AtLeast0(width) % kV210GroupPixels;
-  ConvertStaged(from, to, groups, height, variant, kV210ToUyvy10[variant]);
+  ConvertRows(from, to, groups, height, kV210ToUyvy10.stored[variant], kV210ToUyvy10.streamed[variant]);
 
   if (rest == 0) return VX_Success;
   for (int32_t row = 0; row < height; ++row) {
     uint8_t group[kUyvy16GroupBytes];
-    kV210ToUyvy10[variant](from.base + row * from.rowBytes + groups * kV210GroupBytes, group, 1);
+    kV210ToUyvy10.stored[variant](from.base + row * from.rowBytes + groups * kV210GroupBytes, group, 1);
     std::memcpy(to.base + row * to.rowBytes + groups * kUyvy16GroupBytes, group, rest * 4);
   }
   return VX_Success;
@@ -104,7 +104,7 @@ VX_Result VX_Convert_j2k_V210_To_10_Bits_Within_UYVY16u(const void* src, int32_t
 
 VX_Result VX_Convert_RGB_444_10u_To_DNxHD16u(const void* src, int32_t srcRowBytes, void* dst, int32_t width,
                                              int32_t height) noexcept {
-  // Not ConvertStaged, which would stream whole pixels: each fourth sample stays as it is.
+  // Not ConvertRows, which would stream whole pixels: each fourth sample stays as it is.
   const RowKernel convert = kRgb10ToDnxhd16[ActiveKernelVariant()];
   const size_t pixels = AtLeast0(width);
   for (int32_t row = 0; row < height; ++row)

@@ -15,6 +15,7 @@
 #include "frame/KernelTable.h"
 #include "frame/PixelBlock-inl.h"
 #include "frame/RowLoop-inl.h"
+#include "frame/StreamStore-inl.h"
 
 #ifndef VEXEL_CONVERT_PACKERKERNELS_ONCE
 #define VEXEL_CONVERT_PACKERKERNELS_ONCE
@@ -139,59 +140,36 @@ HWY_INLINE V MultiplyPairs(V a, V b) {
   if constexpr (sizeof(V) == 16) return V{_mm_madd_epi16(a.raw, b.raw)};
 }
 
-#if HWY_TARGET == HWY_AVX3
-// Four groups at once: the first, second and third samples of their words, spread to 32 bits.
-void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  const auto every = hn::Mul(hn::Iota(hn::Full512<uint32_t>(), 0), hn::Set(hn::Full512<uint32_t>(), 3)).raw;
-  // Samples 0 to 31 and 16 to 47, so that nothing beyond the groups is read.
-  const auto inUpper = _mm512_cmpgt_epu32_mask(every, _mm512_set1_epi32(29));
-  const auto indices = _mm512_mask_add_epi32(every, inUpper, every, _mm512_set1_epi32(16));
-  RowLoop<4, kUyvy16GroupBytes, kV210GroupBytes>(
-      src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
-        const auto lower = _mm512_loadu_si512(in), upper = _mm512_loadu_si512(in + 32);
-        const auto sample = [&](int k) HWY_ATTR {
-          const auto from = _mm512_add_epi32(indices, _mm512_set1_epi32(k));
-          return _mm512_maskz_permutex2var_epi16(0x55555555, lower, from, upper);
-        };
-        const auto words = _mm512_or_si512(_mm512_or_si512(sample(0), _mm512_slli_epi32(sample(1), 10)),
-                                           _mm512_slli_epi32(sample(2), 20));
-        _mm512_storeu_si512(out, words);
-      });
-}
-#else
-// Of each word the first and third samples side by side, out of samples 0 to 7 and 4 to 11, and the second with a
-// neighbour that a product with zero drops.
-void Uyvy10ToV210(const uint8_t* src, uint8_t* dst, size_t count) {
-  alignas(16) static constexpr uint8_t kOuterLower[16] = {0, 1, 4, 5, 6, 7, 10, 11, 12, 13, Z, Z, Z, Z, Z, Z};
-  alignas(16) static constexpr uint8_t kOuterUpper[16] = {Z, Z, Z, Z, Z, Z, Z, Z, Z, Z, 8, 9, 10, 11, 14, 15};
-  constexpr int kMiddle = 0xD8;  // words 0 and 2 of the lower samples, 1 and 3 of the upper
+// Of two words each, out of samples 0 to 7 and 4 to 11: the first and third samples side by side, then the second ones
+// a byte up in 32 bits.
+template <bool kStream>
+HWY_INLINE void PackV210(const uint8_t* src, uint8_t* dst, size_t count) {
+  alignas(16) static constexpr uint8_t kLower[16] = {0, 1, 4, 5, 6, 7, 10, 11, Z, 2, 3, Z, Z, 8, 9, Z};
+  alignas(16) static constexpr uint8_t kUpper[16] = {4, 5, 8, 9, 10, 11, 14, 15, Z, 6, 7, Z, Z, 12, 13, Z};
   const DG8 d8;
   const DG16 d16;
   const hn::Repartition<uint32_t, DG8> d32;
   const hn::Repartition<uint64_t, DG8> d64;
-  const auto outerLower = hn::LoadDup128(d8, kOuterLower), outerUpper = hn::LoadDup128(d8, kOuterUpper);
+  const auto fromLower = hn::LoadDup128(d8, kLower), fromUpper = hn::LoadDup128(d8, kUpper);
   const auto thirdUp = hn::BitCast(d16, hn::Set(d32, 0x100001));
-  const auto secondUp = hn::BitCast(d32, hn::Set(d64, uint64_t{1024} << 32 | 1024 << 16));
   RowLoop<4, kUyvy16GroupBytes, kV210GroupBytes>(
       src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
         HWY_UNROLL(4)
         for (size_t i = 0; i < 4; i += kGroups, in += kGroups * kUyvy16GroupBytes, out += kGroups * kV210GroupBytes) {
-          const auto lower = LoadBlocks(in, in + kUyvy16GroupBytes);
-          const auto upper = LoadBlocks(in + 8, in + kUyvy16GroupBytes + 8);
-          const auto outer = hn::Or(hn::TableLookupBytes(lower, outerLower), hn::TableLookupBytes(upper, outerUpper));
-          const auto middle = PickWords<kMiddle>(hn::BitCast(d32, lower), hn::BitCast(d32, upper));
-          // The product is signed.
-          const auto second = hn::And(MultiplyPairs(middle, secondUp), hn::Set(d32, 0x03FFFFFF));
-          const auto others = hn::BitCast(d32, hn::Mul(hn::BitCast(d16, outer), thirdUp));
-          hn::StoreU(hn::BitCast(d8, hn::Or(others, second)), d8, out);
+          const auto lower = hn::TableLookupBytes(LoadBlocks(in, in + kUyvy16GroupBytes), fromLower);
+          const auto upper = hn::TableLookupBytes(LoadBlocks(in + 8, in + kUyvy16GroupBytes + 8), fromUpper);
+          const auto l = hn::BitCast(d64, lower), u = hn::BitCast(d64, upper);
+          const auto outer = hn::BitCast(d16, hn::InterleaveLower(d64, l, u));
+          const auto second = hn::BitCast(d32, hn::InterleaveUpper(d64, l, u));
+          StoreBytes<kStream>(hn::Or(hn::ShiftLeft<2>(second), hn::BitCast(d32, hn::Mul(outer, thirdUp))), out);
         }
       });
 }
-#endif
 
 #if HWY_TARGET == HWY_AVX3
 // Four groups at once: the first two samples of each word side by side, the third in a vector of its own.
-void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void UnpackV210(const uint8_t* src, uint8_t* dst, size_t count) {
   struct Indices {
     alignas(64) uint16_t from[64] = {};
     constexpr Indices() {
@@ -208,13 +186,21 @@ void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
         const auto part = [&](auto moved, uint32_t mask) HWY_ATTR { return hn::And(moved, hn::Set(d, mask)); };
         const auto two = hn::Or(part(words, 0x3FF), part(hn::ShiftLeft<6>(words), 0x3FF0000)).raw;
         const auto third = part(hn::ShiftRight<20>(words), 0x3FF).raw;
-        _mm512_storeu_si512(out, _mm512_permutex2var_epi16(two, lowerFrom, third));
-        _mm256_storeu_si256(reinterpret_cast<__m256i*>(out + 64),
-                            _mm512_castsi512_si256(_mm512_permutex2var_epi16(two, upperFrom, third)));
+        const hn::Vec512<uint16_t> lower{_mm512_permutex2var_epi16(two, lowerFrom, third)};
+        const hn::Vec512<uint16_t> upper{_mm512_permutex2var_epi16(two, upperFrom, third)};
+        const hn::Full256<uint16_t> dHalf;
+        if constexpr (kStream) {  // every other block starts in the middle of a line
+          StoreBytes<true>(hn::LowerHalf(dHalf, lower), out);
+          StoreBytes<true>(hn::UpperHalf(dHalf, lower), out + 32);
+        } else {
+          StoreBytes<false>(lower, out);
+        }
+        StoreBytes<kStream>(hn::LowerHalf(dHalf, upper), out + 64);
       });
 }
 #else
-void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void UnpackV210(const uint8_t* src, uint8_t* dst, size_t count) {
   RowLoop<4, kV210GroupBytes, kUyvy16GroupBytes>(
       src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
         const DG8 d8;
@@ -223,7 +209,7 @@ void V210ToUyvy10(const uint8_t* src, uint8_t* dst, size_t count) {
         for (size_t p = 0; p < kPieces; p += kGroups) {
           const auto bytes = LoadBlocks(in + PieceStart(p), in + PieceStart(p + 1));
           const auto v = hn::BitCast(d, hn::TableLookupBytes(bytes, hn::Load(d8, kUnpack.bytes[p])));
-          hn::StoreU(hn::BitCast(d8, hn::ShiftRight<6>(hn::Mul(v, hn::Load(d, kUnpack.factors[p])))), d8, out + 16 * p);
+          StoreBytes<kStream>(hn::ShiftRight<6>(hn::Mul(v, hn::Load(d, kUnpack.factors[p]))), out + 16 * p);
         }
       });
 }
@@ -293,24 +279,25 @@ void Rgb10ToDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
 #endif
 
 // Words of the top ten bits of the first three samples of each pixel.
-template <class V>
+template <bool kStream, class V>
 HWY_INLINE void StoreWords(V lower, V upper, uint8_t* HWY_RESTRICT to) {
   const hn::Repartition<uint16_t, hn::DFromV<V>> d16;
   const hn::Repartition<uint32_t, hn::DFromV<V>> d;
   const auto l = hn::BitCast(d, lower), u = hn::BitCast(d, upper);
   const auto two = hn::BitCast(d, hn::ShiftRight<6>(hn::BitCast(d16, hn::ConcatEven(d, u, l))));
   const auto third = hn::And(hn::ShiftLeft<16>(hn::ConcatOdd(d, u, l)), hn::Set(d, uint32_t{kTopTen} << 16));
-  hn::StoreU(hn::Or(MultiplyPairs(two, hn::Set(d, 4096 << 16 | 4)), third), d, reinterpret_cast<uint32_t*>(to));
+  StoreBytes<kStream>(hn::Or(MultiplyPairs(two, hn::Set(d, 4096 << 16 | 4)), third), to);
 }
 
-void Dnxhd16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void PackDnxhd16(const uint8_t* src, uint8_t* dst, size_t count) {
   const hn::ScalableTag<uint64_t> d;
   constexpr size_t kBlock = HWY_MAX_BYTES < 32 ? 8 : HWY_MAX_BYTES / 4;
   RowLoop<kBlock, 8, 4>(src, dst, count, [&](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
     const auto pixels = [&](size_t at) HWY_ATTR { return hn::LoadU(d, reinterpret_cast<const uint64_t*>(in + at)); };
     HWY_UNROLL(2)
     for (size_t at = 0; at < 8 * kBlock; at += 2 * HWY_MAX_BYTES)
-      StoreWords(pixels(at), pixels(at + HWY_MAX_BYTES), out + at / 2);
+      StoreWords<kStream>(pixels(at), pixels(at + HWY_MAX_BYTES), out + at / 2);
   });
 }
 
@@ -325,17 +312,19 @@ HWY_INLINE void SpreadTwelves(const uint8_t* HWY_RESTRICT in, const uint8_t* tab
   each(3, Shuffle(v3, table));
 }
 
-void Bgr16ToRgb10(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void PackBgr16(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kToRgb[16] = {4, 5, 2, 3, 0, 1, Z, Z, 10, 11, 8, 9, 6, 7, Z, Z};
   RowLoop<8, 6, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
     V64 pixels[4];
     SpreadTwelves(in, kToRgb, [&](int i, V8 v) HWY_ATTR { pixels[i] = hn::BitCast(D64(), v); });
-    StoreWords(pixels[0], pixels[1], out);
-    StoreWords(pixels[2], pixels[3], out + 16);
+    StoreWords<kStream>(pixels[0], pixels[1], out);
+    StoreWords<kStream>(pixels[2], pixels[3], out + 16);
   });
 }
 
-void Rgb10ToBgr10In16(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void UnpackBgr16(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kClose[16] = {0, 1, 2, 3, 4, 5, 8, 9, 10, 11, 12, 13, Z, Z, Z, Z};
   RowLoop<8, 4, 6>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
     const D8 d8;
@@ -346,32 +335,46 @@ void Rgb10ToBgr10In16(const uint8_t* src, uint8_t* dst, size_t count) {
       return Shuffle(hn::BitCast(d8, v), kClose);
     };
     const auto a = twelve(0), b = twelve(8), c = twelve(16), e = twelve(24);
-    const auto store = [&](V8 v, size_t at) HWY_ATTR { hn::StoreU(v, d8, out + at); };
+    const auto store = [&](V8 v, size_t at) HWY_ATTR { StoreBytes<kStream>(v, out + at); };
     store(hn::Or(a, hn::ShiftLeftBytes<12>(d8, b)), 0);
     store(hn::Or(hn::ShiftRightBytes<4>(d8, b), hn::ShiftLeftBytes<8>(d8, c)), 16);
     store(hn::Or(hn::ShiftRightBytes<8>(d8, c), hn::ShiftLeftBytes<4>(d8, e)), 32);
   });
 }
 
-void Rgb8ToBgra8(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void AddAlpha8(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kToBgr[16] = {2, 1, 0, Z, 5, 4, 3, Z, 8, 7, 6, Z, 11, 10, 9, Z};
   RowLoop<16, 3, 4>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
     const auto alpha = hn::BitCast(D8(), hn::Set(D32(), 0xFF000000));
-    SpreadTwelves(in, kToBgr, [&](int i, V8 v) HWY_ATTR { hn::StoreU(hn::Or(v, alpha), D8(), out + 16 * i); });
+    SpreadTwelves(in, kToBgr, [&](int i, V8 v) HWY_ATTR { StoreBytes<kStream>(hn::Or(v, alpha), out + 16 * i); });
   });
 }
 
-void Rgb16ToXrgb15(const uint8_t* src, uint8_t* dst, size_t count) {
+template <bool kStream>
+HWY_INLINE void AddX15(const uint8_t* src, uint8_t* dst, size_t count) {
   alignas(16) static constexpr uint8_t kAfterX[16] = {Z, Z, 0, 1, 2, 3, 4, 5, Z, Z, 6, 7, 8, 9, 10, 11};
   RowLoop<8, 6, 8>(src, dst, count, [](const uint8_t* HWY_RESTRICT in, uint8_t* HWY_RESTRICT out) HWY_ATTR {
     const D16 d;
     const auto x = hn::BitCast(d, hn::Set(D64(), 32768));
     SpreadTwelves(in, kAfterX, [&](int i, V8 v) HWY_ATTR {
       const auto half = hn::AverageRound(hn::BitCast(d, v), hn::Zero(d));
-      hn::StoreU(hn::Or(half, x), d, reinterpret_cast<uint16_t*>(out + 16 * i));
+      StoreBytes<kStream>(hn::Or(half, x), out + 16 * i);
     });
   });
 }
+
+#define VX_PACKER(name, Body)                                                                 \
+  void name(const uint8_t* src, uint8_t* dst, size_t count) { Body<false>(src, dst, count); } \
+  void Stream##name(const uint8_t* src, uint8_t* dst, size_t count) { Body<true>(src, dst, count); }
+VX_PACKER(Uyvy10ToV210, PackV210)
+VX_PACKER(V210ToUyvy10, UnpackV210)
+VX_PACKER(Dnxhd16ToRgb10, PackDnxhd16)
+VX_PACKER(Bgr16ToRgb10, PackBgr16)
+VX_PACKER(Rgb10ToBgr10In16, UnpackBgr16)
+VX_PACKER(Rgb8ToBgra8, AddAlpha8)
+VX_PACKER(Rgb16ToXrgb15, AddX15)
+#undef VX_PACKER
 
 // (s + 0.5) * 65535 / 32768 truncated is 2 s up to 32767, also in floats, whose error is far below what is cut off;
 // from 32768 on it is above 65535.
@@ -658,14 +661,22 @@ void OffsetChroma32f(uint8_t* row, size_t count, float offset) {
 }  // namespace
 }  // namespace plain
 
-const RowKernelSet kUyvy10ToV210 = VX_KERNEL_VARIANTS(Uyvy10ToV210);
-const RowKernelSet kV210ToUyvy10 = VX_KERNEL_VARIANTS(V210ToUyvy10);
+#define VX_PACKER(name)                                                                                           \
+  {                                                                                                               \
+    VX_KERNEL_VARIANTS(name), {                                                                                   \
+      &plain::name, HWY_CHOOSE_SSSE3(Stream##name), HWY_CHOOSE_SSE4(Stream##name), HWY_CHOOSE_AVX2(Stream##name), \
+          HWY_CHOOSE_AVX3(Stream##name)                                                                           \
+    }                                                                                                             \
+  }
+const PackerKernels kUyvy10ToV210 = VX_PACKER(Uyvy10ToV210);
+const PackerKernels kV210ToUyvy10 = VX_PACKER(V210ToUyvy10);
+const PackerKernels kDnxhd16ToRgb10 = VX_PACKER(Dnxhd16ToRgb10);
+const PackerKernels kBgr16ToRgb10 = VX_PACKER(Bgr16ToRgb10);
+const PackerKernels kRgb10ToBgr10In16 = VX_PACKER(Rgb10ToBgr10In16);
+const PackerKernels kRgb8ToBgra8 = VX_PACKER(Rgb8ToBgra8);
+const PackerKernels kRgb16ToXrgb15 = VX_PACKER(Rgb16ToXrgb15);
+#undef VX_PACKER
 const RowKernelSet kRgb10ToDnxhd16 = VX_KERNEL_VARIANTS(Rgb10ToDnxhd16);
-const RowKernelSet kDnxhd16ToRgb10 = VX_KERNEL_VARIANTS(Dnxhd16ToRgb10);
-const RowKernelSet kBgr16ToRgb10 = VX_KERNEL_VARIANTS(Bgr16ToRgb10);
-const RowKernelSet kRgb10ToBgr10In16 = VX_KERNEL_VARIANTS(Rgb10ToBgr10In16);
-const RowKernelSet kRgb8ToBgra8 = VX_KERNEL_VARIANTS(Rgb8ToBgra8);
-const RowKernelSet kRgb16ToXrgb15 = VX_KERNEL_VARIANTS(Rgb16ToXrgb15);
 const InPlaceKernelSet kScale15To16 = VX_KERNEL_VARIANTS(Scale15To16);
 const InPlaceKernelSet kScale15To16BigEndian = VX_KERNEL_VARIANTS(Scale15To16BigEndian);
 const InPlaceKernelSet kSwapBytes32 = VX_KERNEL_VARIANTS(SwapBytes32);

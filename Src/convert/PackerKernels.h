@@ -12,17 +12,26 @@ inline constexpr size_t kV210GroupPixels = 6;
 inline constexpr size_t kV210GroupBytes = 16;
 inline constexpr size_t kUyvy16GroupBytes = 24;
 
+// A kernel, and the same past the cache: for a destination at a line's start and a multiple of kStreamUnits units, to
+// be followed by StreamFence.
+struct PackerKernels {
+  RowKernelSet stored, streamed;
+};
+inline constexpr size_t kStreamUnits = 32;
+
 // In groups of 6 pixels. Samples beyond 10 bits run into their neighbours when packing.
-extern const RowKernelSet kUyvy10ToV210;
-extern const RowKernelSet kV210ToUyvy10;
+extern const PackerKernels kUyvy10ToV210;
+extern const PackerKernels kV210ToUyvy10;
+
+// In pixels.
+extern const PackerKernels kDnxhd16ToRgb10;
+extern const PackerKernels kBgr16ToRgb10;
+extern const PackerKernels kRgb10ToBgr10In16;
+extern const PackerKernels kRgb8ToBgra8;
+extern const PackerKernels kRgb16ToXrgb15;
 
 // In pixels. The fourth DNxHD sample keeps its value.
 extern const RowKernelSet kRgb10ToDnxhd16;
-extern const RowKernelSet kDnxhd16ToRgb10;
-extern const RowKernelSet kBgr16ToRgb10;
-extern const RowKernelSet kRgb10ToBgr10In16;
-extern const RowKernelSet kRgb8ToBgra8;
-extern const RowKernelSet kRgb16ToXrgb15;
 
 // `count` samples, words or pixels, read once and written back.
 using InPlaceKernel = void (*)(uint8_t* row, size_t count);

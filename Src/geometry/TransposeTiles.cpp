@@ -8,6 +8,7 @@
 #include <hwy/highway.h>
 
 #include "frame/KernelTable.h"
+#include "frame/StreamStore-inl.h"
 
 #if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
@@ -55,15 +56,6 @@ HWY_INLINE void TransposeBlocks(V (&a)[n]) {
   }
 }
 
-template <bool kStream, class V>
-HWY_INLINE void StorePiece(V v, uint8_t* dst) {
-  const hn::Repartition<uint8_t, hn::DFromV<V>> d8;
-  if constexpr (kStream)
-    hn::Stream(hn::BitCast(d8, v), d8, dst);
-  else
-    hn::StoreU(hn::BitCast(d8, v), d8, dst);
-}
-
 // Transposes 16 bytes of each row of a tile into lines, one for each element.
 template <class T, int kSize, bool kStream>
 HWY_INLINE void ColumnLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
@@ -78,7 +70,7 @@ HWY_INLINE void ColumnLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* 
   }
   HWY_UNROLL(16)
   for (int i = 0; i < n; ++i) HWY_UNROLL(4)
-  for (int v = 0; v < kVectors; ++v) StorePiece<kStream>(lines[v][i], dst + i * dstRowBytes + v * HWY_MAX_BYTES);
+  for (int v = 0; v < kVectors; ++v) StoreBytes<kStream>(lines[v][i], dst + i * dstRowBytes + v * HWY_MAX_BYTES);
 }
 
 // 16 bytes of each row of tiles that stand one below the other. Each destination row gets their lines in turn.
@@ -137,7 +129,7 @@ HWY_INLINE void WholeLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* d
   }
   HWY_UNROLL(4)
   for (int b = 0; b < 4; ++b) HWY_UNROLL(4)
-  for (int i = 0; i < n; ++i) StorePiece<kStream>(lines[b][i], dst + (b * n + i) * dstRowBytes);
+  for (int i = 0; i < n; ++i) StoreBytes<kStream>(lines[b][i], dst + (b * n + i) * dstRowBytes);
 }
 #endif
 
@@ -248,7 +240,7 @@ HWY_INLINE void ReverseRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRIC
       __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(end) - kAhead + i));
     HWY_UNROLL(16)
     for (size_t i = 0; i < kBlock; i += HWY_MAX_BYTES)
-      StorePiece<kStream>(ReverseElements<kSize>(hn::LoadU(d, end + kBlock - HWY_MAX_BYTES - i)), dst + i);
+      StoreBytes<kStream>(ReverseElements<kSize>(hn::LoadU(d, end + kBlock - HWY_MAX_BYTES - i)), dst + i);
   }
   reverseSingly(static_cast<size_t>(end - src) / kSize);
 }

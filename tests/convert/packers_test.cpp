@@ -134,12 +134,12 @@ constexpr Packer kPackers[] = {
 };
 
 // Every pixel, and nothing else.
-void ExpectPacked(const Packer& packer, int width, int height, int padding, bool upsideDown) {
+void ExpectPacked(const Packer& packer, int width, int height, int padding, bool upsideDown, size_t offset = 3) {
   const bool tightSource = packer.tight == Tight::Source, tightDestination = packer.tight == Tight::Destination;
   Rows src(static_cast<size_t>(packer.SourceRow(width)), height, tightSource ? 0 : padding, upsideDown && !tightSource,
            1);
   Rows dst(static_cast<size_t>(packer.DestinationRow(width)), height, tightDestination ? 0 : 3 * padding,
-           !upsideDown && !tightDestination, 2);
+           !upsideDown && !tightDestination, 2, offset);
   Rows expected = dst;
   const auto run = [&](int w, int h) { packer.run(src.base(), src.rowBytes, dst.base(), dst.rowBytes, w, h); };
   run(width, height);
@@ -150,23 +150,28 @@ void ExpectPacked(const Packer& packer, int width, int height, int padding, bool
   ASSERT_TRUE(dst.memory == expected.memory) << packer.name << " of nothing";
 }
 
-// Past the cache, rows are staged in pieces.
+// Past the cache, whole lines of rows are streamed, wherever in a line they start; not where no pixel starts one.
 TEST(Packers, EachPixelAtAnySizeAndStrideAndNothingElse) {
   for (const Packer& packer : kPackers) {
     if (packer.expected == nullptr) continue;
     for (const int width : kSizes)
       for (const bool upsideDown : {false, true}) ExpectPacked(packer, width, 1 + width % 4, 3, upsideDown);
-    ExpectPacked(packer, static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37), 8, 0, true);
-    ExpectPacked(packer, static_cast<int>(VX_GetCacheSize() / 16 / 4 + 37), 8, 1, false);
+    const testing::SmallCache small;
+    for (const int width : {1, 5, 32, 331, 1057})
+      for (const size_t offset : {0, 3, 8, 48})
+        for (const bool upsideDown : {false, true}) ExpectPacked(packer, width, 5, 8, upsideDown, offset);
   }
 }
 
 TEST(Packers, V210OfUyvyWithItsTail) {
-  for (const int width : {1, 2, 5, 6, 7, 8, 12, 13, 47, 48, 53})
+  for (const int width : {1, 2, 5, 6, 7, 8, 12, 13, 47, 48, 53, 600, 601})
     for (const int room : {0, 16}) {
       const int groups = width / 6, height = 3;
       const size_t dstBytes = static_cast<size_t>(groups) * 16 + static_cast<size_t>(room);
-      Rows src(static_cast<size_t>(width) * 4, height, 6, true, 1), dst(dstBytes, height, 3, width % 2 != 0, 2);
+      const bool stream = width >= 48;
+      const testing::SmallCache cache(stream ? 1024 : VX_GetCacheSize());
+      Rows src(static_cast<size_t>(width) * 4, height, 6, true, 1);
+      Rows dst(dstBytes, height, stream ? 0 : 3, width % 2 != 0, 2, stream ? 16 : 3);
       Rows expected = dst;
       VX_ConvertUYVY_422_10uToV210_422_10u(src.base(), src.rowBytes, dst.base(), dst.rowBytes, width, height);
       const int words = 4 * (width % 6 != 0 && room ? groups + 1 : groups);
@@ -228,6 +233,7 @@ double CanonLight(double x) {
 
 TEST(Packers, CanonLog3OfEveryCode) {
   for (const bool bigEndian : {false, true}) {
+    const testing::SmallCache cache(bigEndian ? 1024 : VX_GetCacheSize());
     const auto stored = [&](size_t s) { return static_cast<uint16_t>(bigEndian ? s << 8 | s >> 8 : s); };
     Samples src(4 * 65536);
     for (size_t s = 0; s < 65536; ++s)
