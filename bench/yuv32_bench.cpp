@@ -1,15 +1,18 @@
 // Row kernels of float Y'CbCr and V210 beside zimg and swscale, which work on planes: the same picture and depths, with
-// no alpha. "vexel" goes in blocks of 384 pixels, or rows where a kernel looks at its neighbours, through the cache and
-// past it to the destination, the way large pictures are converted; "vexel ordinary stores" writes to the destination
-// directly. The cases named "row" stay in the cache.
+// no alpha. "vexel" writes the way VX_Convert does at that size, and the other way has a name of its own: "vexel
+// ordinary stores" writes rows to the destination directly, "vexel streamed" goes through the cache and past it in the
+// blocks of VX_Convert. The cases named "row" stay in the cache.
+#include <algorithm>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "convert/RowConverter.h"
 #include "convert/YuvKernels.h"
 #include "frame/FpModeGuard.h"
 #include "frame/StreamCopy.h"
 #include "support/Bench.h"
+#include "vexel/vexel.h"
 
 #ifdef VEXEL_PEER_ZIMG
 #include <zimg.h>
@@ -163,8 +166,9 @@ void AddSwscale(BenchCase& report, Size size, const char* name, int flags) {
 
 void AddCase(const Case& c, Size size) {
   const size_t srcRow = RowBytes(c.srcBits, size.width), dstRow = RowBytes(c.dstBits, size.width);
+  const size_t block = c.needsRow ? vexel::kStreamBlock : vexel::kChainBlock, reach = c.needsRow ? vexel::kReach : 0;
   const auto src = std::make_shared<Memory>(srcRow * size.height), dst = std::make_shared<Memory>(dstRow * size.height),
-             scratch = std::make_shared<Memory>(dstRow);
+             scratch = std::make_shared<Memory>(RowBytes(c.dstBits, block + 2 * reach));
   if (c.isFloatSource)
     src->FillFloats();
   else
@@ -172,27 +176,25 @@ void AddCase(const Case& c, Size size) {
   BenchCase report(std::string(c.name) + " " + size.name, size.width * size.height);
   const KernelVariant variant = vexel::ActiveKernelVariant();
   const auto kernel = (*c.kernels)[variant];
-  const auto direct = [=] {
+  const bool streams = VX_GetCacheSize() != 0 && src->size() + dst->size() >= VX_GetCacheSize() / 2;
+  report.Add(streams ? "vexel ordinary stores" : "vexel", [=] {
     const vexel::FpModeGuard guard;
     for (size_t row = 0; row < size.height; ++row)
       kernel(src->data() + row * srcRow, dst->data() + row * dstRow, size.width);
-  };
-  if (size.height == 1) {
-    report.Add("vexel", direct);
-  } else {
-    const size_t block = c.needsRow ? size.width : 384;
-    report.Add("vexel ordinary stores", direct);
-    report.Add("vexel", [=, srcBits = c.srcBits, dstBits = c.dstBits] {
+  });
+  if (size.height > 1)
+    report.Add(streams ? "vexel" : "vexel streamed", [=, srcBits = c.srcBits, dstBits = c.dstBits] {
       const vexel::FpModeGuard guard;
       for (size_t row = 0; row < size.height; ++row)
         for (size_t x = 0; x < size.width; x += block) {
-          kernel(src->data() + row * srcRow + RowBytes(srcBits, x), scratch->data(), block);
-          vexel::StreamCopy(dst->data() + row * dstRow + RowBytes(dstBits, x), scratch->data(),
-                            RowBytes(dstBits, block), variant);
+          const size_t first = x - std::min(x, reach), end = std::min(size.width, x + block + reach);
+          kernel(src->data() + row * srcRow + RowBytes(srcBits, first), scratch->data(), end - first);
+          vexel::StreamCopy(dst->data() + row * dstRow + RowBytes(dstBits, x),
+                            scratch->data() + RowBytes(dstBits, x - first),
+                            RowBytes(dstBits, std::min(block, size.width - x)), variant);
         }
       vexel::StreamFence();
     });
-  }
   report.AddFloor(src->size(), dst->size());
 #ifdef VEXEL_PEER_ZIMG
   if (c.from && size.height > 1)
