@@ -7,7 +7,7 @@
 namespace vexel {
 namespace {
 
-constexpr size_t kBlockPixels = 96, kBlockBytes = 256, kStepBytes = 64, kFetchAhead = 8192;
+constexpr size_t kBlockPixels = 96, kBlockBytes = 256, kStepBytes = 64, kStepPixelBytes = 128, kFetchAhead = 8192;
 constexpr size_t PairsOf(size_t pixels) { return (pixels + 1) / 2; }
 constexpr size_t GroupsOf(size_t pixels) { return (pixels + 5) / 6; }
 
@@ -140,6 +140,9 @@ struct RecodeToVuy {
   __m512i vU, vV, uU, uV, yU, yV;
 };
 
+// The first `count` words of 32 bits, at most 16.
+__mmask16 FirstWords(size_t count) { return static_cast<__mmask16>(count < 16 ? (1u << count) - 1 : 0xFFFF); }
+
 // Sets a sample of a row.
 void SetSample(uint8_t* row, size_t index, uint32_t code) {
   uint32_t word;
@@ -153,18 +156,33 @@ uint32_t GetSample(const uint8_t* row, size_t index) {
   return word >> index % 3 * 10 & 0x3FF;
 }
 
-// The pixels of a block. Needs the chroma of its first step and returns that of the block that follows.
+// One step: pixels from their luma, the chroma of their pairs, and that of the next step.
+template <class Pixels>
+VX_VBMI_INLINE void StoreStep(const Pixels& pixels, __m512i luma, __m512i own, __m512i next, uint8_t* dst) {
+  pixels.Store(luma, own, _mm512_avg_epu16(own, _mm512_alignr_epi32(next, own, 1)), dst);
+}
+
+// The pixels of a block, or its first `count`. Needs the chroma of its first step and returns that of the block that
+// follows.
 template <class Pixels>
 VX_VBMI_INLINE __m512i UpsampleBlock(const Pixels& pixels, const uint8_t* block, const uint8_t* following,
                                      __m512i first, uint8_t* dst) {
-  const auto store = [&](__m512i luma, __m512i own, __m512i next, uint8_t* to) VX_VBMI {
-    pixels.Store(luma, own, _mm512_avg_epu16(own, _mm512_alignr_epi32(next, own, 1)), to);
-  };
   const __m512i second = Chroma<1>(block), third = Chroma<2>(block), after = Chroma<0>(following);
-  store(Luma<0>(block), first, second, dst);
-  store(Luma<1>(block), second, third, dst + 128);
-  store(Luma<2>(block), third, after, dst + 256);
+  StoreStep(pixels, Luma<0>(block), first, second, dst);
+  StoreStep(pixels, Luma<1>(block), second, third, dst + kStepPixelBytes);
+  StoreStep(pixels, Luma<2>(block), third, after, dst + 2 * kStepPixelBytes);
   return after;
+}
+template <class Pixels>
+VX_VBMI_INLINE void UpsampleRest(const Pixels& pixels, const uint8_t* block, size_t count, __m512i first,
+                                 uint8_t* dst) {
+  alignas(64) uint8_t out[4 * kBlockPixels];
+  const __m512i second = Chroma<1>(block), third = Chroma<2>(block);
+  StoreStep(pixels, Luma<0>(block), first, second, out);
+  if (count > 32) StoreStep(pixels, Luma<1>(block), second, third, out + kStepPixelBytes);
+  if (count > 64) StoreStep(pixels, Luma<2>(block), third, Chroma<0>(block + kBlockBytes), out + 2 * kStepPixelBytes);
+  for (size_t i = 0; i < count; i += 16)
+    _mm512_mask_storeu_epi32(dst + 4 * i, FirstWords(count - i), _mm512_load_si512(out + 4 * i));
 }
 
 // The row continues with its last chroma.
@@ -172,8 +190,11 @@ template <class Pixels>
 VX_VBMI void Upsample(const uint8_t* src, uint8_t* dst, size_t count, const Pixels& pixels) {
   if (count == 0) return;
   const size_t blocks = count / kBlockPixels, rest = count % kBlockPixels;
-  alignas(64) uint8_t tail[kBlockBytes + 2 * kStepBytes] = {};
-  std::memcpy(tail, src + blocks * kBlockBytes, GroupsOf(rest) * 16);
+  alignas(64) uint8_t tail[kBlockBytes + 2 * kStepBytes];
+  const size_t tailWords = 4 * GroupsOf(rest);
+  for (size_t i = 0; i < sizeof tail / 4; i += 16)
+    _mm512_store_si512(tail + 4 * i, _mm512_maskz_loadu_epi32(tailWords > i ? FirstWords(tailWords - i) : 0,
+                                                              src + blocks * kBlockBytes + 4 * i));
   for (size_t channel = 0; channel <= 2; channel += 2)
     SetSample(tail, 4 * PairsOf(rest) + channel, GetSample(src, 4 * (PairsOf(count) - 1) + channel));
 
@@ -183,11 +204,7 @@ VX_VBMI void Upsample(const uint8_t* src, uint8_t* dst, size_t count, const Pixe
       __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + k));
     first = UpsampleBlock(pixels, src, i + 1 < blocks ? src + kBlockBytes : tail, first, dst);
   }
-  if (rest > 0) {
-    alignas(64) uint8_t out[4 * kBlockPixels];
-    UpsampleBlock(pixels, tail, tail + kBlockBytes, first, out);
-    std::memcpy(dst, out, 4 * rest);
-  }
+  if (rest > 0) UpsampleRest(pixels, tail, rest, first, dst);
 }
 
 }  // namespace
