@@ -1,14 +1,17 @@
 // Look-ups in tables of 256 bytes, which AVX512-VBMI makes permutations of registers. No kernel variant implies it.
 #pragma once
 
-#include <immintrin.h>
-
-#include <cstdint>
-
 #if defined(__GNUC__) && !defined(__clang__)
+#pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wuninitialized"  // GCC 12 warns of its own intrinsics
 #pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
 #endif
+#include <immintrin.h>
+#if defined(__GNUC__) && !defined(__clang__)
+#pragma GCC diagnostic pop
+#endif
+
+#include <cstdint>
 
 // Of functions that use it. No Highway target has these instructions without more that processors lack.
 #define VX_VBMI __attribute__((target("avx512f,avx512bw,avx512dq,avx512vl,avx512vbmi")))
