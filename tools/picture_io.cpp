@@ -10,12 +10,6 @@ Picture LoadPicture(const std::string& path, const SourceOptions& options) {
   return picture;
 }
 
-Picture LoadPictureAs(const std::string& path, VX_PixelFormat format, const ConvertOptions& convert,
-                      const SourceOptions& options) {
-  Picture picture = LoadPicture(path, options);
-  return picture.Format() == format ? std::move(picture) : ConvertPicture(picture, format, convert);
-}
-
 void SavePicture(const Picture& picture, const std::string& path, const ConvertOptions& convert,
                  const SinkOptions& options) {
   const std::unique_ptr<FrameSink> sink = OpenSink(path, options);

@@ -12,9 +12,6 @@ namespace tool {
 
 // The first picture of a file (or standard input, "-"), in the library format that its file format maps to.
 Picture LoadPicture(const std::string& path, const SourceOptions& options = {});
-// The same, converted to `format`.
-Picture LoadPictureAs(const std::string& path, VX_PixelFormat format, const ConvertOptions& convert = {},
-                      const SourceOptions& options = {});
 
 // Writes one picture, converted to what the file holds, as its extension says.
 void SavePicture(const Picture& picture, const std::string& path, const ConvertOptions& convert = {},

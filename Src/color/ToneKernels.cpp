@@ -23,7 +23,7 @@ constexpr float kLogRange = 0.01010101f;  // 1 / 99
 #endif
 }  // namespace vexel
 
-#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

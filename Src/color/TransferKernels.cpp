@@ -24,7 +24,7 @@ constexpr float kSrgbOffset = 0.055f;
 #endif
 }  // namespace vexel
 
-#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

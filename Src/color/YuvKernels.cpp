@@ -25,7 +25,7 @@ constexpr float kP010LumaRange = 56065.0f, kP010ChromaRange = 57345.0f;
 #endif
 }  // namespace vexel
 
-#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -47,7 +47,7 @@ constexpr size_t kMaskPixels = 32;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -14,8 +14,9 @@
 
 #include "composite/BlendKernels.h"
 #include "convert/PixelVectors-inl.h"
+#include "frame/FloatTranspose-inl.h"
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -50,32 +51,17 @@ class FloatPixels {
   explicit HWY_INLINE FloatPixels(const BytePixels&) {}
 
   HWY_INLINE Planes Load(const uint8_t* p) const {
-    Planes planes;
-    Transpose(LoadVector<float>(p, 0), LoadVector<float>(p, 1), LoadVector<float>(p, 2), LoadVector<float>(p, 3),
-              planes.colour.blue, planes.colour.green, planes.colour.red, planes.alpha);
+    Planes planes{{LoadVector<float>(p, 0), LoadVector<float>(p, 1), LoadVector<float>(p, 2)}, LoadVector<float>(p, 3)};
+    Transpose4(planes.colour.blue, planes.colour.green, planes.colour.red, planes.alpha);
     return planes;
   }
   HWY_INLINE void Store(const Planes& planes, uint8_t* p) const {
-    F32 v0, v1, v2, v3;
-    Transpose(planes.colour.blue, planes.colour.green, planes.colour.red, planes.alpha, v0, v1, v2, v3);
+    F32 v0 = planes.colour.blue, v1 = planes.colour.green, v2 = planes.colour.red, v3 = planes.alpha;
+    Transpose4(v0, v1, v2, v3);
     StoreVector(v0, p, 0);
     StoreVector(v1, p, 1);
     StoreVector(v2, p, 2);
     StoreVector(v3, p, 3);
-  }
-
- private:
-  static HWY_INLINE void Transpose(F32 a0, F32 a1, F32 a2, F32 a3, F32& b0, F32& b1, F32& b2, F32& b3) {
-    const hn::ScalableTag<float> d;
-    const hn::ScalableTag<double> d64;
-    const auto low01 = hn::BitCast(d64, hn::InterleaveLower(d, a0, a1));
-    const auto high01 = hn::BitCast(d64, hn::InterleaveUpper(d, a0, a1));
-    const auto low23 = hn::BitCast(d64, hn::InterleaveLower(d, a2, a3));
-    const auto high23 = hn::BitCast(d64, hn::InterleaveUpper(d, a2, a3));
-    b0 = hn::BitCast(d, hn::InterleaveLower(d64, low01, low23));
-    b1 = hn::BitCast(d, hn::InterleaveUpper(d64, low01, low23));
-    b2 = hn::BitCast(d, hn::InterleaveLower(d64, high01, high23));
-    b3 = hn::BitCast(d, hn::InterleaveUpper(d64, high01, high23));
   }
 };
 

@@ -37,7 +37,7 @@ constexpr uint32_t FactorOf(size_t k) {
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

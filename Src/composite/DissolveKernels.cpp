@@ -59,7 +59,7 @@ constexpr int kV210Bit = 0, kRgb10Bit = 2;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -114,8 +114,6 @@ class FrameWriter {
 
 }  // namespace
 
-size_t DvFrameBytes(DvSystem system) noexcept { return system == DvSystem::Lines625 ? 144000 : 120000; }
-
 void WriteDvBlackFrame(DvSystem system, uint8_t* frame) noexcept { FrameWriter(system, frame).Write(); }
 
 }  // namespace vexel

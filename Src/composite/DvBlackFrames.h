@@ -8,10 +8,8 @@ namespace vexel {
 
 enum class DvSystem : uint8_t { Lines525, Lines625 };
 
-// 120,000 and 144,000 bytes.
-size_t DvFrameBytes(DvSystem system) noexcept;
-
-// Writes the frame: luma 16, chroma 128, two channels of silence at 48 kHz. Always the same bytes.
+// Writes the frame, 120,000 or 144,000 bytes: luma 16, chroma 128, two channels of silence at 48 kHz. Always the same
+// bytes.
 void WriteDvBlackFrame(DvSystem system, uint8_t* frame) noexcept;
 
 }  // namespace vexel

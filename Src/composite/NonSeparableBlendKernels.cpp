@@ -22,7 +22,7 @@ constexpr float kLumRed = 0.3f, kLumGreen = 0.59f, kLumBlue = 0.11f;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -28,7 +28,7 @@ constexpr float kLeastAlpha = 8e-6f;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

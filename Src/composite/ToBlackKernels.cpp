@@ -36,7 +36,7 @@ inline int Opacity255(float opacity) { return static_cast<int>(opacity * 255 + 0
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

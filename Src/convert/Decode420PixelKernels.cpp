@@ -67,7 +67,7 @@ inline constexpr int kFractionBits = 6;
 }  // namespace vexel::decode420
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::decode420 {
 namespace HWY_NAMESPACE {

@@ -46,7 +46,7 @@ inline constexpr CubicPhase kThreeHalvesPhases[3] = {
 }  // namespace vexel::decode420
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::decode420 {
 namespace HWY_NAMESPACE {

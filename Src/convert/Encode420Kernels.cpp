@@ -36,7 +36,7 @@ using NearSecond = Weights<1, 3>;
 }  // namespace vexel::encode420
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::encode420 {
 namespace HWY_NAMESPACE {

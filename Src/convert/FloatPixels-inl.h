@@ -14,7 +14,7 @@
 #include "convert/PixelVectors-inl.h"
 #include "convert/StudioScale.h"
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -32,7 +32,7 @@ void LinearToBgra8(const uint8_t* src, uint8_t* dst, size_t count);
 }  // namespace
 }  // namespace vexel::plain
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

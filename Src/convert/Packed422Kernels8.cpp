@@ -33,7 +33,7 @@
   X(Swap422_8u, SwapPairs, PairOrder::Uyvy, 0)
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

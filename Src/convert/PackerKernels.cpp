@@ -64,7 +64,7 @@ constexpr UnpackTable kUnpack;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -15,7 +15,7 @@
 #include "convert/PairOrder.h"
 #include "convert/YuvVectors8-inl.h"
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

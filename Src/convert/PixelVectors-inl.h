@@ -15,7 +15,7 @@
 #include "frame/RowLoop-inl.h"
 
 // Highway's scalar fallback target is never chosen (the plain definitions serve there), so it gets no kernels.
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -39,7 +39,7 @@ using OpaqueFirst32f = Channels<float, AlphaWrite::OpaqueFirst>;
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

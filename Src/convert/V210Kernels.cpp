@@ -54,7 +54,7 @@ constexpr UnpackTable<kVectors, kBlocks, kBytes> MakeUnpackTable() {
 }  // namespace vexel
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

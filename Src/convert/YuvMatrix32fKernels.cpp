@@ -39,7 +39,7 @@
   KERNEL(Bgra32fToVuya8_709, Float, ToYuv<kBt709>, Vuya8, false)
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

@@ -32,7 +32,7 @@
   X(Vuyx8_709To601, YuvToYuv, kYuv8_709To601, AlphaWrite::OpaqueLast)
 #endif
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {

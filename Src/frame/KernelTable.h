@@ -3,6 +3,9 @@
 //
 //   const RowKernelSet kBgra8ToVuya8_601 = VX_KERNEL_VARIANTS(Bgra8ToVuya8_601);
 //
+// foreach_target compiles HWY_SCALAR as well, the baseline of any processor, which no table holds: bodies are left out
+// of it by #if HWY_TARGET != HWY_SCALAR.
+//
 // We keep our own table instead of HWY_DYNAMIC_DISPATCH, whose chosen target is one process-wide value that the host's
 // other users of Highway share.
 #pragma once

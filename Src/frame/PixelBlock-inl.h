@@ -12,9 +12,10 @@
 
 #include <hwy/highway.h>
 
+#include "frame/FloatTranspose-inl.h"
 #include "frame/Power-inl.h"
 
-#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
@@ -45,19 +46,6 @@ struct PixelBlock {
   HWY_ALIGN float scratch[3 * kPowerScratch * kPixels];
 };
 
-// 4 x 4 transposition within each 128 bits of four vectors.
-HWY_INLINE void Transpose4(ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
-  const ColorTag d;
-  const hn::Repartition<double, ColorTag> d64;
-  const auto low01 = hn::BitCast(d64, hn::InterleaveLower(d, v0, v1));
-  const auto high01 = hn::BitCast(d64, hn::InterleaveUpper(d, v0, v1));
-  const auto low23 = hn::BitCast(d64, hn::InterleaveLower(d, v2, v3));
-  const auto high23 = hn::BitCast(d64, hn::InterleaveUpper(d, v2, v3));
-  v0 = hn::BitCast(d, hn::InterleaveLower(d64, low01, low23));
-  v1 = hn::BitCast(d, hn::InterleaveUpper(d64, low01, low23));
-  v2 = hn::BitCast(d, hn::InterleaveLower(d64, high01, high23));
-  v3 = hn::BitCast(d, hn::InterleaveUpper(d64, high01, high23));
-}
 HWY_INLINE void LoadPixels(const float* from, ColorVector& v0, ColorVector& v1, ColorVector& v2, ColorVector& v3) {
   const ColorTag d;
   const size_t lanes = hn::Lanes(d);
