@@ -4,8 +4,7 @@
  *
  * - Pictures meet upright: a source whose origin differs from the destination's (VX_IsOriginTopLeft) is read from its
  *   last stored row.
- * - The destination may be exactly one of the sources (same base, row bytes and format); any other overlap is
- * undefined.
+ * - The destination may be exactly one of the sources (same base, row bytes and format); other overlap is undefined.
  * - An empty width or height does nothing and succeeds once the formats are accepted; a negative one is
  *   VX_ErrArgumentOutOfRange, as is a row beyond 2^31 - 1 bytes. A null source is VX_ErrNullSource, a null destination
  *   VX_ErrNullDestination. On these and on refused formats nothing is written.

@@ -2,7 +2,8 @@
  *
  * Buffers are described by a base pointer to the first stored row, a signed row stride in bytes (`rowBytes`; row r
  * starts at base + r * rowBytes), a width and a height in pixels, and a VX_PixelFormat. The caller owns every buffer it
- * passes. Whether the first stored row is the top of the picture follows from the format (VX_IsOriginTopLeft).
+ * passes. Whether the first stored row is the top of the picture follows from the format (VX_IsOriginTopLeft). Pointers
+ * must not be null where a function does not say what null does.
  *
  * No function throws. Except for VX_Initialize and VX_Terminate, every function may be called from many threads at
  * once. Functions that compute with floats run with flush-to-zero set and put the caller's floating-point mode back. */
@@ -79,9 +80,8 @@ typedef enum VX_Result
 
 /* Starts the library: detects processor features and the cache, reads the configuration keys "VX.disableAVX" and
  * "VX.disableAVX2" (true only if the text is exactly "true"; our own key "VX.disableAVX512" keeps AVX2 kernels but no
- * wider ones), creates the CPU-bound executor. Reference counted; call it
- * and VX_Terminate from one thread. Always VX_Success. Before it, all feature switches are off and plain kernels run.
- */
+ * wider ones), creates the CPU-bound executor. Reference counted; call it and VX_Terminate from one thread. Always
+ * VX_Success. Before it, all feature switches are off and plain kernels run. */
 VX_API VX_Result VX_Initialize(void) VX_NOEXCEPT;
 /* Undoes one VX_Initialize; the last one releases the executor. Switches and debug flags keep their values. */
 VX_API VX_Result VX_Terminate(void) VX_NOEXCEPT;
@@ -96,8 +96,8 @@ VX_API bool VX_hasAVX2(void) VX_NOEXCEPT;
  * cannot execute. Always VX_Success. */
 VX_API VX_Result VX_SetDebugFlag(uint32_t index, int32_t value) VX_NOEXCEPT;
 
-/* True if the first stored row is the top of the picture: every format but the 4:4:4:4 ones with an A, P or X channel.
- */
+/* True if the first stored row is the top of the picture: every format but the 4:4:4:4 ones with an A, P or X channel,
+ * and those too while debug flag 10 is set. */
 VX_API bool VX_IsOriginTopLeft(VX_PixelFormat format) VX_NOEXCEPT;
 VX_API bool VX_IsOriginBottomLeft(VX_PixelFormat format) VX_NOEXCEPT;
 
@@ -127,9 +127,10 @@ VX_API VX_PixelFormat VX_PixelFormatFromName(const char* name) VX_NOEXCEPT;
 VX_API void* VX_AllocateTransientMemoryBlock(size_t bytes, void** rawBlock, size_t* rawSize) VX_NOEXCEPT;
 VX_API void VX_FreeTransientMemoryBlock(void* rawBlock, size_t rawSize) VX_NOEXCEPT;
 
-/* A pixel buffer with padded rows; *rowBytes is 0 for DV and 4:2:0 formats. An empty size is VX_Success with null
- * pointers. VX_ErrOutOfMemory zeroes all outputs; sizes that 32 bits cannot express are refused that way. The transient
- * pair is the same thing for buffers that live for one operation. */
+/* A pixel buffer with padded rows, its bytes unspecified; *rowBytes is 0 for DV and 4:2:0 formats. A size of 0 bytes is
+ * VX_Success with null pointers. VX_ErrOutOfMemory zeroes all outputs; sizes that 32 bits cannot express and negative
+ * ones are refused that way. Freeing null does nothing. The transient pair is the same thing for buffers that live for
+ * one operation. */
 VX_API VX_Result VX_AllocatePixelBuffer(VX_PixelFormat format, int32_t width, int32_t height, void** rawBlock,
                                         void** pixels, int32_t* rowBytes, size_t* rawSize) VX_NOEXCEPT;
 VX_API VX_Result VX_FreePixelBuffer(VX_PixelFormat format, void* rawBlock, size_t rawSize) VX_NOEXCEPT;
@@ -139,8 +140,8 @@ VX_API VX_Result VX_FreeTransientPixelBuffer(VX_PixelFormat format, void* rawBlo
 
 /* Copies bytes between areas that do not overlap; from half the cache size on past the cache. Always VX_Success. */
 VX_API VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) VX_NOEXCEPT;
-/* Turns a raster upside down. Row padding stays; height below 2 does nothing. VX_ErrOutOfMemory only if the scratch row
- * of a very wide raster cannot be had. */
+/* Turns a raster upside down. Row padding stays; a height below 2, a width below 1, DV and 4:2:0 do nothing.
+ * VX_ErrOutOfMemory only if the scratch row of a very wide raster cannot be had. */
 VX_API VX_Result VX_FlipInPlace(void* base, int32_t rowBytes, int32_t width, int32_t height,
                                 VX_PixelFormat format) VX_NOEXCEPT;
 /* The address of pixel (x, y), y counting stored rows, of a 4:4:4:4 raster; nothing is clipped or checked.
@@ -168,7 +169,8 @@ VX_API VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat
 
 /* The formats that VX_Convert goes through, both ends and the rasters that 4:2:0 ends are decoded to and encoded from
  * included: up to 9 values into formats[], their number into *count. Codes as VX_Convert: -999 if there is no chain, -3
- * a special source without a decoder, -1000 a special destination without an encoder. */
+ * a special source without a decoder, -1000 a special destination without an encoder; the outputs are then untouched.
+ */
 VX_API VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
                                       VX_PixelFormat formats[9], int32_t* count) VX_NOEXCEPT;
 
