@@ -21,6 +21,7 @@ constexpr VX_PixelFormat kRgb = VX_PixelFormat::BGRA_4444_8u;
 constexpr Colour kPaper{24, 26, 30}, kInk{235, 235, 235}, kFaintInk{150, 155, 165}, kFrame{70, 74, 82};
 constexpr int kTileWidth = 480, kMargin = 16, kLabelHeight = 52, kTitleHeight = 44, kColumns = 3;
 constexpr int kErrorGain = 32;
+constexpr int kLeastInset = 90;  // the width of its label
 
 struct DemoOptions {
   std::vector<std::string> files;
@@ -167,6 +168,7 @@ void DrawStop(Canvas& canvas, const Stop& stop, int x, int y, int reduction, con
   if (!stop.error) return;
   const int insetReduction = reduction * 3, insetWidth = stop.error.Width() / insetReduction,
             insetHeight = stop.error.Height() / insetReduction;
+  if (insetWidth < kLeastInset) return;
   const int left = x + width - insetWidth - 8, insetTop = top + height - insetHeight - 8;
   canvas.Fill(left - 2, insetTop - 22, insetWidth + 4, insetHeight + 24, kPaper);
   small.Draw(canvas, left + 4, insetTop - 6, Format("error x %d", kErrorGain), kInk);
