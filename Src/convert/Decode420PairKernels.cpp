@@ -13,7 +13,7 @@
 #include "convert/Pairs422-inl.h"
 #include "frame/KernelTable.h"
 
-#if HWY_TARGET != HWY_BASELINE_SCALAR
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::decode420 {
 namespace HWY_NAMESPACE {

@@ -35,7 +35,6 @@ class RowConverter {
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }
 
-
   // Whether every pixel stands for itself, so that ConvertBlock may be used.
   bool IsPointWise() const noexcept { return !mWholeRow; }
 
