@@ -112,6 +112,7 @@ void AddFrames(const std::string& name, size_t bytes, Touch touch) {
 void RegisterBenchmarks() {
   for (size_t bytes = 64; bytes <= kLargest; bytes *= 2) {
     AddCopies(bytes);
+    if (bytes <= 2048) AddCopies(bytes + 1);
     if (bytes < 65536) AddCopies(bytes + bytes / 2 + 1);
   }
   for (const size_t block : {size_t{4096}, size_t{16384}, size_t{65536}}) AddWriteOut(block);

@@ -14,68 +14,66 @@
 
 #include "frame/KernelTable.h"
 
+#if HWY_TARGET != HWY_SCALAR  // compiled by foreach_target as the baseline, never chosen
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
-// 32-byte vectors at most: wider ones gain only on a few hundred bytes and lower the clock of some processors.
-using D = hn::CappedTag<uint8_t, 32>;
-using V = hn::VFromD<D>;
-constexpr size_t kLanes = hn::MaxLanes(D());
+constexpr size_t kVector = hn::MaxLanes(hn::ScalableTag<uint8_t>()), kStep = 4 * kVector;
 constexpr size_t kLine = 64;
 
-// kCount vectors held in registers.
-template <size_t kCount>
+// As many bytes held in registers, in vectors of kEach bytes.
+template <size_t kBytes, size_t kEach = kVector>
 struct Block {
-  Block<kCount / 2> low, high;
-  HWY_INLINE explicit Block(const uint8_t* src) : low(src), high(src + kCount / 2 * kLanes) {}
+  static constexpr size_t kHalf = kBytes / 2;
+  Block<kHalf, kEach> low, high;
+  HWY_INLINE explicit Block(const uint8_t* src) : low(src), high(src + kHalf) {}
   HWY_INLINE void StoreU(uint8_t* dst) const {
     low.StoreU(dst);
-    high.StoreU(dst + kCount / 2 * kLanes);
+    high.StoreU(dst + kHalf);
   }
   HWY_INLINE void Store(uint8_t* dst) const {
     low.Store(dst);
-    high.Store(dst + kCount / 2 * kLanes);
+    high.Store(dst + kHalf);
   }
   HWY_INLINE void Stream(uint8_t* dst) const {
     low.Stream(dst);
-    high.Stream(dst + kCount / 2 * kLanes);
+    high.Stream(dst + kHalf);
   }
 };
 
-template <>
-struct Block<1> {
-  V v;
+template <size_t kEach>
+struct Block<kEach, kEach> {
+  using D = hn::CappedTag<uint8_t, kEach>;
+  hn::VFromD<D> v;
   HWY_INLINE explicit Block(const uint8_t* src) : v(hn::LoadU(D(), src)) {}
   HWY_INLINE void StoreU(uint8_t* dst) const { hn::StoreU(v, D(), dst); }
   HWY_INLINE void Store(uint8_t* dst) const { hn::Store(v, D(), dst); }
   HWY_INLINE void Stream(uint8_t* dst) const { hn::Stream(v, D(), dst); }
 };
 
-constexpr size_t kStep = 4 * kLanes;
-
-// The first and the last kCount vectors of an area of kCount to 2 kCount vectors, all read before any is written.
-template <size_t kCount>
+// The first and the last kBytes of an area of kBytes to twice as many, all read before any is written.
+template <size_t kBytes>
 HWY_INLINE void CopyEnds(uint8_t* dst, const uint8_t* src, size_t n) {
-  const Block<kCount> head(src), tail(src + n - kCount * kLanes);
+  const Block<kBytes> head(src), tail(src + n - kBytes);
   head.StoreU(dst);
-  tail.StoreU(dst + n - kCount * kLanes);
+  tail.StoreU(dst + n - kBytes);
 }
 
 // The ends are copied as whole vectors and overlap the aligned middle.
 HWY_INLINE void CopyCached(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_t n) {
-  const Block<1> first(src);
-  const Block<4> last(src + n - kStep);
+  const Block<kVector> first(src);
+  const Block<kStep> last(src + n - kStep);
   uint8_t* const lastDst = dst + n - kStep;
-  const size_t skip = kLanes - (reinterpret_cast<uintptr_t>(dst) & (kLanes - 1));
+  const size_t skip = kVector - (reinterpret_cast<uintptr_t>(dst) & (kVector - 1));
   first.StoreU(dst);
   src += skip;
-  for (dst += skip; dst < lastDst; dst += kStep, src += kStep) Block<4>(src).Store(dst);
+  for (dst += skip; dst < lastDst; dst += kStep, src += kStep) Block<kStep>(src).Store(dst);
   last.StoreU(lastDst);
 }
 
-// See StreamCopy.
+// See StreamCopy. Lines in two halves are written faster than whole ones.
 void StreamAll(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_t n) {
   const size_t head = -reinterpret_cast<uintptr_t>(dst) % kLine;
   if (n < head + kLine) {
@@ -84,41 +82,40 @@ void StreamAll(uint8_t* HWY_RESTRICT dst, const uint8_t* HWY_RESTRICT src, size_
   }
   if (head != 0) std::memcpy(dst, src, head);
   const size_t tail = (n - head) % kLine, end = n - tail;
+  constexpr size_t kEach = kVector < 32 ? kVector : 32;
   size_t i = head;
-  for (; i + kStep <= end; i += kStep) Block<4>(src + i).Stream(dst + i);
-  for (; i < end; i += kLanes) Block<1>(src + i).Stream(dst + i);
+  for (; i + 4 * kEach <= end; i += 4 * kEach) Block<4 * kEach, kEach>(src + i).Stream(dst + i);
+  for (; i < end; i += kEach) Block<kEach, kEach>(src + i).Stream(dst + i);
   if (tail != 0) std::memcpy(dst + end, src + end, tail);
 }
 
-// Whether the C library is slower than the loop here: it has wider vectors, but takes longer to choose among them, and
-// copies with the processor's string instructions from the size of the first-level cache on.
-HWY_INLINE bool IsForLoop(size_t n) { return n <= 512 || (n >= 1536 && n <= 16384); }
+// Whether the C library is slower than the loop here. From about 2 KiB on it copies with the processor's string
+// instructions; below it has vectors as wide as ours or wider.
+HWY_INLINE bool IsForLoop(size_t n) {
+  constexpr size_t kFewTo = kVector == 64 ? 1024 : 512, kManyFrom = kVector == 64 ? 2304 : 1536, kManyTo = 16384;
+  return n <= kFewTo || (n >= kManyFrom && n <= kManyTo);
+}
 
-HWY_NOINLINE VX_Result CopyLong(uint8_t* dst, const uint8_t* src, size_t n) {
+HWY_NOINLINE VX_Result CopyHuge(uint8_t* dst, const uint8_t* src, size_t n) {
   if (n >= UnifiedCache().bytes / 2) {
     StreamAll(dst, src, n);
     StreamFence();
-  } else if (IsForLoop(n)) {
-    CopyCached(dst, src, n);
   } else {
     std::memcpy(dst, src, n);
   }
   return VX_Success;
 }
 
-// Lengths that a caller may ask for in a tight loop come first: a taken branch more or less shows there.
-VX_Result CopyAll(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
-  if (n >= 2 * kLanes) {
-    if (n <= 4 * kLanes)
-      CopyEnds<2>(dst, src, n);
-    else if (n <= 8 * kLanes)
-      CopyEnds<4>(dst, src, n);
-    else
-      return CopyLong(dst, src, n);
-  } else if (n >= kLanes) {
-    CopyEnds<1>(dst, src, n);
-  } else if (n != 0) {
-    std::memcpy(dst, src, n);
+// More than 128 bytes. The compiler has the upper halves of the registers cleared at the end.
+VX_Result CopyMore(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
+  if (kVector >= 32 && n <= 256) {
+    CopyEnds<128>(dst, src, n);
+  } else if (kVector == 64 && n <= 512) {
+    CopyEnds<256>(dst, src, n);
+  } else if (n < UnifiedCache().bytes / 2 && IsForLoop(n)) {
+    CopyCached(dst, src, n);
+  } else {
+    return CopyHuge(dst, src, n);
   }
   return VX_Success;
 }
@@ -126,6 +123,7 @@ VX_Result CopyAll(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 namespace vexel {
@@ -137,16 +135,29 @@ void StreamAll(uint8_t* dst, const uint8_t* src, size_t n) {
   if (n != 0) std::memcpy(dst, src, n);
 }
 
-VX_Result CopyAll(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
-  if (n != 0) std::memcpy(dst, src, n);
+VX_Result CopyMore(uint8_t* dst, const uint8_t* src, size_t n) noexcept {
+  std::memcpy(dst, src, n);
   return VX_Success;
 }
 
 }  // namespace plain
 
-constinit const KernelVariants<VX_Result (*)(uint8_t*, const uint8_t*, size_t) noexcept> kCopyAll =
-    VX_KERNEL_VARIANTS(CopyAll);
+constinit const KernelVariants<VX_Result (*)(uint8_t*, const uint8_t*, size_t) noexcept> kCopyMore =
+    VX_KERNEL_VARIANTS(CopyMore);
 constinit const KernelVariants<void (*)(uint8_t*, const uint8_t*, size_t)> kStreamAll = VX_KERNEL_VARIANTS(StreamAll);
+
+// The first and the last 16 kCount bytes of an area of that many to twice as many.
+template <int kCount>
+inline __attribute__((always_inline)) void CopyEnds(uint8_t* dst, const uint8_t* src, size_t n) {
+  const auto vectorsAt = [](auto* at) { return reinterpret_cast<__m128i*>(const_cast<uint8_t*>(at)); };
+  __m128i *const from = vectorsAt(src), *const lastFrom = vectorsAt(src + n) - kCount;
+  __m128i *const to = vectorsAt(dst), *const lastTo = vectorsAt(dst + n) - kCount;
+  __m128i head[kCount], tail[kCount];
+#pragma GCC unroll 4
+  for (int i = 0; i < kCount; ++i) head[i] = _mm_loadu_si128(from + i), tail[i] = _mm_loadu_si128(lastFrom + i);
+#pragma GCC unroll 4
+  for (int i = 0; i < kCount; ++i) _mm_storeu_si128(to + i, head[i]), _mm_storeu_si128(lastTo + i, tail[i]);
+}
 
 }  // namespace
 
@@ -158,15 +169,29 @@ void StreamFence() noexcept { _mm_sfence(); }
 
 }  // namespace vexel
 
-// Nothing but jumps (which they are only because the kernels cannot throw), the usual one direct: a call, or an
-// indirect jump, would cost as much as a short copy. The AVX-512 variant of the kernel is the same.
+// Short copies, which a caller may ask for in a tight loop, need neither a variant nor a call: either would cost as
+// much as the copy. The longer ones are nothing but jumps (which they are only because the kernels cannot throw), the
+// usual ones direct.
 VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) noexcept {
   using namespace vexel;
   auto* const to = static_cast<uint8_t*>(dst);
   auto* const from = static_cast<const uint8_t*>(src);
-  const KernelVariant variant = ActiveKernelVariant();
-  if (variant >= KernelVariant::Avx2) [[likely]]
-    return N_AVX2::CopyAll(to, from, bytes);
-  return kCopyAll[variant](to, from, bytes);
+  if (bytes > 128) {
+    const KernelVariant variant = ActiveKernelVariant();
+    if (variant == KernelVariant::Avx512) [[likely]]
+      return N_AVX3::CopyMore(to, from, bytes);
+    if (variant == KernelVariant::Avx2) [[likely]]
+      return N_AVX2::CopyMore(to, from, bytes);
+    return kCopyMore[variant](to, from, bytes);
+  }
+  if (bytes >= 64)
+    CopyEnds<4>(to, from, bytes);
+  else if (bytes >= 32)
+    CopyEnds<2>(to, from, bytes);
+  else if (bytes >= 16)
+    CopyEnds<1>(to, from, bytes);
+  else if (bytes != 0)
+    std::memcpy(to, from, bytes);
+  return VX_Success;
 }
 #endif

@@ -200,7 +200,7 @@ void CheckSizes(const Copy& copy) {
   for (size_t i = 0; i < all.size(); ++i) all[i] = i;
   for (const size_t n : {0, 1, 63, 64, 65, 127, 128, 129, 255, 256, 257, 1000}) CheckCopy(copy, n, all, {0, 1, 16, 33});
   for (size_t n = 0; n <= 700; ++n) CheckCopy(copy, n, {0, 5, 63}, {0, 7});
-  for (const size_t n : {1535, 1536, 1537, 1663, 4095, 4096, 16384, 16385, 65537})
+  for (const size_t n : {1023, 1024, 1025, 1535, 1536, 1537, 1663, 2303, 2304, 4095, 4096, 16384, 16385, 65537})
     CheckCopy(copy, n, {0, 1, 31}, {0, 17});
 }
 
