@@ -1,7 +1,7 @@
 #include <cstring>
 #include <limits>
 
-#include "color/Engines.h"
+#include "color/SpaceCommon.h"
 #include "color/HdrConstants.h"
 #include "color/LazyCache.h"
 #include "color/PlainPixels.h"

@@ -1,7 +1,7 @@
 #include <cmath>
 #include <cstring>
 
-#include "color/Engines.h"
+#include "color/SpaceCommon.h"
 #include "color/LazyCache.h"
 
 namespace vexel {

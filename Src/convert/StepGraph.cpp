@@ -1,8 +1,8 @@
 // The table of direct conversions. Storage without a name: kPairs… holds Y'CbCr pairs exactly as UYVY_422 does (2 bytes
-// per pixel in 8u, 8 in 32f), and `Invalid` nearly so (PairKernels.h).
+// per pixel in 8u, 8 in 32f), and `Invalid` nearly so (InvalidFormatKernels.h).
 #include "convert/StepGraph.h"
 
-#include "convert/PairKernels.h"
+#include "convert/InvalidFormatKernels.h"
 #include "convert/RgbKernels.h"
 #include "convert/YuvKernels.h"
 #include "formats/FormatBits.h"

@@ -1,4 +1,4 @@
-#include "convert/PairKernels.h"
+#include "convert/InvalidFormatKernels.h"
 
 #include <algorithm>
 #include <cstring>

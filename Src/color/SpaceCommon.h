@@ -1,4 +1,4 @@
-// What the SDR and HDR spaces share: the guarded calls into the pixel kernels.
+// What the SDR and HDR spaces share: counts, the conversion by powers, and what BT.709 and BT.2020 mean to each other.
 #pragma once
 
 #include "color/PixelKernels.h"
@@ -7,6 +7,7 @@ namespace vexel {
 
 inline size_t PixelCount(int count) { return count > 0 ? static_cast<size_t>(count) : 0; }
 
+// PureGammaToPureGamma with exponents that are prepared.
 void ConvertPowerToPower(const float* src, float* dst, int count, const PowerExponent& decode,
                          const PowerExponent& encode, const VX::CSMatrix& matrix, bool compressGamut,
                          const float* lumaCoeffs) noexcept;
@@ -15,6 +16,7 @@ void ConvertPowerToPower(const float* src, float* dst, int count, const PowerExp
 const VX::CSMatrix& Rec709ToRec2020() noexcept;
 const VX::CSMatrix& Rec2020ToRec709() noexcept;
 
+// Weights of R, G and B in the luma of the working space.
 const float* Rec709Luma();
 
 }  // namespace vexel
