@@ -190,11 +190,11 @@ template <class Pixels>
 VX_VBMI void Upsample(const uint8_t* src, uint8_t* dst, size_t count, const Pixels& pixels) {
   if (count == 0) return;
   const size_t blocks = count / kBlockPixels, rest = count % kBlockPixels;
-  alignas(64) uint8_t tail[kBlockBytes + 2 * kStepBytes];
-  const size_t tailWords = 4 * GroupsOf(rest);
-  for (size_t i = 0; i < sizeof tail / 4; i += 16)
-    _mm512_store_si512(tail + 4 * i, _mm512_maskz_loadu_epi32(tailWords > i ? FirstWords(tailWords - i) : 0,
-                                                              src + blocks * kBlockBytes + 4 * i));
+  alignas(64) uint8_t tail[kBlockBytes + 2 * kStepBytes] = {};
+  const uint8_t* const restOfSrc = src + blocks * kBlockBytes;
+  const size_t restWords = 4 * GroupsOf(rest);
+  for (size_t i = 0; i < restWords; i += 16)
+    _mm512_store_si512(tail + 4 * i, _mm512_maskz_loadu_epi32(FirstWords(restWords - i), restOfSrc + 4 * i));
   for (size_t channel = 0; channel <= 2; channel += 2)
     SetSample(tail, 4 * PairsOf(rest) + channel, GetSample(src, 4 * (PairsOf(count) - 1) + channel));
 
