@@ -3,6 +3,7 @@
 
 #include "convert/Decode420.h"
 #include "convert/Encode420Kernels.h"
+#include "convert/RgbKernels.h"
 #include "convert/RowConverter.h"
 #include "convert/YuvMatrices.h"
 #include "frame/FpModeGuard.h"
@@ -22,6 +23,19 @@ bool CanEncode(VX_PixelFormat format) noexcept {
 // What the kernels take.
 VX_PixelFormat WorkingFormat(VX_PixelFormat dst) noexcept {
   return IsVideoRange(dst) ? VX_PixelFormat::VUYX_4444_8u_709 : VX_PixelFormat::BGRX_4444_8u;
+}
+
+// Kernels that read the rows of a format as they are; null for rows that are converted first.
+const PairKernels* KernelsOf(VX_PixelFormat src, VX_PixelFormat working, int32_t quality) noexcept {
+  const PairKernels* const kernels = IsYuv(working) ? &kFromVuyx : &kFromBgrx;
+  if (src == working) return kernels;
+  Plan plan;
+  if (MakePlan(src, working, quality, &plan) != VX_Success) return nullptr;
+  // They do not look at the fourth channel.
+  const PlannedStep &first = plan.steps[0], &last = plan.steps[static_cast<size_t>(plan.stepCount - 1)];
+  if (last.kernel != &kOpaqueLast8u) return nullptr;
+  if (plan.stepCount == 1) return kernels;
+  return plan.stepCount == 2 && first.kernel == &kPremultiplyLast8u ? &kFromBgra : nullptr;
 }
 
 constexpr int16_t Factor(double value) { return static_cast<int16_t>(value * 32768 + (value < 0 ? -0.5 : 0.5)); }
@@ -118,8 +132,8 @@ struct Pair {
 
 class Encoder {
  public:
-  Encoder(VX_PixelFormat format, void* dst, int32_t width, int32_t height) noexcept
-      : mFormat(format), mWidth(width), mHeight(height) {
+  Encoder(VX_PixelFormat format, void* dst, int32_t width, int32_t height, const PairKernels* kernels) noexcept
+      : mFormat(format), mWidth(width), mHeight(height), mKernels(*kernels) {
     VX_GetPlanarBuffers(dst, format, width, height, mPlanes, mRowBytes);
     if (IsReversed(format)) std::swap(mPlanes[1], mPlanes[2]);
   }
@@ -134,16 +148,16 @@ class Encoder {
 
   VX_PixelFormat mFormat;
   int32_t mWidth, mHeight;
+  const PairKernels& mKernels;
   void* mPlanes[3];
   int32_t mRowBytes[3];
   KernelVariant mVariant = ActiveKernelVariant();
 };
 
 Pair Encoder::PairOf(int64_t row) const noexcept {
-  const PairKernels& kernels = IsVideoRange(mFormat) ? kFromVuyx : kFromBgrx;
-  if (!IsFieldPicture(mFormat)) return {2 * row, 2 * row + 1, kernels.even[mVariant]};
+  if (!IsFieldPicture(mFormat)) return {2 * row, 2 * row + 1, mKernels.even[mVariant]};
   const int64_t parity = row % 2, first = row / 2 * 4 + parity;
-  return {first, first + 2, (parity == 0 ? kernels.nearFirst : kernels.nearSecond)[mVariant]};
+  return {first, first + 2, (parity == 0 ? mKernels.nearFirst : mKernels.nearSecond)[mVariant]};
 }
 
 VX_Result Encoder::Run(Lines& lines) const noexcept {
@@ -177,7 +191,12 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
   if (IsSpecial(srcFormat) || !CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
   const FpModeGuard fpMode;
   Lines lines(width);
-  if (const VX_Result result = lines.Convert(srcFormat, WorkingFormat(dstFormat), quality)) return result;
+  const VX_PixelFormat working = WorkingFormat(dstFormat);
+  const PairKernels* kernels = KernelsOf(srcFormat, working, quality);
+  if (!kernels) {
+    if (const VX_Result result = lines.Convert(srcFormat, working, quality)) return result;
+    kernels = KernelsOf(working, working, quality);
+  }
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;
@@ -186,7 +205,7 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
     lines.SetRaster(top + (height - 1) * ptrdiff_t{srcRowBytes}, -ptrdiff_t{srcRowBytes});
   else
     lines.SetRaster(top, srcRowBytes);
-  return Encoder(dstFormat, dst, width, height).Run(lines);
+  return Encoder(dstFormat, dst, width, height, kernels).Run(lines);
 }
 
 VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat decoded, int32_t decodeQuality, void* dst,
@@ -197,12 +216,13 @@ VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat de
   const Picture420 picture = PictureFromBlock(src, srcFormat, width, height);
   Lines lines(width);
   if (const VX_Result result = lines.Decode(picture, decoded, decodeQuality)) return result;
-  if (const VX_Result result = lines.Convert(decoded, WorkingFormat(dstFormat), quality)) return result;
+  const VX_PixelFormat working = WorkingFormat(dstFormat);
+  if (const VX_Result result = lines.Convert(decoded, working, quality)) return result;
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;
   TraceFullSize420(picture);
-  return Encoder(dstFormat, dst, width, height).Run(lines);
+  return Encoder(dstFormat, dst, width, height, KernelsOf(working, working, quality)).Run(lines);
 }
 
 }  // namespace vexel

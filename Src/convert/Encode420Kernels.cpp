@@ -119,18 +119,32 @@ HWY_INLINE U8 OrderChroma(U8 packed) {
 #endif
 }
 
-// By the differences of blue and red from green: the factors of chroma sum to 0, those of luma to 1.
+// By the differences of blue and red from green: the factors of chroma sum to 0, those of luma to 1. Of BGR as it is,
+// or of straight alpha over black.
+template <bool kPremultiply>
 struct FromBgr {
+  static constexpr bool kHasAlpha = kPremultiply;
   struct Pixels {
-    U8 bgrg;
+    U16 green;   // in both words of a pixel; of BGR as it is, in their high bytes, over others
     I16 chroma;  // (b - g, r - g)
   };
   I16 luma, u, v;
   explicit HWY_INLINE FromBgr(const Factors& f)
       : luma(WordPair(2 * f.luma.b, 2 * f.luma.r)), u(WordPair(f.u.b, f.u.r)), v(WordPair(f.v.b, f.v.r)) {}
-  static HWY_INLINE Pixels Split(U8 pixels) {
+  static HWY_INLINE Pixels SplitOpaque(U8 pixels) {
     const U8 bgrg = hn::TableLookupBytes(pixels, ByteOrder<0x1210>());
-    return {bgrg, SubtractOddBytes(bgrg)};
+    return {kPremultiply ? hn::ShiftRight<8>(AsU16(bgrg)) : AsU16(bgrg), SubtractOddBytes(bgrg)};
+  }
+  static HWY_INLINE Pixels Split(U8 pixels) {
+    if constexpr (!kPremultiply) return SplitOpaque(pixels);
+    const U16 alpha = AsU16(hn::TableLookupBytes(pixels, ByteOrder<0x8383>()));
+    const U16 green = Scale(AsU16(hn::TableLookupBytes(pixels, ByteOrder<0x8181>())), alpha);
+    return {green, AsI16(hn::Sub(Scale(AsU16(hn::And(pixels, Dwords(0x00FF00FF))), alpha), green))};
+  }
+  // c a / 255 to nearest: (t + 128) 257 >> 16 of t = c a.
+  static HWY_INLINE U16 Scale(U16 channels, U16 alpha) {
+    const ScalableTag<uint16_t> d;
+    return hn::MulHigh(hn::Add(hn::Mul(channels, alpha), hn::Set(d, uint16_t{128})), hn::Set(d, uint16_t{257}));
   }
   // What luma has besides green, in the high words.
   HWY_INLINE I16 LumaDifference(const Pixels& p) const {
@@ -138,7 +152,7 @@ struct FromBgr {
   }
   // Words of two vectors side by side.
   HWY_INLINE I16 Luma(const Pixels& p0, const Pixels& p1) const {
-    const U16 green = hn::ShiftRight<8>(hn::OddEven(AsU16(p1.bgrg), AsU16(p0.bgrg)));
+    const U16 words = hn::OddEven(p1.green, p0.green), green = kPremultiply ? words : hn::ShiftRight<8>(words);
     return hn::Add(AsI16(green), JoinHighWords(LumaDifference(p0), LumaDifference(p1)));
   }
   template <int kBits>
@@ -156,6 +170,7 @@ struct FromBgr {
 };
 
 struct FromVuy {
+  static constexpr bool kHasAlpha = false;
   struct Pixels {
     U8 vuya;
     I16 chroma;  // (u, v)
@@ -206,8 +221,18 @@ class Encoder {
     I16 lumaA, lumaB, chroma;
   };
   HWY_INLINE Step Next(const uint8_t* a, const uint8_t* b) {
-    const Pixels a0 = Op::Split(LoadVector<uint8_t>(a, 0)), a1 = Op::Split(LoadVector<uint8_t>(a, 1));
-    const Pixels b0 = Op::Split(LoadVector<uint8_t>(b, 0)), b1 = Op::Split(LoadVector<uint8_t>(b, 1));
+    const U8 a0 = LoadVector<uint8_t>(a, 0), a1 = LoadVector<uint8_t>(a, 1);
+    const U8 b0 = LoadVector<uint8_t>(b, 0), b1 = LoadVector<uint8_t>(b, 1);
+    if constexpr (Op::kHasAlpha) {
+      const ScalableTag<uint32_t> d;
+      const auto opaque = hn::BitCast(d, Dwords(0xFF000000)),
+                 all = hn::BitCast(d, hn::And(hn::And(a0, a1), hn::And(b0, b1)));
+      if (hn::AllTrue(d, hn::Eq(hn::And(all, opaque), opaque)))
+        return Next(Op::SplitOpaque(a0), Op::SplitOpaque(a1), Op::SplitOpaque(b0), Op::SplitOpaque(b1));
+    }
+    return Next(Op::Split(a0), Op::Split(a1), Op::Split(b0), Op::Split(b1));
+  }
+  HWY_INLINE Step Next(const Pixels& a0, const Pixels& a1, const Pixels& b0, const Pixels& b1) {
     return {mOp.Luma(a0, a1), mOp.Luma(b0, b1),
             Filter(WeightedSum<W>(a0.chroma, b0.chroma), WeightedSum<W>(a1.chroma, b1.chroma))};
   }
@@ -258,7 +283,11 @@ HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
 
 template <class W>
 void EncodeBgrx(const LinePair& lines, const Factors& factors) {
-  EncodeRows<W, FromBgr>(lines, factors);
+  EncodeRows<W, FromBgr<false>>(lines, factors);
+}
+template <class W>
+void EncodeBgra(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromBgr<true>>(lines, factors);
 }
 template <class W>
 void EncodeVuyx(const LinePair& lines, const Factors& factors) {
@@ -282,8 +311,12 @@ uint8_t Round(int32_t sum) {
   return static_cast<uint8_t>(code < 0 ? 0 : code > 255 ? 255 : code);
 }
 
+template <bool kPremultiply>
 struct FromBgr {
   const Factors& factors;
+  static int32_t Channel(const uint8_t* pixel, size_t k) {
+    return kPremultiply ? (2 * pixel[k] * pixel[3] + 255) / 510 : pixel[k];
+  }
   static int32_t Dot(const BgrFactors& f, const int32_t* p) { return p[0] * f.b + p[1] * f.g + p[2] * f.r; }
   uint8_t Luma(const int32_t* pixel) const { return Round<kFactorBits>(Dot(factors.luma, pixel)); }
   template <int kBits>
@@ -302,6 +335,7 @@ struct FromBgr {
 
 struct FromVuy {
   explicit FromVuy(const Factors&) {}
+  static int32_t Channel(const uint8_t* pixel, size_t k) { return pixel[k]; }
   uint8_t Luma(const int32_t* pixel) const { return static_cast<uint8_t>(pixel[2]); }
   template <int kBits>
   uint8_t U(const int32_t* sums) const {
@@ -316,7 +350,8 @@ struct FromVuy {
 template <class Op>
 void LumaRow(const uint8_t* pixels, uint8_t* luma, size_t width, const Op& op) {
   for (size_t x = 0; x < width; ++x) {
-    const int32_t pixel[3] = {pixels[4 * x], pixels[4 * x + 1], pixels[4 * x + 2]};
+    int32_t pixel[3];
+    for (size_t k = 0; k < 3; ++k) pixel[k] = Op::Channel(pixels + 4 * x, k);
     luma[x] = op.Luma(pixel);
   }
 }
@@ -331,7 +366,8 @@ void EncodeRows(const LinePair& lines, const Factors& factors) {
     int32_t sums[3];
     for (size_t k = 0; k < 3; ++k) {
       const auto across = [&](const uint8_t* line) {
-        return line[4 * left + k] + 2 * line[4 * x + k] + line[4 * right + k];
+        const auto at = [&](size_t column) { return Op::Channel(line + 4 * column, k); };
+        return at(left) + 2 * at(x) + at(right);
       };
       sums[k] = W::kA * across(lines.a) + W::kB * across(lines.b);
     }
@@ -342,7 +378,11 @@ void EncodeRows(const LinePair& lines, const Factors& factors) {
 
 template <class W>
 void EncodeBgrx(const LinePair& lines, const Factors& factors) {
-  EncodeRows<W, FromBgr>(lines, factors);
+  EncodeRows<W, FromBgr<false>>(lines, factors);
+}
+template <class W>
+void EncodeBgra(const LinePair& lines, const Factors& factors) {
+  EncodeRows<W, FromBgr<true>>(lines, factors);
 }
 template <class W>
 void EncodeVuyx(const LinePair& lines, const Factors& factors) {
@@ -355,6 +395,7 @@ void EncodeVuyx(const LinePair& lines, const Factors& factors) {
 #define VX_PAIR_KERNELS(Encode) \
   { VX_KERNEL_VARIANTS(Encode<Even>), VX_KERNEL_VARIANTS(Encode<NearFirst>), VX_KERNEL_VARIANTS(Encode<NearSecond>) }
 const PairKernels kFromBgrx = VX_PAIR_KERNELS(EncodeBgrx);
+const PairKernels kFromBgra = VX_PAIR_KERNELS(EncodeBgra);
 const PairKernels kFromVuyx = VX_PAIR_KERNELS(EncodeVuyx);
 #undef VX_PAIR_KERNELS
 

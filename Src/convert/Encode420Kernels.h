@@ -32,5 +32,6 @@ struct PairKernels {
   KernelVariants<EncodeLines> even, nearFirst, nearSecond;  // (2, 2), (3, 1), (1, 3)
 };
 extern const PairKernels kFromBgrx, kFromVuyx;
+extern const PairKernels kFromBgra;  // premultiplied first
 
 }  // namespace vexel::encode420

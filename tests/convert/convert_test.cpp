@@ -418,7 +418,7 @@ TEST(ConvertArena, FailingAllocations) {
   const struct {
     F src, dst;
   } cases[] = {{F::YUV_420_MPEG4_FRAME_709, F::BGRA_4444_32f},
-               {F::BGRA_4444_8u, F::YUV_420_MPEG4_FIELD_FullRange},
+               {F::ARGB_4444_8u, F::YUV_420_MPEG4_FIELD_FullRange},
                {F::YUV_420_MPEG4_FIELD_FullRange, F::YUV_420_MPEG4_FRAME_709},
                {F::BGRA_4444_8u, F::VUYA_4444_8u},
                {F::UYVY_422_32f, F::BGRA_4444_32f},

@@ -645,6 +645,30 @@ TEST(Encode420, Colours) {
   }
 }
 
+// Straight alpha in runs, opaque and not, is encoded as what premultiplying makes of it.
+TEST(Encode420, StraightAlphaIsPremultiplied) {
+  Random random(5);
+  for (const F format : {F::YUV_420_MPEG2_FRAME_FullRange, F::YUV_420_MPEG4_FIELD_FullRange_709})
+    for (const int width : {1, 3, 31, 130, 389}) {
+      const int height = 9;
+      Raster straight(width, height), premultiplied(width, height);
+      random.Fill(straight.bytes.data(), straight.bytes.size());
+      for (size_t i = 3; i < straight.bytes.size(); i += 4)
+        if (i / 4 / 97 % 3 != 0) straight.bytes[i] = 255;
+      ASSERT_EQ(VX_Success, VX_Convert(straight.bytes.data(), 4 * width, F::BGRA_4444_8u, premultiplied.bytes.data(),
+                                       4 * width, F::BGRP_4444_8u, width, height, 2));
+      Block420 expected(format, width, height), fromBgra(format, width, height), fromBgrp(format, width, height);
+      const auto encode = [&](Raster& src, F from, Block420& dst) {
+        return Encode420(src.bytes.data(), 4 * width, from, dst.bytes.data(), format, width, height);
+      };
+      ASSERT_EQ(VX_Success, encode(premultiplied, F::BGRX_4444_8u, expected));
+      ASSERT_EQ(VX_Success, encode(premultiplied, F::BGRP_4444_8u, fromBgrp));
+      ASSERT_EQ(VX_Success, encode(straight, F::BGRA_4444_8u, fromBgra));
+      ASSERT_EQ(expected.bytes, fromBgrp.bytes) << width;
+      ASSERT_EQ(expected.bytes, fromBgra.bytes) << width;
+    }
+}
+
 TEST(Encode420, Refuses) {
   const struct {
     F src, dst;
