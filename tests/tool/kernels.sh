@@ -14,7 +14,6 @@ grep -l 'nan\|inf' plots/*.svg && fail "plots of no numbers"
 "$vexel" kernels --plot nowhere 2>err && fail "a plot into no directory"
 grep -q nowhere err || fail "no reason given: $(cat err)"
 
-"$vexel" kernels >list
 sed -n '/^name  /,/^lanczos8 /p' "$media/../../docs/resampling.md" >documented
 same list documented "the list in docs/resampling.md"
 exit $failed
