@@ -69,6 +69,7 @@ ColorSpace& ColorSpace::operator=(const ColorSpace& other) {
 ColorSpace& ColorSpace::operator=(ColorSpace&& other) { return *this = other; }
 
 void ColorSpace::CalculateMatrices() const {
+  const vexel::DefaultFpMode mode;
   const float* primaries = Primaries();
   CSMatrix toXyz;
   for (int i = 0; i < 3; ++i) {

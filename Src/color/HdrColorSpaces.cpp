@@ -5,6 +5,7 @@
 #include "color/HdrConstants.h"
 #include "color/LazyCache.h"
 #include "color/PlainPixels.h"
+#include "frame/FpModeGuard.h"
 
 namespace vexel {
 namespace {
@@ -22,6 +23,7 @@ float PqToLinear(float signal) {
 // Built on first use, under the guard of its static object, and never freed.
 struct PqTable {
   PqTable() {
+    const DefaultFpMode mode;
     for (int i = 0; i < kPqTableSize; ++i) light[i] = PqLight(static_cast<float>(i) * (1.0f / (kPqTableSize - 1)));
   }
   float light[kPqTableSize];
@@ -34,6 +36,7 @@ const float* PqTableLight() {
 
 struct HlgTable {
   HlgTable() {
+    const DefaultFpMode mode;
     for (int i = 0; i < kHlgTableSize; ++i) {
       const float x = static_cast<float>(i) * (1.0f / (kHlgTableSize - 1));
       light[i] = x < 0.5f ? x * x * (1.0f / 3.0f) : Exp((x - kHlgC) * kHlgInverseA) + kHlgB;

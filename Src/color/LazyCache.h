@@ -5,6 +5,7 @@
 #include <atomic>
 #include <mutex>
 
+#include "frame/FpModeGuard.h"
 #include "vexel/color_space.h"
 
 namespace vexel {
@@ -21,6 +22,7 @@ template <class Compute>
 const VX::CSMatrix& CachedMatrix(VX::CSMatrix& matrix, bool& valid, const Compute& compute) {
   const std::atomic_ref<bool> flag(valid);
   if (!flag.load(std::memory_order_acquire)) {
+    const DefaultFpMode mode;
     const VX::CSMatrix value = compute();
     const std::lock_guard<std::mutex> lock(LazyCacheMutex());
     if (!flag.load(std::memory_order_relaxed)) {

@@ -3,9 +3,9 @@
 #include <array>
 #include <cmath>
 #include <cstring>
-#include <xmmintrin.h>
 
 #include "convert/StreamedRows.h"
+#include "frame/FpModeGuard.h"
 #include "vexel/vexel.h"
 
 namespace vexel {
@@ -24,18 +24,6 @@ float DisplayGamma(float linear) {
   constexpr float kExponent = 0.41666666f;
   return static_cast<float>(std::copysign(std::pow(std::fabs(double{linear}), double{kExponent}), double{linear}));
 }
-
-// Rounding to nearest and no flushing, whatever mode the first caller runs in.
-class DefaultFpMode {
- public:
-  DefaultFpMode() : mSaved(_mm_getcsr()) { _mm_setcsr(0x1F80); }
-  ~DefaultFpMode() { _mm_setcsr(mSaved); }
-  DefaultFpMode(const DefaultFpMode&) = delete;
-  DefaultFpMode& operator=(const DefaultFpMode&) = delete;
-
- private:
-  unsigned mSaved;
-};
 
 struct CanonLog3Table {
   std::array<float, 65536> display;

@@ -4,9 +4,9 @@
 #include <bit>
 #include <cstddef>
 #include <cstdint>
-#include <xmmintrin.h>
 
 #include "convert/PlainPixels.h"
+#include "frame/FpModeGuard.h"
 #include "frame/Power.h"
 
 namespace vexel {
@@ -17,18 +17,6 @@ inline constexpr PowerExponent kToLinear(2.4f), kFromLinear(1 / 2.4f);
 // 32f to an 8u code; of light that means the definition of LinearToBgra8.
 inline int32_t NarrowTo8(float c) { return plain::Clamp(plain::ConvertNearest(c * 255.0f), 0, 255); }
 inline int32_t NarrowLightTo8(float c) { return NarrowTo8(SignedPower(c, kFromLinear)); }
-
-// Tables must not depend on the rounding mode of whoever comes first.
-class DefaultFpMode {
- public:
-  DefaultFpMode() noexcept : mSaved(_mm_getcsr()) { _mm_setcsr(0x1F80); }
-  ~DefaultFpMode() { _mm_setcsr(mSaved); }
-  DefaultFpMode(const DefaultFpMode&) = delete;
-  DefaultFpMode& operator=(const DefaultFpMode&) = delete;
-
- private:
-  uint32_t mSaved;
-};
 
 // The light of each 8u code as a colour, and what it is as alpha, each twice in a row: so a pixel is put together from
 // four unaligned loads of 16 bytes, which may begin one entry early or end one late. Made by the first caller; others

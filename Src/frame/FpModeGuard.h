@@ -1,4 +1,4 @@
-// Sets the floating-point mode of the entry points that do float work and puts the caller's back.
+// Floating-point modes for a while: that of the entry points that do float work, and the default for what is kept.
 #pragma once
 
 #include <cstdint>
@@ -40,6 +40,18 @@ class NearestRounding {
  private:
   static constexpr uint32_t kRounding = 0x6000;
   uint32_t mChanged;
+};
+
+// What is computed on first use and kept must not depend on the rounding mode of whoever comes first.
+class DefaultFpMode {
+ public:
+  DefaultFpMode() noexcept : mSaved(_mm_getcsr()) { _mm_setcsr(0x1F80); }
+  ~DefaultFpMode() { _mm_setcsr(mSaved); }
+  DefaultFpMode(const DefaultFpMode&) = delete;
+  DefaultFpMode& operator=(const DefaultFpMode&) = delete;
+
+ private:
+  uint32_t mSaved;
 };
 
 }  // namespace vexel

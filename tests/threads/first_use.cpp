@@ -1,15 +1,18 @@
-// Eight threads use the library for the first time at once, in a process of its own: every table and cache that is made
-// on first use is made under contention. Run under ThreadSanitizer, which sees the races; without it, the results of
-// all threads must still agree.
+// First uses of the library, each in a process of its own. By eight threads at once: every table and cache that is made
+// on first use is made under contention; ThreadSanitizer sees the races, and without it the results of all threads must
+// still agree. By a caller of another rounding mode: later results must not tell.
 //   vexel_first_use plans | conversions | planar | colour
 #include <barrier>
 #include <bit>
+#include <cfenv>
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
 #include <functional>
 #include <string>
+#include <sys/wait.h>
 #include <thread>
+#include <unistd.h>
 #include <vector>
 
 #include "vexel/color_space.h"
@@ -80,6 +83,11 @@ void UseConversions(size_t start, Digest& digest) {
   ForEachItem(formats.size() * formats.size() / 5, start, [&](size_t item) {  // every fifth pair meets all formats
     Convert(formats[5 * item / formats.size()], formats[5 * item % formats.size()], item, digest);
   });
+  const std::vector<uint8_t> codes = Content(VX_PixelFormat::ARGB_4444_15u);
+  std::vector<float> display(4 * kWidth * kHeight);
+  VX_Convert_16uARGB_To_32fBGRX_Remove_CanonLog3_Apply_709(codes.data(), 8 * kWidth, display.data(), 16 * kWidth,
+                                                           kWidth, kHeight, 0);
+  digest.Add(0, display.data(), 4 * display.size());
 }
 
 void UsePlanar(size_t start, Digest& digest) {
@@ -125,6 +133,27 @@ struct Scenario {
 constexpr Scenario kScenarios[] = {
     {"plans", UsePlans}, {"conversions", UseConversions}, {"planar", UsePlanar}, {"colour", UseColour}};
 
+// What a new process gives after its first use under a rounding mode; 0 if it gives nothing.
+uint64_t SumAfterFirstUse(Use use, int rounding) {
+  int pipes[2];
+  uint64_t sum = 0;
+  if (pipe(pipes) != 0) return 0;
+  if (const pid_t child = fork(); child != 0) {
+    close(pipes[1]);
+    if (read(pipes[0], &sum, sizeof sum) != sizeof sum) sum = 0;
+    close(pipes[0]);
+    return waitpid(child, nullptr, 0) == child ? sum : 0;
+  }
+  Digest first, second;
+  VX_Initialize();
+  std::fesetround(rounding);
+  use(0, first);
+  std::fesetround(FE_TONEAREST);
+  use(0, second);
+  sum = second.Sum();
+  _exit(write(pipes[1], &sum, sizeof sum) == sizeof sum ? 0 : 1);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -132,6 +161,10 @@ int main(int argc, char** argv) {
   for (const Scenario& scenario : kScenarios)
     if (argc == 2 && std::strcmp(argv[1], scenario.name) == 0) use = scenario.use;
   if (!use) return std::fprintf(stderr, "usage: vexel_first_use plans|conversions|planar|colour\n"), 2;
+
+  const uint64_t expected = SumAfterFirstUse(use, FE_TONEAREST);
+  for (const int rounding : {FE_UPWARD, FE_DOWNWARD, FE_TOWARDZERO})
+    if (SumAfterFirstUse(use, rounding) != expected) return std::puts("a first use left its rounding mode"), 1;
 
   VX_Initialize();
   Digest digests[kThreads];
@@ -146,6 +179,6 @@ int main(int argc, char** argv) {
   }
   VX_Terminate();
   for (const Digest& digest : digests)
-    if (digest.Sum() != digests[0].Sum()) return std::puts("the threads disagree"), 1;
+    if (digest.Sum() != expected) return std::puts("the threads disagree"), 1;
   return 0;
 }
