@@ -4,12 +4,9 @@
 // single precision, and the spread over some runs tells how far honest float arithmetic may stray for that very pixel.
 #pragma once
 
-#include <algorithm>
 #include <array>
-#include <cmath>
-#include <functional>
 
-#include "support/Random.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

@@ -1,10 +1,6 @@
 // Powers, logarithms and exponentials: their vector forms, one array at a time, and what these give.
 #include "frame/Power.h"
-
-#include <bit>
-#include <cmath>
-#include <cstdint>
-#include <cstring>
+#include "support/Test.h"
 
 #undef HWY_TARGET_INCLUDE
 #define HWY_TARGET_INCLUDE "color/power_test.cpp"
@@ -68,10 +64,11 @@ void ExpsOf(const float* src, float* dst, size_t count, const vexel::power::Spli
   ForEachBlock(src, dst, count,
                [&](Block& block) HWY_ATTR { power::Exps(block.values, Block::kCount, log2Base, Same(), Same()); });
 }
-void Logs(const float* src, float* dst, size_t count) { LogsTo(src, dst, count, vexel::power::kNaturalLog); }
-void Log10s(const float* src, float* dst, size_t count) { LogsTo(src, dst, count, vexel::power::kDecimalLog); }
-void Exps(const float* src, float* dst, size_t count) { ExpsOf(src, dst, count, vexel::power::kLog2EShort); }
-void Exp10s(const float* src, float* dst, size_t count) { ExpsOf(src, dst, count, vexel::power::kLog2Of10Short); }
+using Y = PowerExponent;  // which these do not have
+void Logs(const float* src, float* dst, size_t n, const Y&) { LogsTo(src, dst, n, vexel::power::kNaturalLog); }
+void Log10s(const float* src, float* dst, size_t n, const Y&) { LogsTo(src, dst, n, vexel::power::kDecimalLog); }
+void Exps(const float* src, float* dst, size_t n, const Y&) { ExpsOf(src, dst, n, vexel::power::kLog2EShort); }
+void Exp10s(const float* src, float* dst, size_t n, const Y&) { ExpsOf(src, dst, n, vexel::power::kLog2Of10Short); }
 
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel::testing
@@ -80,52 +77,35 @@ HWY_AFTER_NAMESPACE();
 
 #if HWY_ONCE
 
-#include <functional>
-#include <limits>
-#include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
 #include <xmmintrin.h>
 
 #include "frame/KernelTable.h"
-#include "support/Random.h"
 #include "support/Ulp.h"
 
 namespace vexel::testing {
 namespace plain {
 
-void Powers(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  for (size_t i = 0; i < count; ++i) dst[i] = Power(src[i], y);
+using Y = PowerExponent;
+template <auto kFunction>
+void Map(const float* src, float* dst, size_t count, const Y& y) {
+  for (size_t i = 0; i < count; ++i) dst[i] = kFunction(src[i], y);
 }
-void SignedPowers(const float* src, float* dst, size_t count, const PowerExponent& y) {
-  for (size_t i = 0; i < count; ++i) dst[i] = SignedPower(src[i], y);
-}
-template <float (*kFunction)(float)>
-void Map(const float* src, float* dst, size_t count) {
-  for (size_t i = 0; i < count; ++i) dst[i] = kFunction(src[i]);
-}
-constexpr auto& Logs = Map<Log>;
-constexpr auto& Log10s = Map<Log10>;
-constexpr auto& Exps = Map<Exp>;
-constexpr auto& Exp10s = Map<Exp10>;
+constexpr auto& Powers = Map<[](float x, const Y& y) { return Power(x, y); }>;
+constexpr auto& SignedPowers = Map<[](float x, const Y& y) { return SignedPower(x, y); }>;
+constexpr auto& Logs = Map<[](float x, const Y&) { return Log(x); }>;
+constexpr auto& Log10s = Map<[](float x, const Y&) { return Log10(x); }>;
+constexpr auto& Exps = Map<[](float x, const Y&) { return Exp(x); }>;
+constexpr auto& Exp10s = Map<[](float x, const Y&) { return Exp10(x); }>;
 
 }  // namespace plain
 
 namespace {
 
-using PowerArray = void (*)(const float* src, float* dst, size_t count, const PowerExponent& y);
-using FunctionArray = void (*)(const float* src, float* dst, size_t count);
-
-const KernelVariants<PowerArray> kPowers = VX_KERNEL_VARIANTS(Powers);
-const KernelVariants<PowerArray> kSignedPowers = VX_KERNEL_VARIANTS(SignedPowers);
-const KernelVariants<FunctionArray> kLogs = VX_KERNEL_VARIANTS(Logs);
-const KernelVariants<FunctionArray> kLog10s = VX_KERNEL_VARIANTS(Log10s);
-const KernelVariants<FunctionArray> kExps = VX_KERNEL_VARIANTS(Exps);
-const KernelVariants<FunctionArray> kExp10s = VX_KERNEL_VARIANTS(Exp10s);
-
-constexpr float kInfinity = std::numeric_limits<float>::infinity();
-constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
+using Arrays = KernelVariants<void (*)(const float* src, float* dst, size_t count, const PowerExponent& y)>;
+const Arrays kPowers = VX_KERNEL_VARIANTS(Powers), kSignedPowers = VX_KERNEL_VARIANTS(SignedPowers),
+             kLogs = VX_KERNEL_VARIANTS(Logs), kLog10s = VX_KERNEL_VARIANTS(Log10s), kExps = VX_KERNEL_VARIANTS(Exps),
+             kExp10s = VX_KERNEL_VARIANTS(Exp10s);
+const PowerExponent kNone(1);
 
 // Arrays are multiples of three of the longest vectors.
 constexpr size_t kPowerBlock = 48;
@@ -155,11 +135,11 @@ struct Domain {
 const Domain kPositive[] = {{"all", 0, 0x7f800000, 60013}, {"pictures", 0x37800000, 0x41200000, 12007}};
 
 void ExpectWithinOneUlp(const std::string& what, const Domain& domain,
-                        const std::function<void(const float*, float*, size_t)>& f,
-                        const std::function<long double(long double)>& reference) {
+                        const std::function<long double(long double)>& reference, const Arrays& arrays,
+                        const PowerExponent& y = kNone) {
   const std::vector<float> in = Grid(domain.firstBits, domain.lastBits, domain.step);
   std::vector<float> out(in.size());
-  f(in.data(), out.data(), in.size());
+  arrays[ActiveKernelVariant()](in.data(), out.data(), in.size(), y);
   int failures = 0;
   for (size_t i = 0; i < in.size() && failures < 3; ++i) {
     const auto expected = static_cast<float>(reference(in[i]));
@@ -171,28 +151,26 @@ void ExpectWithinOneUlp(const std::string& what, const Domain& domain,
 
 TEST(Power, StaysWithinOneUlpOfTheCorrectlyRoundedResult) {
   for (const Domain& domain : kPositive)
-    for (const float y : kExponents) {
-      const PowerExponent exponent(y);
+    for (const float y : kExponents)
       ExpectWithinOneUlp(
-          "power " + std::to_string(y), domain,
-          [&](const float* s, float* d, size_t n) { kPowers[ActiveKernelVariant()](s, d, n, exponent); },
-          [y](long double x) { return std::pow(x, static_cast<long double>(y)); });
-    }
+          "power " + std::to_string(y), domain, [y](long double x) { return std::pow(x, static_cast<long double>(y)); },
+          kPowers, PowerExponent(y));
 }
 
 TEST(Power, LogarithmsAndExponentialsStayWithinOneUlp) {
   const Domain both[] = {{"positive", 0, 0x7f800000, 40009}, {"negative", 0x80000000, 0xff800000, 40009}};
-  const auto run = [](const KernelVariants<FunctionArray>& f) {
-    return [&f](const float* s, float* d, size_t n) { f[ActiveKernelVariant()](s, d, n); };
-  };
   const Domain nearOne{"near one", 0x3f000000, 0x40000000, 1009};
   for (const Domain& domain : {kPositive[0], kPositive[1], nearOne}) {
-    ExpectWithinOneUlp("log", domain, run(kLogs), [](long double x) { return std::log(x); });
-    ExpectWithinOneUlp("log10", domain, run(kLog10s), [](long double x) { return std::log10(x); });
+    ExpectWithinOneUlp(
+        "log", domain, [](long double x) { return std::log(x); }, kLogs);
+    ExpectWithinOneUlp(
+        "log10", domain, [](long double x) { return std::log10(x); }, kLog10s);
   }
   for (const Domain& domain : both) {
-    ExpectWithinOneUlp("exp", domain, run(kExps), [](long double x) { return std::exp(x); });
-    ExpectWithinOneUlp("exp10", domain, run(kExp10s), [](long double x) { return std::pow(10.0L, x); });
+    ExpectWithinOneUlp(
+        "exp", domain, [](long double x) { return std::exp(x); }, kExps);
+    ExpectWithinOneUlp(
+        "exp10", domain, [](long double x) { return std::pow(10.0L, x); }, kExp10s);
   }
 }
 
@@ -224,13 +202,13 @@ std::vector<float> AnyFloats(Random& random) {
 TEST(Power, EveryVariantGivesTheSameBitsWithAndWithoutFlushToZero) {
   Random random(5);
   const uint32_t mode = _mm_getcsr();
-  const auto compare = [&](const std::vector<float>& in, const auto& kernels, const auto&... more) {
+  const auto compare = [&](const std::vector<float>& in, const Arrays& arrays, const PowerExponent& y) {
     std::vector<float> expected(in.size()), got(in.size());
-    kernels[KernelVariant::Plain](in.data(), expected.data(), in.size(), more...);
+    arrays[KernelVariant::Plain](in.data(), expected.data(), in.size(), y);
     for (int v = 0; v <= static_cast<int>(ProcessorVariant()); ++v)
       for (const uint32_t flush : {0u, 0x8000u}) {
         _mm_setcsr(mode | flush);
-        kernels[static_cast<KernelVariant>(v)](in.data(), got.data(), in.size(), more...);
+        arrays[static_cast<KernelVariant>(v)](in.data(), got.data(), in.size(), y);
         _mm_setcsr(mode);
         for (size_t i = 0; i < in.size(); ++i)
           ASSERT_TRUE(SameBits(expected[i], got[i])) << "variant " << v << " flush " << flush << " of " << in[i] << ": "
@@ -245,7 +223,7 @@ TEST(Power, EveryVariantGivesTheSameBitsWithAndWithoutFlushToZero) {
     compare(in, kPowers, PowerExponent(y));
     compare(in, kSignedPowers, PowerExponent(y));
   }
-  for (const auto* kernels : {&kLogs, &kLog10s, &kExps, &kExp10s}) compare(AnyFloats(random), *kernels);
+  for (const Arrays* arrays : {&kLogs, &kLog10s, &kExps, &kExp10s}) compare(AnyFloats(random), *arrays, kNone);
 }
 
 TEST(Power, SpecialValuesFollowTheLanguage) {

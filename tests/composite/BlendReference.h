@@ -1,11 +1,9 @@
 // The blend modes in double precision, pixel by pixel, from their published formulas.
 #pragma once
 
-#include <algorithm>
 #include <array>
-#include <cmath>
-#include <utility>
 
+#include "support/Test.h"
 #include "vexel/compositing.h"
 
 namespace vexel::testing {

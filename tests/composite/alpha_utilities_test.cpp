@@ -1,50 +1,15 @@
 // The alpha utilities against formulas of their own, in the armed arena and refused.
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <climits>
-#include <cmath>
-#include <cstring>
-#include <functional>
-#include <limits>
-#include <string>
-#include <utility>
-#include <vector>
-
 #include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
-
 // The formats that gains work in: those with an alpha that counts, in 8u and 32f.
 bool HasGainKernel(F f) { return IsPixels(f) && AlphaKind(f) != kAlphaIgnored && Depth(f) != kDepth15u; }
-double FullScale(F f) { return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth15u ? 32768 : 1; }
-
-double Get(const uint8_t* samples, size_t i, F f) {
-  if (Depth(f) == kDepth8u) return samples[i];
-  uint16_t word;
-  float real;
-  std::memcpy(&word, samples + 2 * i, 2);
-  if (Depth(f) == kDepth15u) return word;
-  std::memcpy(&real, samples + 4 * i, 4);
-  return double{real};
-}
-void Put(uint8_t* samples, size_t i, F f, double value) {
-  if (Depth(f) == kDepth8u) {
-    samples[i] = static_cast<uint8_t>(value);
-  } else if (Depth(f) == kDepth15u) {
-    const auto word = static_cast<uint16_t>(static_cast<int>(value));
-    std::memcpy(samples + 2 * i, &word, 2);
-  } else {
-    const auto real = static_cast<float>(value);
-    std::memcpy(samples + 4 * i, &real, 4);
-  }
-}
 
 std::vector<F> FormatsThat(const std::function<bool(F)>& fit) {
   std::vector<F> formats;
@@ -115,7 +80,7 @@ Operation MatteOperation(double m0, double m1, double m2, double m3) {
   return {"VX_UnPremultiplyAgainstMatteColor", IsMatted, false,
           [=](const ArenaFrame& s, const ArenaFrame& d) {
             uint8_t pixel[16];
-            for (size_t k = 0; k < 4; ++k) Put(pixel, k, d.format, of(d.format, matte[k]));
+            for (size_t k = 0; k < 4; ++k) PutSample(pixel, k, d.format, of(d.format, matte[k]));
             return RemoveMatte(s, d, pixel, d.format);
           },
           [=](F f, const double* in, double* out) {
@@ -190,20 +155,20 @@ TEST(AlphaUtilities, WholeDomains) {
       Image src(f, 256, 256), dst(f, 256, 256);
       for (size_t i = 0; i < 65536; ++i)
         for (size_t k = 0; k < 4; ++k) {
-          Put(src.bytes.data(), 4 * i + k, f, DomainSample(f, i, k));
-          Put(dst.bytes.data(), 4 * i + k, f, DomainSample(f, i + 7, k));
+          PutSample(src.bytes.data(), 4 * i + k, f, DomainSample(f, i, k));
+          PutSample(dst.bytes.data(), 4 * i + k, f, DomainSample(f, i + 7, k));
         }
       const auto before = dst.bytes;
       ASSERT_EQ(operation.run(src, dst), VX_Success) << operation.name;
       for (size_t i = 0; i < 65536; ++i) {
         double in[4], out[4];
         for (size_t k = 0; k < 4; ++k) {
-          in[k] = Get(src.bytes.data(), 4 * i + k, f);
-          out[k] = Get(before.data(), 4 * i + k, f);
+          in[k] = SampleAt(src.bytes.data(), 4 * i + k, f);
+          out[k] = SampleAt(before.data(), 4 * i + k, f);
         }
         operation.formula(f, in, out);
         for (size_t k = 0; k < 4; ++k)
-          ASSERT_PRED2(AreAlike, Get(dst.bytes.data(), 4 * i + k, f), out[k])
+          ASSERT_PRED2(AreAlike, SampleAt(dst.bytes.data(), 4 * i + k, f), out[k])
               << operation.name << " of " << FormatName(f) << ", channel " << k << " of " << in[0] << " " << in[1]
               << " " << in[2] << " " << in[3];
       }
@@ -298,7 +263,6 @@ TEST(AlphaUtilities, OpacityThatDoesNothing) {
 }
 
 TEST(AlphaUtilities, ConstantAlphas) {
-  constexpr float kInfinity = std::numeric_limits<float>::infinity();
   struct {
     float alpha;
     int code8, code15;

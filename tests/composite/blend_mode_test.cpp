@@ -1,11 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <algorithm>
-#include <cmath>
-#include <cstring>
-#include <limits>
-#include <string>
-#include <vector>
 
 #include "composite/BlendReference.h"
 #include "frame/RuntimeRandom.h"
@@ -14,16 +7,15 @@
 #include "support/Image.h"
 #include "support/Operations.h"
 #include "support/Processor.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
 using M = VX_BlendMode;
 using Floats = std::vector<float>;
 using Bytes = std::vector<uint8_t>;
 
-constexpr float kNan = std::numeric_limits<float>::quiet_NaN();
 constexpr F kFloats = F::BGRA_4444_32f, kBytes = F::BGRA_4444_8u;
 
 const char* ModeName(M mode) {
@@ -130,11 +122,11 @@ TEST(BlendMode, Edges) {
       {M::LighterColor, 0.5f, {0.25f, 0.5f, 1, 0.5f}, {9, 9, 9, 8.4e-6f}, {9, 9, 9, 8.4e-6f}},
       {M::LighterColor, 1, {1, 1, 1, 8.4e-6f}, {0.5f, -3, 0.25f, 0}, {1, 1, 1, 8.4e-6f}},
       // NaN stays in its channel, and in the pixel where it is an alpha.
-      {M::Screen, 1, {kNan, 1, 0.5f, 1}, {0.5f, kNan, 0.5f, 1}, {kNan, kNan, 0.75f, 1}},
-      {M::Luminosity, 1, {kNan, 0, 0, 1}, {0.5f, 0.5f, 0.5f, 1}, {kNan, 0, 0, 1}},
-      {M::Multiply, 1, {1, 1, 1, kNan}, {1, 1, 1, 1}, {kNan, kNan, kNan, kNan}},
+      {M::Screen, 1, {kNaN, 1, 0.5f, 1}, {0.5f, kNaN, 0.5f, 1}, {kNaN, kNaN, 0.75f, 1}},
+      {M::Luminosity, 1, {kNaN, 0, 0, 1}, {0.5f, 0.5f, 0.5f, 1}, {kNaN, 0, 0, 1}},
+      {M::Multiply, 1, {1, 1, 1, kNaN}, {1, 1, 1, 1}, {kNaN, kNaN, kNaN, kNaN}},
       // A NaN opacity shows nothing of the source.
-      {M::Difference, kNan, {1, 1, 1, 1}, {0.25f, 0.5f, 0.75f, 0.5f}, {0.25f, 0.5f, 0.75f, 0.5f}},
+      {M::Difference, kNaN, {1, 1, 1, 1}, {0.25f, 0.5f, 0.75f, 0.5f}, {0.25f, 0.5f, 0.75f, 0.5f}},
   };
   for (const OnePixel& c : cases) {
     const Floats out = BlendFloats(c.mode, c.src, c.background, 1, c.opacity);
@@ -243,7 +235,7 @@ TEST(Dissolve, DrawsOnlyWhereNeededRowByRow) {
         const auto count = static_cast<size_t>(kWidth * height);
         Floats src(count * 4), background(count * 4, -1.0f);
         Random random(static_cast<uint64_t>(height));
-        static constexpr float kAlphas[] = {0, 7e-6f, 9e-6f, 0.2f, 0.6f, 1, 3, -0.5f, -1e-5f, kNan};
+        static constexpr float kAlphas[] = {0, 7e-6f, 9e-6f, 0.2f, 0.6f, 1, 3, -0.5f, -1e-5f, kNaN};
         for (size_t i = 0; i < count; ++i) {
           for (size_t k = 0; k < 3; ++k) src[4 * i + k] = static_cast<float>(random.Int(0, 255)) / 255;
           src[4 * i + 3] = inBytes ? static_cast<float>(random.Int(0, 255)) / 255 : kAlphas[random.Int(0, 9)];

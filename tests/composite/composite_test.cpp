@@ -1,24 +1,13 @@
 // Source-over, over black, cross-dissolves and sums against their formulas and their own rules.
-#include <climits>
-#include <cmath>
-#include <cstring>
-#include <limits>
-#include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
-
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
-
-using F = VX_PixelFormat;
 
 // Source-over by the definition; codes and alphas in 0..1. The two pictures' parts of a channel are premultiplied and
 // count from black.
@@ -205,7 +194,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
 
       Image plain(dst, kWidth, kHeight);
       ASSERT_EQ(Convert(d, plain), VX_Success);
-      for (const float none : {0.0f, 7.9e-6f, -1.0f, std::numeric_limits<float>::quiet_NaN()}) {
+      for (const float none : {0.0f, 7.9e-6f, -1.0f, kNaN}) {
         ASSERT_EQ(Composite(s, d, out, none), VX_Success);
         ASSERT_EQ(out.bytes, plain.bytes);
       }
@@ -215,7 +204,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
         ASSERT_EQ(Convert(s, plain), VX_Success);
         ASSERT_EQ(one.bytes, plain.bytes);
       }
-      for (const float full : {0.999995f, 7.0f, std::numeric_limits<float>::infinity()}) {
+      for (const float full : {0.999995f, 7.0f, kInfinity}) {
         ASSERT_EQ(Composite(s, d, out, full), VX_Success);
         ASSERT_EQ(out.bytes, one.bytes);
       }
@@ -309,7 +298,7 @@ TEST(CompositeToBlack, ConvertsIntoAndOutOfTheWorkingFormat) {
           ASSERT_EQ(out.bytes, w.Converted(dst, hint).bytes);
           Image black(dst, 391, 2);
           ASSERT_EQ(FillWith(VX_FillWithOpaqueBlack, black), VX_Success);
-          for (const float none : {0.0f, 7e-6f, -1.0f, std::numeric_limits<float>::quiet_NaN()}) {
+          for (const float none : {0.0f, 7e-6f, -1.0f, kNaN}) {
             ASSERT_EQ(ToBlack(s, out, none, hint), VX_Success);
             ASSERT_EQ(out.bytes, black.bytes);
           }
@@ -498,12 +487,11 @@ TEST(CrossDissolve, MixesInTheWorkingFormat) {
 }
 
 TEST(CrossDissolve, EndsAreConversions) {
-  constexpr float kInf = std::numeric_limits<float>::infinity();
+  constexpr float kInf = kInfinity;
   const Image a(F::VUYA_4444_8u, 33, 4, 1), b(F::UYVY_422_8u_709, 33, 4, 2);
   Image out(F::ARGB_4444_15u, 33, 4, 3), place = out;
   const Image isA = a.Converted(out.format), isB = b.Converted(out.format);
-  for (const float mix : {0.0f, 7.9e-6f, -0.5f, -kInf, std::numeric_limits<float>::quiet_NaN(), 1e-3f, 0.999f, 1.0f,
-                          1 - 5e-6f, 2.0f, kInf}) {
+  for (const float mix : {0.0f, 7.9e-6f, -0.5f, -kInf, kNaN, 1e-3f, 0.999f, 1.0f, 1 - 5e-6f, 2.0f, kInf}) {
     ASSERT_EQ(Dissolve(a, b, out, mix), VX_Success);
     EXPECT_EQ(out.bytes == isA.bytes, !(mix >= 8e-6f)) << mix;
     EXPECT_EQ(out.bytes == isB.bytes, mix > 0.9999f) << mix;

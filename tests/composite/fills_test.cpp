@@ -1,21 +1,15 @@
-#include <gtest/gtest.h>
 
-#include <cstring>
-#include <functional>
-#include <string>
 #include <tuple>
-#include <vector>
 
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/Image.h"
 #include "support/Operations.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
 using Bytes = std::vector<uint8_t>;
 
 const struct {
@@ -102,19 +96,16 @@ TEST(Fills, PlanesOf420) {
         void* planes[3];
         int32_t pitch[3];
         VX_GetPlanarBuffers(nullptr, format, width, height, planes, pitch);
-        const bool deep = Depth(format) == kDepth10u, biplanar = planes[2] == nullptr;
+        const bool biplanar = planes[2] == nullptr;
+        const size_t sampleBytes = Depth(format) == kDepth10u ? 2 : 1;
         for (int plane = 0; plane < (biplanar ? 2 : 3); ++plane) {
-          const int round = biplanar ? 1 : 0;
-          const int rows = plane == 0 ? height : (height + round) / 2;
-          const int samples = plane == 0 ? width : (width + round) / 2 * (biplanar ? 2 : 1);
+          const int rows = plane == 0 ? height : (height + biplanar) / 2;
+          const int samples = plane == 0 ? width : (width + biplanar) / 2 * (biplanar ? 2 : 1);
           const uint8_t code = plane != 0 ? 128 : f.white ? 235 : 16;
           for (int row = 0; row < rows; ++row)
-            for (int i = 0; i < samples; ++i) {
-              const size_t at = reinterpret_cast<size_t>(planes[plane]) + static_cast<size_t>(row * pitch[plane]);
-              if (!deep) expected[at + static_cast<size_t>(i)] = code;
-              if (deep)
-                expected[at + static_cast<size_t>(2 * i)] = 0, expected[at + static_cast<size_t>(2 * i + 1)] = code;
-            }
+            for (size_t i = 0; i < static_cast<size_t>(samples) * sampleBytes; ++i)
+              expected[reinterpret_cast<size_t>(planes[plane]) + static_cast<size_t>(row * pitch[plane]) + i] =
+                  (i + 1) % sampleBytes == 0 ? code : 0;
         }
         ASSERT_EQ(f.fill(block.data(), 0, width, height, format), VX_Success);
         ASSERT_EQ(block, expected);

@@ -1,17 +1,8 @@
 // What holds for every operation on pictures: what it refuses, where it reads and writes, the destination in the place
 // of a source, any number of threads, ways past the cache, strides of gigabytes, failing allocations.
-#include <gtest/gtest.h>
 #include <vexel_host/host.h>
 #include <xmmintrin.h>
 
-#include <algorithm>
-#include <climits>
-#include <cstring>
-#include <functional>
-#include <string>
-#include <vector>
-
-#include "formats/FormatBits.h"
 #include "frame/RuntimeRandom.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
@@ -19,11 +10,11 @@
 #include "support/Image.h"
 #include "support/Operations.h"
 #include "support/Processor.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
 using Sources = const ArenaFrame*;
 using To = const ArenaFrame&;
 

@@ -1,13 +1,10 @@
 // Runs of row kernels over typed rows. Variants, tails and memory are for ConvertArena.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
-#include <vector>
-
 #include "convert/RowKernel.h"
 #include "frame/FpModeGuard.h"
 #include "support/Arena.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

@@ -1,19 +1,12 @@
 // Moves of channels bit by bit, and kernels that do at once what others do one after the other: byte for byte the same.
-#include <cstdint>
-#include <cstring>
-#include <vector>
-
-#include <gtest/gtest.h>
-
 #include "convert/RgbKernels.h"
 #include "convert/RowKernelCheck.h"
 #include "convert/YuvKernels.h"
-#include "formats/FormatBits.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
 using Steps = std::vector<const RowKernelSet*>;
 
 template <class T>

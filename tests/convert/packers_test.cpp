@@ -1,20 +1,11 @@
 // Codec packers and camera converters against formulas of their own, sample by sample.
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <bit>
-#include <climits>
-#include <cmath>
-#include <cstring>
-#include <limits>
 #include <numeric>
-#include <vector>
 #include <xmmintrin.h>
 
 #include "support/Arena.h"
 #include "support/PaddedRows.h"
 #include "support/Processor.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 
 namespace vexel {
 namespace {

@@ -1,15 +1,11 @@
+#include "support/Test.h"
 #include "vexel/resample_kernel.h"
 
-#include <gtest/gtest.h>
 #include <sys/ptrace.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cmath>
 #include <csignal>
-#include <functional>
-#include <string>
-#include <vector>
 
 #include "zovcore/Config.h"
 

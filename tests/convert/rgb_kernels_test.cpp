@@ -1,23 +1,13 @@
 // RGB kernels over their whole domains in double precision: depths, 10-bit words, premultiplied alpha, linear light.
-#include <algorithm>
-#include <bit>
-#include <cmath>
-#include <cstdint>
-#include <limits>
 #include <numeric>
-#include <vector>
-
-#include <gtest/gtest.h>
 
 #include "convert/RgbKernels.h"
 #include "convert/RowKernelCheck.h"
-#include "support/Random.h"
+#include "support/Test.h"
 #include "support/Ulp.h"
 
 namespace vexel::testing {
 namespace {
-
-constexpr float kInfinity = std::numeric_limits<float>::infinity(), kNaN = std::numeric_limits<float>::quiet_NaN();
 
 // ---- Depths
 
@@ -228,7 +218,7 @@ TEST(LinearKernels, CurveBothWays) {
   std::vector<float> source;
   Random random(24);
   while (source.size() < 4096) source.push_back(random.Float(0.01f, 1.5f));
-  for (const float rare : {0.0f, 1e-45f, 1e-30f, 3e38f, kInfinity}) {
+  for (const float rare : {0.0f, 1e-45f, 1e-30f, 3e38f, kInfinity, std::bit_cast<float>(0x7F800001)}) {
     source.push_back(rare);
     while (source.size() % 1023 != 0) source.push_back(random.Float(0.0f, 1.5f));
   }
@@ -241,29 +231,9 @@ TEST(LinearKernels, CurveBothWays) {
     for (size_t i = 0; i < source.size(); ++i) {
       const double expected = i % 4 == 3 ? double{source[i]} : SignedPow(source[i], exponent);
       ASSERT_LE(UlpError(got[i], expected), i % 4 == 3 ? 0 : 1.5) << source[i] << " to " << exponent;
-      ASSERT_EQ(std::signbit(got[i]), std::signbit(source[i]));
+      ASSERT_TRUE(std::isnan(source[i]) || std::signbit(got[i]) == std::signbit(source[i]));
     }
   }
-}
-
-TEST(LinearKernels, NaNStaysNaN) {
-  const std::vector<float> source(4 * 19, std::bit_cast<float>(0x7F800001));
-  for (const RowKernelSet* kernels : {&kBgra32fToLinear, &kLinearToBgra32f})
-    for (const float value : RunKernel<float>(*kernels, source, 19, source.size())) EXPECT_TRUE(std::isnan(value));
-  EXPECT_EQ(RunKernel<uint8_t>(kLinearToBgra8, source, 19, source.size()), std::vector<uint8_t>(source.size(), 0));
-}
-
-TEST(LinearKernels, EightBitCodes) {
-  std::vector<uint8_t> codes;
-  for (int c = 0; c < 256; ++c)
-    codes.insert(codes.end(), {static_cast<uint8_t>(c), static_cast<uint8_t>(255 - c), static_cast<uint8_t>(c * 3),
-                               static_cast<uint8_t>(c * 7)});
-  const auto light = RunKernel<float>(kBgra8ToLinear, codes, 256, codes.size());
-  for (size_t i = 0; i < codes.size(); ++i) {
-    if (i % 4 == 3) continue;
-    ASSERT_NEAR(light[i], std::pow(codes[i] / 255.0, 2.4), 1e-6) << int{codes[i]};
-  }
-  EXPECT_EQ(RunKernel<uint8_t>(kLinearToBgra8, light, 256, codes.size()), codes);
 }
 
 // Light to 8u is the curve and the narrowing of 32f, exactly so beside every threshold between two codes, where the

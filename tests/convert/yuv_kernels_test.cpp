@@ -1,16 +1,8 @@
 // Y'CbCr kernels against the equations: matrices, depths, and 4:2:2 in every packing.
-#include <algorithm>
-#include <cmath>
-#include <cstring>
-#include <limits>
-#include <vector>
-
-#include <gtest/gtest.h>
-
 #include "convert/RowKernelCheck.h"
 #include "convert/YuvKernels.h"
 #include "convert/YuvReference.h"
-#include "support/Random.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
@@ -19,8 +11,6 @@ using Bytes = std::vector<uint8_t>;
 using Words = std::vector<uint32_t>;
 using Floats = std::vector<float>;
 using Map = Triple (*)(const Triple&);
-
-constexpr float kNan = std::numeric_limits<float>::quiet_NaN(), kInfinity = std::numeric_limits<float>::infinity();
 
 // ---- Matrices
 
@@ -115,7 +105,7 @@ TEST(YuvKernels, SpecialValuesReachOnlyTheirChannels) {
     for (const float value : RunKernel<float>(*kernels, pixel, 1, 4)) result.push_back(std::isfinite(value));
     return result;
   };
-  for (const float bad : {kInfinity, kNan}) {
+  for (const float bad : {kInfinity, kNaN}) {
     for (const RowKernelSet* kernels : {&kVuya32fToBgra32f_601, &kVuya32fToBgra32f_709}) {
       EXPECT_EQ(finite(kernels, {bad, 0.25f, 0.5f, 1}), (std::vector{true, false, false, true}));
       EXPECT_EQ(finite(kernels, {0.25f, bad, 0.5f, 1}), (std::vector{false, false, true, true}));
@@ -155,7 +145,7 @@ TEST(YuvKernels, NarrowingSaturates) {
     float value;
     uint8_t chroma, luma, alpha;
   } const kValues[] = {{-1, 0, 0, 0},         {1, 255, 235, 255},    {2, 255, 255, 255},   {-100, 0, 0, 0},
-                       {0.5f, 240, 126, 128}, {kNan, 0, 0, 0},       {kInfinity, 0, 0, 0}, {-kInfinity, 0, 0, 0},
+                       {0.5f, 240, 126, 128}, {kNaN, 0, 0, 0},       {kInfinity, 0, 0, 0}, {-kInfinity, 0, 0, 0},
                        {1e10f, 0, 0, 0},      {8e6f, 255, 255, 255}, {-1e10f, 0, 0, 0},    {1e-40f, 128, 16, 0}};
   for (const auto& [value, chroma, luma, alpha] : kValues)
     for (const auto& depth : kDepths) {
@@ -360,7 +350,7 @@ TEST(YuvKernels, V210Layout) {
   EXPECT_EQ(RunKernel<uint32_t>(kUyvy32fToV210, Floats(8, 0.0f), 3, 4),
             PackCodes({512, 64, 512, 64, 512, 64, 512, 64, 512, 64, 512, 64}));
   EXPECT_EQ(RunKernel<uint32_t>(kUyvy32fToV210,
-                                Floats{kNan, kNan, 1, 2, -1, -1, kInfinity, 1, 0.5f, -kInfinity, -0.5f, 1e20f}, 6, 4),
+                                Floats{kNaN, kNaN, 1, 2, -1, -1, kInfinity, 1, 0.5f, -kInfinity, -0.5f, 1e20f}, 6, 4),
             PackCodes({0, 0, 1023, 1023, 0, 0, 0, 940, 960, 0, 64, 0}));
 }
 

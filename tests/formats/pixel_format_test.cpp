@@ -1,17 +1,11 @@
 // The catalogue of formats, its mapping to the host; buffers, flips and pixel addresses.
-#include <cstring>
 #include <set>
 #include <sstream>
-#include <string>
-#include <vector>
 #include <vexel_host/host.h>
 
-#include <gtest/gtest.h>
-
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/FailingAllocations.h"
-#include "support/Random.h"
+#include "support/Test.h"
 #include "vexel/host_types.h"
 
 namespace vexel::testing {

@@ -1,17 +1,12 @@
 // The embedded host.
-#include <gtest/gtest.h>
 #include <stdlib.h>
 #include <unistd.h>
 
-#include <cstring>
 #include <fstream>
-#include <string>
 #include <thread>
-#include <vector>
 
 #include "frame/RuntimeRandom.h"
-#include "support/Random.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 #include "vexel_host/host.h"
 #include "zovcore/Config.h"
 #include "zovcore/Debug.h"

@@ -2,12 +2,9 @@
 #include <boost/make_shared.hpp>
 #include <fstream>
 #include <map>
-#include <string>
 #include <unistd.h>
-#include <vector>
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "frame/Bands.h"
 #include "frame/CacheInfo.h"
@@ -15,8 +12,8 @@
 #include "frame/Features.h"
 #include "frame/KernelVariant.h"
 #include "frame/Lifecycle.h"
+#include "support/Test.h"
 #include "vexel/version.h"
-#include "vexel/vexel.h"
 #include "vexel_host/host.h"
 #include "zovcore/Debug.h"
 #include "zovcore/Utility.h"

@@ -1,24 +1,17 @@
 // Bands of rows over processors, copies of memory, primitives on images.
-#include <algorithm>
 #include <atomic>
 #include <boost/make_shared.hpp>
-#include <climits>
-#include <cmath>
 #include <mutex>
 #include <set>
 #include <stdexcept>
 #include <thread>
-#include <vector>
 #include <xmmintrin.h>
-
-#include <gtest/gtest.h>
 
 #include "frame/Bands.h"
 #include "frame/ImagePrimitives.h"
 #include "frame/StreamCopy.h"
 #include "support/Processor.h"
-#include "support/Random.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 #include "vexel_host/host.h"
 
 namespace vexel::testing {

@@ -1,20 +1,12 @@
 // Transposes and rotations, element by element.
-#include <gtest/gtest.h>
-
-#include <climits>
-#include <cstring>
-#include <string>
-
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/Operations.h"
 #include "support/PaddedRows.h"
 #include "support/Processor.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
-
-using F = VX_PixelFormat;
 
 // A transpose is the turn by 270 degrees of a flipped picture.
 struct Turn {

@@ -6,19 +6,16 @@
 #include <unistd.h>
 #include <xmmintrin.h>
 
-#include <algorithm>
 #include <array>
-#include <cmath>
 #include <cstdio>
-#include <cstring>
 #include <memory>
 #include <numeric>
 #include <stdexcept>
 #include <system_error>
 
-#include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
 #include "support/Formats.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {

@@ -6,16 +6,8 @@
 // is mapped once; sources are written through a second, writable view of the same pages.
 #pragma once
 
-#include <cstdint>
-#include <functional>
-#include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
-
 #include "convert/RowKernel.h"
-#include "support/Random.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

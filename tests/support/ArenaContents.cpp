@@ -1,10 +1,6 @@
 // What the arena's pictures hold.
-#include <bit>
-#include <cmath>
-#include <limits>
-
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {

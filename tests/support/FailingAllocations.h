@@ -1,13 +1,9 @@
 // Lets the allocations of an operation fail, one after another.
 #pragma once
 
-#include <gtest/gtest.h>
 #include <vexel_host/host.h>
 
-#include <functional>
-#include <string>
-
-#include "vexel/vexel.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

@@ -2,11 +2,8 @@
 #pragma once
 
 #include <cstdio>
-#include <string>
-#include <vector>
 
-#include "formats/FormatBits.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

@@ -1,15 +1,10 @@
 // Pictures in memory of their own, for tests of operations on several of them.
 #pragma once
 
-#include <cstdint>
-#include <string>
-#include <vector>
-
-#include "formats/FormatBits.h"
 #include "support/Arena.h"
 #include "support/Operations.h"
 #include "support/PaddedRows.h"
-#include "support/Random.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 
@@ -44,6 +39,29 @@ struct Image {
 
 // Where the alpha of a pixel of four channels is.
 inline size_t AlphaAt(VX_PixelFormat format) { return IsReversed(format) ? 0 : 3; }
+
+// Samples of 8u, 15u and 32f as numbers.
+inline double FullScale(VX_PixelFormat f) { return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth15u ? 32768 : 1; }
+inline size_t SampleBytes(VX_PixelFormat f) { return Depth(f) == kDepth8u ? 1 : Depth(f) == kDepth15u ? 2 : 4; }
+inline size_t SampleCount(const Image& image) { return image.bytes.size() / SampleBytes(image.format); }
+
+inline double SampleAt(const uint8_t* samples, size_t i, VX_PixelFormat f) {
+  uint16_t word = samples[i * SampleBytes(f)];
+  float real;
+  if (Depth(f) != kDepth8u) std::memcpy(&word, samples + 2 * i, 2);
+  if (Depth(f) != kDepth32f) return word;
+  std::memcpy(&real, samples + 4 * i, 4);
+  return double{real};
+}
+inline void PutSample(uint8_t* samples, size_t i, VX_PixelFormat f, double value) {
+  const auto put = [&](auto sample) { std::memcpy(samples + i * sizeof sample, &sample, sizeof sample); };
+  if (Depth(f) == kDepth32f)
+    put(static_cast<float>(value));
+  else if (Depth(f) == kDepth15u)
+    put(static_cast<uint16_t>(static_cast<int>(value)));
+  else
+    put(static_cast<uint8_t>(value));
+}
 
 // Whether pixels have a fourth channel, and whether a matte colour may be taken from them.
 inline bool IsPixels(VX_PixelFormat f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }

@@ -1,12 +1,9 @@
 // The operations on pictures, each called with frames.
 #pragma once
 
-#include <cstdint>
-#include <vector>
-
 #include "support/Arena.h"
+#include "support/Test.h"
 #include "vexel/compositing.h"
-#include "vexel/vexel.h"
 
 namespace vexel::testing {
 

@@ -1,12 +1,9 @@
 // Rows of any bytes, of either direction, inside a larger block at a cache line, whose rest must stay as it was.
 #pragma once
 
-#include <cstdint>
-#include <cstring>
 #include <new>
-#include <vector>
 
-#include "support/Random.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

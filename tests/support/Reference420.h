@@ -2,16 +2,11 @@
 // Nothing here is shared with the library but the layout of blocks.
 #pragma once
 
-#include <algorithm>
 #include <array>
-#include <cmath>
-#include <cstdint>
-#include <vector>
 
 #include "convert/YuvReference.h"
 #include "support/Formats.h"
-#include "support/Random.h"
-#include "vexel/vexel.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 

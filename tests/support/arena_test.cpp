@@ -1,19 +1,18 @@
 // Proves the harness: operations with a fault each, which the arena must name.
+#include <gmock/gmock.h>
+
 #include "support/Arena.h"
 
-#include <gmock/gmock.h>
 #include <xmmintrin.h>
 
 #include <csignal>
-#include <cstring>
 
-#include "formats/FormatBits.h"
 #include "frame/KernelVariant.h"
+#include "support/Test.h"
 
 namespace vexel::testing {
 namespace {
 
-using F = VX_PixelFormat;
 // What happens to the last row besides a copy.
 using Spoil = std::function<void(uint8_t* src, uint8_t* dst, size_t bytes)>;
 

@@ -3,22 +3,12 @@
 #include <gtest/gtest.h>
 
 #include <cstdio>
-#include <optional>
 #include <string_view>
 
 #include "frame/KernelVariant.h"
 #include "vexel/vexel.h"
 
-namespace {
-
-std::optional<vexel::KernelVariant> VariantFromName(std::string_view name) {
-  for (int i = 0; i < vexel::kKernelVariantCount; ++i)
-    if (const auto variant = static_cast<vexel::KernelVariant>(i); name == vexel::KernelVariantName(variant))
-      return variant;
-  return std::nullopt;
-}
-
-}  // namespace
+using namespace vexel;
 
 int main(int argc, char** argv) {
   testing::InitGoogleMock(&argc, argv);
@@ -33,19 +23,19 @@ int main(int argc, char** argv) {
     name = argument.substr(kVariant.size());
   }
   VX_Initialize();
-  if (!name.empty()) {
-    const auto variant = VariantFromName(name);
-    if (!variant) {
-      std::fprintf(stderr, "vexel_tests: unknown variant %s\n", name.data());
-      return 2;
-    }
-    if (*variant > vexel::ProcessorVariant()) {
+  int variant = 0;
+  while (variant < kKernelVariantCount && name != KernelVariantName(static_cast<KernelVariant>(variant))) ++variant;
+  if (variant < kKernelVariantCount) {
+    if (static_cast<KernelVariant>(variant) > ProcessorVariant()) {
       std::printf("SKIPPED: this processor has no %s; its best is %s\n", name.data(),
-                  vexel::KernelVariantName(vexel::ProcessorVariant()));
+                  KernelVariantName(ProcessorVariant()));
       VX_Terminate();
       return 0;
     }
-    vexel::LimitKernelVariant(*variant);
+    LimitKernelVariant(static_cast<KernelVariant>(variant));
+  } else if (!name.empty()) {
+    std::fprintf(stderr, "vexel_tests: unknown variant %s\n", name.data());
+    return 2;
   }
   const int failed = RUN_ALL_TESTS();
   VX_Terminate();

@@ -15,9 +15,11 @@
 #include <unistd.h>
 #include <vector>
 
+#include "support/Formats.h"
 #include "vexel/color_space.h"
 #include "vexel/vexel.h"
 
+namespace vexel::testing {
 namespace {
 
 constexpr int kThreads = 8, kWidth = 14, kHeight = 6;
@@ -35,15 +37,6 @@ class Digest {
  private:
   uint64_t mSum = 0;
 };
-
-std::vector<VX_PixelFormat> Formats(bool planar) {
-  std::vector<VX_PixelFormat> formats;
-#define VX_COLLECT(name, value, hostName, mapping) \
-  if ((value) != 0 && (planar ? ((value) >> 24) >= 9 : ((value) >> 24) == 0)) formats.push_back(VX_PixelFormat::name);
-  VX_PIXEL_FORMATS(VX_COLLECT)
-#undef VX_COLLECT
-  return formats;
-}
 
 // Plain code points everywhere: bytes below 0x3f are small floats too.
 std::vector<uint8_t> Content(VX_PixelFormat format) {
@@ -69,7 +62,7 @@ void ForEachItem(size_t count, size_t start, const Use& use) {
 }
 
 void UsePlans(size_t start, Digest& digest) {
-  static const std::vector<VX_PixelFormat> formats = Formats(false);
+  static const std::vector<VX_PixelFormat> formats = RasterFormats();
   ForEachItem(formats.size() * formats.size(), start, [&](size_t item) {
     VX_PixelFormat chain[9] = {};
     int32_t length = 0;
@@ -79,7 +72,7 @@ void UsePlans(size_t start, Digest& digest) {
 }
 
 void UseConversions(size_t start, Digest& digest) {
-  static const std::vector<VX_PixelFormat> formats = Formats(false);
+  static const std::vector<VX_PixelFormat> formats = RasterFormats();
   ForEachItem(formats.size() * formats.size() / 5, start, [&](size_t item) {  // every fifth pair meets all formats
     Convert(formats[5 * item / formats.size()], formats[5 * item % formats.size()], item, digest);
   });
@@ -91,7 +84,7 @@ void UseConversions(size_t start, Digest& digest) {
 }
 
 void UsePlanar(size_t start, Digest& digest) {
-  static const std::vector<VX_PixelFormat> formats = Formats(true);
+  static const std::vector<VX_PixelFormat> formats = Formats420();
   ForEachItem(formats.size(), start, [&](size_t item) {
     Convert(formats[item], VX_PixelFormat::BGRA_4444_8u, item, digest);
     Convert(VX_PixelFormat::VUYA_4444_32f_709, formats[item], item, digest);
@@ -155,6 +148,9 @@ uint64_t SumAfterFirstUse(Use use, int rounding) {
 }
 
 }  // namespace
+}  // namespace vexel::testing
+
+using namespace vexel::testing;
 
 int main(int argc, char** argv) {
   Use use = nullptr;
