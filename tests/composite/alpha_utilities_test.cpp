@@ -56,14 +56,7 @@ Operation SetOperation(float alpha, double code8, double code15) {
 
 // In place; the source is not looked at.
 Operation SetInPlaceOperation(bool opaque) {
-  return {"VX_SetAlphaChannel",
-          [](F f) {
-            constexpr F kSettable[] = {F::BGRA_4444_8u,  F::VUYA_4444_8u,         F::BGRA_4444_15u,
-                                       F::BGRA_4444_32f, F::BGRA_4444_32f_Linear, F::VUYA_4444_32f,
-                                       F::ARGB_4444_32f, F::ARGB_4444_32f_Linear};
-            return std::find(std::begin(kSettable), std::end(kSettable), f) != std::end(kSettable);
-          },
-          true,
+  return {"VX_SetAlphaChannel", IsSettable, true,
           [=](const ArenaFrame&, const ArenaFrame& d) {
             return VX_SetAlphaChannel(static_cast<uint32_t>(d.width), static_cast<uint32_t>(d.height), d.base,
                                       d.rowBytes, d.format, opaque);

@@ -35,17 +35,13 @@ std::vector<M> Modes(bool withDissolve = false) {
   return modes;
 }
 
-template <class T>
-std::vector<T> BlendPixels(F format, M mode, const std::vector<T>& src, const std::vector<T>& background, int32_t width,
-                           int32_t height, float opacity) {
-  std::vector<T> out(src.size());
-  const auto view = [&](const std::vector<T>& p) { return View(p.data(), width * 4 * int{sizeof(T)}, format); };
-  EXPECT_EQ(Blend(mode, view(src), view(background), {out.data(), view(out).rowBytes, format, width, height}, opacity),
+Floats BlendFloats(M mode, const Floats& src, const Floats& background, int32_t width, float opacity = 1) {
+  Floats out(src.size());
+  const auto view = [&](const Floats& p) { return View(p.data(), width * 16, kFloats); };
+  const auto height = static_cast<int32_t>(src.size()) / 4 / width;
+  EXPECT_EQ(Blend(mode, view(src), view(background), {out.data(), width * 16, kFloats, width, height}, opacity),
             VX_Success);
   return out;
-}
-Floats BlendFloats(M mode, const Floats& src, const Floats& background, int32_t width, float opacity = 1) {
-  return BlendPixels(kFloats, mode, src, background, width, static_cast<int32_t>(src.size()) / 4 / width, opacity);
 }
 
 // The same by way of a float picture: conversions take no more than 32,768 for a number.
@@ -160,31 +156,28 @@ TEST(BlendMode, LumaWeightsFollowTheWidth) {
 
 // Every pair of codes in some channel, under alphas from the ends and between, and every pair of alphas over random
 // colours: the bytes of the way through floats, and within one code of the formula.
-class ByteBlend : public ::testing::Test {
- protected:
-  void Expect(M mode, const Image& src, const Image& background, float opacity) {
-    Image out(kBytes, src.width, src.height);
-    ASSERT_EQ(Blend(mode, src, background, out, opacity), VX_Success);
-    ASSERT_EQ(out.bytes, BlendInFloats(mode, src, background, kBytes, opacity).bytes) << ModeName(mode);
-    for (size_t i = 0; i < out.bytes.size(); i += 4) {
-      const uint8_t *s = &src.bytes[i], *d = &background.bytes[i];
-      const auto pixel = [](const uint8_t* p) {
-        return ReferencePixel{{p[0] / 255.0, p[1] / 255.0, p[2] / 255.0}, p[3] / 255.0};
-      };
-      const ReferencePixel expected = BlendReference(mode, pixel(s), pixel(d), opacity, src.width);
-      for (size_t k = 0; k < 4; ++k) {
-        // Which side of its step 1 - d is on at s + d = 1 is a matter of rounding.
-        if (mode == M::HardMix && s[k] + d[k] == 255) continue;
-        const double wanted = 255 * reference::Unit(k == 3 ? expected.alpha : expected.colour[k]);
-        ASSERT_LE(std::abs(out.bytes[i + k] - wanted), 0.501)
-            << ModeName(mode) << " opacity " << opacity << " channel " << k << ", source " << int{s[k]} << " alpha "
-            << int{s[3]} << ", background " << int{d[k]} << " alpha " << int{d[3]};
-      }
+void ExpectBytes(M mode, const Image& src, const Image& background, float opacity) {
+  Image out(kBytes, src.width, src.height);
+  ASSERT_EQ(Blend(mode, src, background, out, opacity), VX_Success);
+  ASSERT_EQ(out.bytes, BlendInFloats(mode, src, background, kBytes, opacity).bytes) << ModeName(mode);
+  for (size_t i = 0; i < out.bytes.size(); i += 4) {
+    const uint8_t *s = &src.bytes[i], *d = &background.bytes[i];
+    const auto pixel = [](const uint8_t* p) {
+      return ReferencePixel{{p[0] / 255.0, p[1] / 255.0, p[2] / 255.0}, p[3] / 255.0};
+    };
+    const ReferencePixel expected = BlendReference(mode, pixel(s), pixel(d), opacity, src.width);
+    for (size_t k = 0; k < 4; ++k) {
+      // Which side of its step 1 - d is on at s + d = 1 is a matter of rounding.
+      if (mode == M::HardMix && s[k] + d[k] == 255) continue;
+      const double wanted = 255 * reference::Unit(k == 3 ? expected.alpha : expected.colour[k]);
+      ASSERT_LE(std::abs(out.bytes[i + k] - wanted), 0.501)
+          << ModeName(mode) << " opacity " << opacity << " channel " << k << ", source " << int{s[k]} << " alpha "
+          << int{s[3]} << ", background " << int{d[k]} << " alpha " << int{d[3]};
     }
   }
-};
+}
 
-TEST_F(ByteBlend, EveryPairOfCodes) {
+TEST(ByteBlend, EveryPairOfCodes) {
   Image src(kBytes, 256, 86), background = src;  // three pairs a pixel
   const auto setPixels = [](Image& image, int shift, uint8_t alpha) {
     for (size_t i = 0; i < image.bytes.size(); ++i)
@@ -194,18 +187,18 @@ TEST_F(ByteBlend, EveryPairOfCodes) {
   for (const uint8_t as : {0, 1, 127, 254, 255})
     for (const uint8_t ab : {0, 1, 127, 254, 255}) {
       setPixels(src, 8, as), setPixels(background, 0, ab);
-      for (const M mode : Modes()) Expect(mode, src, background, round++ % 3 ? 1.0f : 0.4f);
-      if (HasFatalFailure()) return;
+      for (const M mode : Modes()) ExpectBytes(mode, src, background, round++ % 3 ? 1.0f : 0.4f);
+      if (::testing::Test::HasFatalFailure()) return;
     }
 }
 
-TEST_F(ByteBlend, EveryPairOfAlphas) {
+TEST(ByteBlend, EveryPairOfAlphas) {
   Image src(kBytes, 256, 256, 7), background(kBytes, 256, 256, 8);
   for (size_t i = 0; i < 65536; ++i) {
     src.bytes[4 * i + 3] = static_cast<uint8_t>(i >> 8);
     background.bytes[4 * i + 3] = static_cast<uint8_t>(i);
   }
-  for (const M mode : Modes()) Expect(mode, src, background, 1);
+  for (const M mode : Modes()) ExpectBytes(mode, src, background, 1);
 }
 
 // The orders and kinds of alpha that are read and written as bytes, against pictures converted by themselves.

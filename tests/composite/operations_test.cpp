@@ -20,10 +20,6 @@ using To = const ArenaFrame&;
 
 bool IsAny(F) { return true; }
 bool IsBytes(F f) { return f == F::BGRA_4444_8u; }
-bool IsSettable(F f) {
-  return f == F::BGRA_4444_8u || f == F::VUYA_4444_8u || f == F::BGRA_4444_15u || f == F::BGRA_4444_32f ||
-         f == F::ARGB_4444_32f;
-}
 bool IsAddressed(F f) { return IsPixels(f) || f == kRgb10Format; }
 
 // The codes of frames instead of rasters and of rasters that nothing leads from or to.
@@ -235,20 +231,6 @@ TEST(Operations, Arena) {
 
 // ---- Rounding
 
-// Of every pixel of integers: bytes, words or the three fields of ten bits.
-std::vector<int> Samples(const Image& image) {
-  std::vector<int> samples;
-  const size_t bytes = Depth(image.format) == kDepth8u ? 1 : Depth(image.format) == kDepth15u ? 2 : 4;
-  for (size_t i = 0; i < image.bytes.size(); i += bytes) {
-    uint32_t word = 0;
-    std::memcpy(&word, &image.bytes[i], bytes);
-    if (bytes != 4) samples.push_back(static_cast<int>(word));
-    for (int bit = IsV210(image.format) ? 0 : 2; bytes == 4 && bit < 30; bit += 10)
-      samples.push_back(static_cast<int>(word >> bit & 1023));
-  }
-  return samples;
-}
-
 // A caller's rounding mode reaches every kernel alike, and turns no full sample into an empty one.
 TEST(Operations, RoundingModesGiveTheSameBytesInEveryVariant) {
   const unsigned callers = _mm_getcsr();
@@ -256,7 +238,7 @@ TEST(Operations, RoundingModesGiveTheSameBytesInEveryVariant) {
     std::vector<Image> images;
     for (int i = 0; i < o.sources; ++i) images.emplace_back(source, width, 1, contents, images.size() + 1);
     const std::vector<ArenaFrame> sources(images.begin(), images.end());
-    std::vector<int> nearest;
+    Image nearest(format, width, 1);
     for (const unsigned mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
       Image plain(format, width, 1, Contents::Zeros);
       ForEachVariant([&](int variant) {
@@ -267,13 +249,18 @@ TEST(Operations, RoundingModesGiveTheSameBytesInEveryVariant) {
         if (variant == 0) plain = out;
         EXPECT_TRUE(out.bytes == plain.bytes) << "variant " << variant << ", mode " << mode;
       });
-      const std::vector<int> samples = Samples(plain);
-      if (mode == 0) nearest = samples;
-      for (size_t i = 0; contents == Contents::Maximum && i < samples.size(); ++i)
-        EXPECT_NEAR(samples[i], nearest[i], nearest[i] / 50) << "mode " << mode;
+      if (mode == 0) nearest = plain;
+      for (size_t i = 0; contents == Contents::Maximum && i < SampleCount(plain); ++i) {
+        const double code = SampleAt(nearest.bytes.data(), i, format);
+        EXPECT_NEAR(SampleAt(plain.bytes.data(), i, format), code, code / 50) << "mode " << mode;
+      }
     }
   };
-  for (const Operation& o : Operations())
+  const auto all = Operations();
+  const auto& convert = *std::ranges::find(all, "convert", &Operation::name);
+  check(convert, F::BGRA_4444_32f_Linear, F::BGRA_4444_8u, 259, Contents::Random);
+  check(convert, F::BGRA_4444_8u, F::BGRA_4444_32f_Linear, 259, Contents::Random);
+  for (const Operation& o : all)
     for (const F format : RasterFormats())
       for (const Contents contents : {Contents::Random, Contents::Extremes, Contents::Maximum})
         for (int width = 540; width < (o.name == "blend" ? 567 : 541); ++width) {

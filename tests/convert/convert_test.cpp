@@ -1,5 +1,4 @@
 // Conversions of pictures: their plans, every pair of formats, every direct kernel in the armed arena.
-#include <xmmintrin.h>
 
 #include "convert/Planar420.h"
 #include "convert/Planner.h"
@@ -19,18 +18,19 @@
 namespace vexel::testing {
 namespace {
 
-std::string Chain(F src, F dst) {
-  F formats[9];
+// The formats on the way from one to another; none without a way.
+std::vector<F> WayOf(F src, F dst, int32_t quality = 2) {
+  std::vector<F> formats(9);
   int32_t count = 0;
-  if (VX_ExplainConversion(src, dst, 2, formats, &count) != VX_Success) return "none";
-  std::string text;
-  for (int i = 0; i < count; ++i) text += (i ? " > " : "") + FormatName(formats[i]);
-  return text;
+  if (VX_ExplainConversion(src, dst, quality, formats.data(), &count) != VX_Success) count = 0;
+  formats.resize(static_cast<size_t>(count));
+  return formats;
 }
 
-int DepthRank(F format) {
-  const uint32_t depth = Depth(format);
-  return depth == kDepth8u ? 8 : depth == kDepth10u ? 10 : depth == kDepth15u ? 15 : 32;
+std::string Chain(F src, F dst) {
+  std::string text;
+  for (const F format : WayOf(src, dst)) text += (text.empty() ? "" : " > ") + FormatName(format);
+  return text.empty() ? "none" : text;
 }
 
 // What both ends keep is kept in between: depth, alpha, and straight colour where alpha is 0.
@@ -48,7 +48,7 @@ TEST(Planner, EveryPairWalksAlongStepsOfTheGraphAndLosesNothing) {
         const auto isStep = [&](const Step& step) { return step.from == current && step.to == through; };
         ASSERT_TRUE(src == dst || std::ranges::any_of(AllSteps(), isStep));
         current = through;
-        EXPECT_GE(DepthRank(through), std::min(DepthRank(src), DepthRank(dst)));
+        EXPECT_GE(DepthBits(through), std::min(DepthBits(src), DepthBits(dst)));
         EXPECT_TRUE(CarriesAlpha(through) || !CarriesAlpha(src) || !CarriesAlpha(dst));
         EXPECT_TRUE(Layout(through) == kLayout4444 || Layout(src) != kLayout4444 || Layout(dst) != kLayout4444);
         EXPECT_TRUE(AlphaKind(through) == kAlphaStraight || AlphaKind(src) != kAlphaStraight ||
@@ -170,29 +170,6 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
   EXPECT_EQ(VX_Convert(pixel, 64, F::BGRA_4444_8u, nullptr, 64, F::BGRA_4444_8u, 1, 1, 2), VX_ErrNullDestination);
 }
 
-// A caller's rounding mode reaches every kernel alike and comes back.
-TEST(Convert, RoundingModesGiveTheSameBytesInEveryVariant) {
-  const uint32_t saved = _mm_getcsr();
-  const std::pair<F, F> kPairs[] = {{F::BGRA_4444_32f_Linear, F::BGRA_4444_8u},
-                                    {F::BGRA_4444_8u, F::BGRA_4444_32f_Linear}};
-  for (const auto& [from, to] : kPairs)
-    for (const uint32_t mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
-      const Image source(from, 259, 1, 5);
-      const VX_PixelFormat format = to;
-      LineBytes plain;
-      ForEachVariant([&](int variant) {
-        Image result(format, source.width, 1, Contents::Zeros);
-        _mm_setcsr((saved & ~0x6000u) | mode);
-        Convert(source, result, 2);
-        const uint32_t after = _mm_getcsr();
-        _mm_setcsr(saved);
-        EXPECT_EQ(after & 0x6000u, mode);
-        if (variant == 0) plain = result.bytes;
-        EXPECT_EQ(result.bytes, plain) << FormatName(format) << " mode " << mode;
-      });
-    }
-}
-
 // Chains run in blocks, in whole rows or fused into one kernel: always the bytes of their steps one after the other.
 // Past the cache rows are made in blocks: no kernel looks farther than they overlap, and none sees where they end. A
 // format converted to itself keeps every byte.
@@ -200,13 +177,10 @@ TEST(Convert, AChainGivesTheBytesOfItsStepsAndStreamsThem) {
   for (F src : RasterFormats())
     for (F dst : RasterFormats()) {
       SCOPED_TRACE(FormatName(src) + " to " + FormatName(dst));
-      F formats[9];
-      int32_t count = 0;
-      ASSERT_EQ(VX_ExplainConversion(src, dst, 2, formats, &count), VX_Success);
       const Image source(src, 2 * static_cast<int>(kStreamBlock) + 7, 2, Contents::Extremes, Bits(src) + 1);
       const auto chained = source.Converted(dst, 2).bytes;
       Image stepped = source;
-      for (int i = 1; i < count; ++i) stepped = stepped.Converted(formats[i], 2);
+      for (const F through : WayOf(src, dst)) stepped = stepped.Converted(through, 2);
       ASSERT_EQ(stepped.bytes, chained);
       ASSERT_TRUE(src != dst || chained == source.bytes);
       const SmallCache small;
@@ -214,39 +188,26 @@ TEST(Convert, AChainGivesTheBytesOfItsStepsAndStreamsThem) {
     }
 }
 
-// A picture of any kind, its rows upward or downward in memory.
+// A picture of any kind.
 struct Picture {
   F format;
   int32_t width, height;
-  bool down;
   std::vector<uint8_t> bytes;
-  Picture(F f, int32_t w, int32_t h, bool upsideDown = false)
-      : format(f),
-        width(w),
-        height(h),
-        down(upsideDown && !IsSpecial(f)),
-        bytes(static_cast<size_t>(VX_PixelFormatSize(f, w, h))) {}
-  int32_t RowBytes() const {
-    if (IsSpecial(format)) return 0;
-    const auto rowBytes = static_cast<int32_t>(bytes.size() / static_cast<size_t>(height));
-    return down ? -rowBytes : rowBytes;
-  }
-  uint8_t* Base() { return down ? &bytes[bytes.size() - bytes.size() / static_cast<size_t>(height)] : bytes.data(); }
-  // The other way up, without what lies between the rows.
-  Picture Turned() const {
-    Picture turned(format, width, height, !down);
-    if (IsSpecial(format)) turned.bytes = bytes;
-    const size_t rowBytes = bytes.size() / static_cast<size_t>(height);
-    for (size_t y = 0; !IsSpecial(format) && y < static_cast<size_t>(height); ++y)
-      std::copy_n(&bytes[y * rowBytes], UnpaddedRowBytes(format, width),
-                  &turned.bytes[(static_cast<size_t>(height) - 1 - y) * rowBytes]);
-    return turned;
+  Picture(F f, int32_t w, int32_t h)
+      : format(f), width(w), height(h), bytes(static_cast<size_t>(VX_PixelFormatSize(f, w, h))) {}
+  int32_t RowBytes() const { return IsSpecial(format) ? 0 : static_cast<int32_t>(bytes.size()) / height; }
+  Picture Flipped() const {
+    Picture flipped = *this;
+    if (!IsSpecial(format)) VX_FlipInPlace(flipped.bytes.data(), RowBytes(), width, height, format);
+    return flipped;
   }
 };
 
-VX_Result Convert(Picture& src, Picture& dst, int32_t quality) {
-  return VX_Convert(src.Base(), src.RowBytes(), src.format, dst.Base(), dst.RowBytes(), dst.format, src.width,
-                    src.height, quality);
+// Downward, the first row of a raster is the last one in memory.
+VX_Result Convert(const Picture& src, Picture& dst, int32_t quality, bool down = false) {
+  const int32_t from = src.RowBytes(), to = dst.RowBytes(), last = down ? src.height - 1 : 0;
+  return VX_Convert(src.bytes.data() + last * from, down ? -from : from, src.format, dst.bytes.data() + last * to,
+                    down ? -to : to, dst.format, src.width, src.height, quality);
 }
 
 // 4:2:0 pictures come and go line by line: with the bytes of whole frames, whichever way up.
@@ -261,34 +222,33 @@ TEST(Convert, PicturesGiveTheBytesOfTheirSteps) {
   int turn = 0, reached = 0;
   for (const F from : all)
     for (const F to : all) {
-      F formats[9];
-      int32_t count = 0;
       const int32_t quality = turn / 3 % 3 + 1;
       if (!Is420(from) && !Is420(to)) continue;
-      if (VX_ExplainConversion(from, to, quality, formats, &count) != VX_Success) continue;
+      const std::vector<F> way = WayOf(from, to, quality);
+      if (way.empty()) continue;
       if (Is420(from) && HasWideSamples(from) && !IsBiplanar(from)) continue;
       const Size size = sizes[turn++ % 3];
       Picture src(from, size.width, size.height);
       Random random(static_cast<uint64_t>(turn));
       FillSamples(src.bytes.data(), src.bytes.size(), from, Contents::Random, random);
-      Picture turned = src.Turned(), dst(to, size.width, size.height), dstTurned = dst.Turned();
+      Picture dst(to, size.width, size.height), dstDown = dst;
       ASSERT_EQ(Convert(src, dst, quality), VX_Success) << FormatName(from) << " to " << FormatName(to);
-      ASSERT_EQ(Convert(turned, dstTurned, quality), VX_Success);
+      ASSERT_EQ(Convert(src.Flipped(), dstDown, quality, true), VX_Success);
       Picture stepped = src;
-      for (int i = 1; i < count; ++i) {
-        Picture next(formats[i], size.width, size.height);
+      for (size_t i = 1; i < way.size(); ++i) {
+        Picture next(way[i], size.width, size.height);
         ASSERT_EQ(Convert(stepped, next, quality), VX_Success);
         stepped = next;
       }
       ASSERT_EQ(stepped.bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to) << " " << size.width;
-      ASSERT_EQ(dstTurned.Turned().bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to);
+      ASSERT_EQ(dstDown.Flipped().bytes, dst.bytes) << FormatName(from) << " to " << FormatName(to);
       // Past the cache straight or staged, by how rows lie in its lines.
       const SmallCache small;
       LineBytes memory(dst.bytes.size() + 16);
       uint8_t* const past = memory.data() + turn % 2 * 16;
-      ASSERT_EQ(
-          VX_Convert(src.Base(), src.RowBytes(), from, past, dst.RowBytes(), to, size.width, size.height, quality),
-          VX_Success);
+      ASSERT_EQ(VX_Convert(src.bytes.data(), src.RowBytes(), from, past, dst.RowBytes(), to, size.width, size.height,
+                           quality),
+                VX_Success);
       ASSERT_TRUE(std::equal(dst.bytes.begin(), dst.bytes.end(), past)) << FormatName(from) << " to " << FormatName(to);
       ++reached;
     }

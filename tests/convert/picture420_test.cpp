@@ -68,41 +68,33 @@ TEST(Planar420, PlanesLieInTheBlock) {
       }
 }
 
+// Where rows have no gaps, chroma is one run of a half or a quarter of the luma's bytes, rounded down once.
 TEST(Planar420, CopiesPlanes) {
-  for (const bool tight : {false, true})
-    for (const int width : {1, 2, 7, 16, 33})
-      for (const int height : {1, 2, 5, 8}) {
-        const int chroma = width / 2, gap = tight ? 0 : 5;
-        // Three planes each way, with the gaps and the ends filled differently.
-        std::vector<uint8_t> src(3 * 64 * 16), dst(src.size(), 0xEE), expected(dst);
-        Random(static_cast<uint64_t>(width)).Fill(src.data(), src.size());
-        const int32_t srcRowBytes[3] = {width + gap, chroma + gap, chroma + gap};
-        const int32_t dstRowBytes[3] = {width + 2 * gap, chroma + 2 * gap, chroma + 2 * gap};
-        const int32_t srcPairs[2] = {width + gap, width + gap}, dstPairs[2] = {width + 2 * gap, width + 2 * gap};
-        const void* from[3];
-        void* to[3];
-        for (int i = 0; i < 3; ++i) from[i] = &src[i * 1024], to[i] = &dst[i * 1024];
-        const auto copy = [&](int plane, int rows, int bytes, int fromStep, int toStep) {
-          for (int row = 0; row < rows; ++row)
-            std::memcpy(&expected[plane * 1024 + row * toStep], &src[plane * 1024 + row * fromStep], bytes);
-        };
-        const int odd = width * height / 4 - height / 2 * chroma;  // copied on, where rows have no gaps
-        copy(0, height, width, srcRowBytes[0], dstRowBytes[0]);
-        for (int i = 1; i < 3; ++i) {
-          copy(i, height / 2, chroma, srcRowBytes[i], dstRowBytes[i]);
-          if (tight) copy(i, 1, height / 2 * chroma + odd, 0, 0);
+  for (const bool biplanar : {false, true})
+    for (const int gap : {0, 5})
+      for (const int width : {1, 2, 7, 16, 33})
+        for (const int height : {1, 2, 5, 8}) {
+          const int chroma = biplanar ? width : width / 2;
+          // The planes each way, with the gaps and the ends filled differently.
+          std::vector<uint8_t> src(3 * 1024), dst(src.size(), 0xEE), expected(dst);
+          Random(static_cast<uint64_t>(width)).Fill(src.data(), src.size());
+          const int32_t srcRowBytes[3] = {width + gap, chroma + gap, chroma + gap};
+          const int32_t dstRowBytes[3] = {width + 2 * gap, chroma + 2 * gap, chroma + 2 * gap};
+          const void* from[3];
+          void* to[3];
+          for (int i = 0; i < 3; ++i) {
+            from[i] = &src[i * 1024], to[i] = &dst[i * 1024];
+            if (biplanar && i == 2) continue;
+            for (int row = 0; row < (i == 0 ? height : height / 2); ++row)
+              std::memcpy(&expected[i * 1024 + row * dstRowBytes[i]], &src[i * 1024 + row * srcRowBytes[i]],
+                          i == 0 ? width : chroma);
+            if (i != 0 && gap == 0)
+              std::memcpy(&expected[i * 1024], &src[i * 1024], width * height / (biplanar ? 2 : 4));
+          }
+          const auto copy = biplanar ? VX_CopyBiPlanar_8u : VX_CopyPlanar_8u;
+          EXPECT_EQ(VX_Success, copy(from, srcRowBytes, to, dstRowBytes, width, height));
+          EXPECT_EQ(dst, expected) << width << " x " << height << " gap " << gap << (biplanar ? " biplanar" : "");
         }
-        EXPECT_EQ(VX_Success, VX_CopyPlanar_8u(from, srcRowBytes, to, dstRowBytes, width, height));
-        EXPECT_EQ(dst, expected) << width << " x " << height << " tight " << tight;
-
-        std::fill(dst.begin(), dst.end(), 0xEE);
-        std::fill(expected.begin(), expected.end(), 0xEE);
-        copy(0, height, width, srcPairs[0], dstPairs[0]);
-        copy(1, height / 2, width, srcPairs[1], dstPairs[1]);
-        if (tight) copy(1, 1, width * height / 2, 0, 0);
-        EXPECT_EQ(VX_Success, VX_CopyBiPlanar_8u(from, srcPairs, to, dstPairs, width, height));
-        EXPECT_EQ(dst, expected) << width << " x " << height << " tight " << tight;
-      }
   for (const int bad : {0, -1, INT_MIN}) {
     const int32_t rowBytes[3] = {bad, bad, bad};
     const void* const none[3] = {};
@@ -132,42 +124,40 @@ TEST(Plan420, Sizes) {
     int width, height, dstWidth, dstHeight, quality;
     int plannedWidth, plannedHeight;
     bool needsSse2 = false;
-  } cases[] = {// 4/3 and 3/2: not for other heights, widths that are no multiple of 96 or 16.
-               {1440, 1080, 1920, 1080, 0, 1920, 1080, true},
-               {1440, 1080, 1920, 540, 5, 1920, 540, true},
-               {1440, 1080, 1920, 541, 0, 1440, 1080},
-               {1056, 576, 1408, 576, 0, 1408, 576, true},
-               {1280, 1080, 1920, 1080, 0, 1920, 1080, true},
-               {1280, 720, 1920, 360, 4, 1920, 360, true},
-               {1288, 720, 1932, 720, 0, 1288, 720},
-               {1488, 720, 1984, 720, 0, 1488, 720},
-               // Fields.
-               {1920, 1080, 1920, 540, 5, 1920, 540},
-               {1920, 1081, 1920, 540, 0, 1920, 540},
-               // Reductions: not at high quality, by odd ratios of heights, by 3.
-               {1920, 1080, 1280, 720, 0, 1920, 1080},
-               {1920, 1080, 480, 541, 0, 1920, 1080},
-               {1920, 1080, 480, 270, 0, 480, 270},
-               {1920, 1080, 480, 270, 2, 480, 270},
-               {1920, 1080, 480, 270, 3, 1920, 1080},
-               {1920, 1080, 640, 360, 0, 960, 540},
-               {1920, 1080, 640, 180, 0, 960, 540},
-               {1920, 1080, 240, 108, 0, 240, 108},
-               {1920, 1080, 120, 90, 0, 960, 540},
-               {1920, 1080, 1920, 270, 0, 1920, 270},
-               {1920, 1080, 1000, 270, 0, 1920, 540},
-               {1919, 1080, 480, 270, 0, 1919, 1080},
-               {960, 540, 480, 270, 0, 480, 270},
-               {960, 541, 480, 270, 0, 480, 270},
-               // The ends of integers; nothing divides by zero.
-               {INT_MAX, INT_MAX, INT_MAX, INT_MAX, 0, INT_MAX, INT_MAX},
-               {INT_MAX - 15, 16, INT_MAX, 16, 0, INT_MAX - 15, 16},
-               {1920, 1080, 0, 0, 0, 960, 540},
-               {1920, 1080, 1920, 0, 0, 1920, 540},
-               {1920, 0, 1920, 0, 0, 1920, 0},
-               {0, 0, 0, 0, 0, 0, 0},
-               {1, 1, 1, 1, 0, 1, 1},
-               {1, 1, 1, 0, 0, 1, 0}};
+  } cases[] = {
+      {1440, 1080, 1920, 1080, 0, 1920, 1080, true},  // 4/3
+      {1440, 1080, 1920, 540, 5, 1920, 540, true},
+      {1440, 1080, 1920, 541, 0, 1440, 1080},
+      {1056, 576, 1408, 576, 0, 1408, 576, true},
+      {1280, 1080, 1920, 1080, 0, 1920, 1080, true},  // 3/2
+      {1280, 720, 1920, 360, 4, 1920, 360, true},
+      {1288, 720, 1932, 720, 0, 1288, 720},   // not a multiple of 16
+      {1488, 720, 1984, 720, 0, 1488, 720},   // 4/3, but no multiple of 96
+      {1920, 1080, 1920, 540, 5, 1920, 540},  // a field
+      {1920, 1081, 1920, 540, 0, 1920, 540},
+      {1920, 1080, 1280, 720, 0, 1920, 1080},
+      {1920, 1080, 480, 541, 0, 1920, 1080},
+      {1920, 1080, 480, 270, 0, 480, 270},  // reductions
+      {1920, 1080, 480, 270, 2, 480, 270},
+      {1920, 1080, 480, 270, 3, 1920, 1080},
+      {1920, 1080, 640, 360, 0, 960, 540},  // the height ratio is odd
+      {1920, 1080, 640, 180, 0, 960, 540},  // the width ratio is 3
+      {1920, 1080, 240, 108, 0, 240, 108},
+      {1920, 1080, 120, 90, 0, 960, 540},
+      {1920, 1080, 1920, 270, 0, 1920, 270},
+      {1920, 1080, 1000, 270, 0, 1920, 540},
+      {1919, 1080, 480, 270, 0, 1919, 1080},
+      {960, 540, 480, 270, 0, 480, 270},
+      {960, 541, 480, 270, 0, 480, 270},  // half of both by the general rule
+      {INT_MAX, INT_MAX, INT_MAX, INT_MAX, 0, INT_MAX, INT_MAX},
+      {INT_MAX - 15, 16, INT_MAX, 16, 0, INT_MAX - 15, 16},
+      {1920, 1080, 0, 0, 0, 960, 540},  // nothing divides by zero
+      {1920, 1080, 1920, 0, 0, 1920, 540},
+      {1920, 0, 1920, 0, 0, 1920, 0},
+      {0, 0, 0, 0, 0, 0, 0},
+      {1, 1, 1, 1, 0, 1, 1},
+      {1, 1, 1, 0, 0, 1, 0},
+  };
   for (const bool hasSse2 : {true, false}) {
     VX_SetDebugFlag(3, hasSse2);
     for (const auto& c : cases) {

@@ -56,67 +56,50 @@ void ExpectTable(const ResampleKernel& kernel, int width, const std::function<do
   }
 }
 
-TEST(ResampleKernel, UpSamplingTables) {
-  struct Case {
-    Type type;
-    int width;
-    std::function<double(double)> filter;
-  };
-  const Case cases[] = {
-      {Type::kCubic, 4, [](double d) { return Keys(d, -0.75); }},
-      {Type::kCubicMedium, 6, [](double d) { return Keys(d / double(1.15f), -0.625); }},
-      {Type::kCubicSharp, 6, [](double d) { return Keys(d / double(1.05f), -1); }},
-      {Type::kCubicSoft, 6, [](double d) { return Keys(d / double(1.2f), -0.5); }},
-      {Type::kSpline36, 6, Spline},
-      {Type::kLanczos8, 16, [](double d) { return std::abs(d) < 8 ? Sinc(d) * Sinc(d / 8) : 0; }},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.type);
-    ResampleKernel kernel(c.type);
-    kernel.ScaleForUpSample(2);
-    ExpectTable(kernel, c.width, c.filter);
-  }
-  ResampleKernel bilinear(Type::kBilinear);
-  bilinear.ScaleForUpSample(1);
-  for (int phase = 0; phase < 128; ++phase)
-    EXPECT_EQ(Row(bilinear, phase), (std::vector{16384 - 128 * phase, 128 * phase}));
+std::function<double(double)> Cubic(double scale, double a) {
+  return [=](double x) { return Keys(x * scale, a); };
 }
 
-TEST(ResampleKernel, DownSamplingTables) {
-  struct Case {
+TEST(ResampleKernel, Tables) {
+  constexpr double kMedium = double{1.15f}, kSharp = double{1.05f}, kSoft = double{1.2f}, kSharpest = double{-2.2f};
+  const struct {
     Type type;
     float scale;
     int width;
-    double s, a;
+    std::function<double(double)> filter;
+  } cases[] = {
+      {Type::kCubic, 2, 4, Cubic(1, -0.75)},
+      {Type::kCubicMedium, 2, 6, Cubic(1 / kMedium, -0.625)},
+      {Type::kCubicSharp, 2, 6, Cubic(1 / kSharp, -1)},
+      {Type::kCubicSoft, 2, 6, Cubic(1 / kSoft, -0.5)},
+      {Type::kSpline36, 2, 6, Spline},
+      {Type::kLanczos8, 2, 16, [](double d) { return std::abs(d) < 8 ? Sinc(d) * Sinc(d / 8) : 0; }},
+      {Type::kCubic, 0.5f, 8, Cubic(0.5, -0.75)},
+      {Type::kCubic, 0.1f, 16, Cubic(0.25, -0.75)},  // served as a quarter
+      {Type::kCubic, 0.8f, 6, Cubic(double{0.8f}, -0.75)},
+      {Type::kCubicMedium, 0.25f, 20, Cubic(double{0.25f / 1.15f}, -1)},
+      {Type::kCubicSharp, 0.25f, 18, Cubic(double{0.25f / 1.05f}, kSharpest)},
+      {Type::kCubicSharp, 0.525f, 8,
+       Cubic(double{0.525f / 1.05f}, double{float(-1 + (1 - (double{0.525f} - 0.25) / 0.75) * (kSharpest + 1))})},
+      {Type::kCubicSoft, 0.5f, 10, Cubic(double{0.5f / 1.2f}, -0.5)},
+      {Type::kLanczos8, 0.5f, 8, Cubic(0.5, -0.75)},
   };
-  const Case cases[] = {
-      {Type::kCubic, 0.5f, 8, 0.5, -0.75},
-      {Type::kCubic, 0.1f, 16, 0.25, -0.75},  // served as a quarter
-      {Type::kCubic, 0.8f, 6, double(0.8f), -0.75},
-      {Type::kCubicMedium, 0.25f, 20, double(0.25f / 1.15f), -1},
-      {Type::kCubicSharp, 0.25f, 18, double(0.25f / 1.05f), double(-2.2f)},
-      {Type::kCubicSharp, 0.525f, 8, double(0.525f / 1.05f),
-       double(float(-1 + (1 - (double(0.525f) - 0.25) / 0.75) * (double(-2.2f) + 1)))},
-      {Type::kCubicSoft, 0.5f, 10, double(0.5f / 1.2f), -0.5},
-      {Type::kLanczos8, 0.5f, 8, 0.5, -0.75},
-  };
-  for (const Case& c : cases) {
+  for (const auto& c : cases) {
     SCOPED_TRACE(testing::Message() << "type " << c.type << " scale " << c.scale);
     ResampleKernel kernel(c.type);
-    kernel.ScaleForDownSample(c.scale, c.scale);
-    ExpectTable(kernel, c.width, [&](double d) { return Keys(d * c.s, c.a); });
+    c.scale > 1 ? kernel.ScaleForUpSample(c.scale) : kernel.ScaleForDownSample(c.scale, c.scale);
+    ExpectTable(kernel, c.width, c.filter);
   }
-  ResampleKernel whole(Type::kCubic);
+  ResampleKernel bilinear(Type::kBilinear), whole(Type::kCubic), sharp(Type::kCubicSharp);
+  bilinear.ScaleForUpSample(1);
+  for (int phase = 0; phase < 128; ++phase)
+    EXPECT_EQ(Row(bilinear, phase), (std::vector{16384 - 128 * phase, 128 * phase}));
   whole.ScaleForDownSample(1, 1);
   EXPECT_EQ(Row(whole, 0), (std::vector{0, 0, 0, 0, 16384, 0, 0, 0, 0, 0}));
-  ExpectTable(
-      whole, 10, [](double d) { return Keys(d, -0.75); }, true);
+  ExpectTable(whole, 10, Cubic(1, -0.75), true);
   // Sharpness is a matter of the second argument alone; above 1 it extrapolates.
-  ResampleKernel sharp(Type::kCubicSharp);
   sharp.ScaleForDownSample(1, 1.75f);
-  EXPECT_EQ(sharp.Width(), 10);
-  ExpectTable(
-      sharp, 10, [](double d) { return Keys(d, -1 - (double(-2.2f) + 1)); }, true);
+  ExpectTable(sharp, 10, Cubic(1, -1 - (kSharpest + 1)), true);
 }
 
 TEST(ResampleKernel, TheKeyIsTheSecondScaleOfBothDirections) {

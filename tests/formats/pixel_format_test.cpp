@@ -343,12 +343,10 @@ TEST(FlipInPlace, TurnsEveryRasterAndKeepsThePadding) {
   for (const auto format : {VX_PIXEL_FORMATS(LISTED) FromBits(0x40)}) {
 #undef LISTED
     if (IsSpecial(format)) continue;
-    ArenaCase arenaCase;
-    arenaCase.name = "VX_FlipInPlace";
-    arenaCase.destination = format;
-    arenaCase.destinationIsInput = true;
-    arenaCase.run = [](const ArenaFrame*, const ArenaFrame& frame) { return FlipAndCheck(frame); };
-    EXPECT_TRUE(RunArena(arenaCase));
+    EXPECT_TRUE(RunArena({.name = "VX_FlipInPlace",
+                          .destination = format,
+                          .run = [](const ArenaFrame*, const ArenaFrame& frame) { return FlipAndCheck(frame); },
+                          .destinationIsInput = true}));
   }
 }
 

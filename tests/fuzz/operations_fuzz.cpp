@@ -51,37 +51,26 @@ Operation AnyOperation(Input& input) {
                                     VX_FillWithTransparentWhite};
   using Sources = const ArenaFrame*;
   using To = const ArenaFrame&;
-  const int kind = input.ConsumeIntegralInRange(0, 7), option = input.ConsumeIntegralInRange(-1, 6);
-  const int choice = input.ConsumeIntegralInRange(-1, 27), angle = choice % 4 * 90;
+  const int option = input.ConsumeIntegralInRange(-1, 6), choice = input.ConsumeIntegralInRange(-1, 27);
+  const int angle = choice % 4 * 90;
   const bool other = input.ConsumeBool();
   const F a = input.Raster(), b = input.Raster(), c = input.Raster(), to = input.Raster();
   const float x = input.Fraction(), y = input.Fraction(), z = input.Fraction();
-  switch (kind) {
-    case 0:
-      return {{a}, to, [=](Sources s, To d) { return Convert(*s, d, option); }};
-    case 1:
-      return {{to},
-              to,
-              [=](Sources s, To d) { return Rotate(*s, d, other ? -angle : angle, option > 2); },
-              angle % 180 != 0};
-    case 2:
-      return {{a, b}, to, [=](Sources s, To d) {
-                return Blend(static_cast<VX_BlendMode>(choice), s[0], s[1], d, x, option);
-              }};
-    case 3:
-      return {{a}, to, [=](Sources s, To d) {
-                int32_t state;
-                return other ? ToBlackTested(*s, d, &state, option) : ToBlack(*s, d, x, option);
-              }};
-    case 4:
-      return {{a, b}, to, [=](Sources s, To d) { return Dissolve(s[0], s[1], d, x, option); }};
-    case 5:
-      return {{a}, to, [=](Sources s, To d) { return AlphaGain(*s, d, x, option); }};
-    case 6:
-      return {{a, b, c}, to, [=](Sources s, To d) { return Accumulate({s[0], s[1], s[2]}, d, {x, y, z}); }};
-    default:
-      return {{}, to, [=](Sources, To d) { return FillWith(kFills[choice & 3], d); }};
-  }
+  const Operation all[] = {
+      {{a}, to, [=](Sources s, To d) { return Convert(*s, d, option); }},
+      {{to}, to, [=](Sources s, To d) { return Rotate(*s, d, other ? -angle : angle, option > 2); }, angle % 180 != 0},
+      {{a, b}, to, [=](Sources s, To d) { return Blend(static_cast<VX_BlendMode>(choice), s[0], s[1], d, x, option); }},
+      {{a}, to, [=](Sources s, To d) { return ToBlack(*s, d, x, option); }},
+      {{a}, to, [=](Sources s, To d) { return ToBlackTested(*s, d, nullptr, option); }},
+      {{a, b}, to, [=](Sources s, To d) { return Dissolve(s[0], s[1], d, x, option); }},
+      {{a}, to, [=](Sources s, To d) { return AlphaGain(*s, d, x, option); }},
+      {{a, b, c},
+       to,
+       [=](Sources s, To d) {
+         return Accumulate({s[0], s[1], s[2]}, d, {x, y, z});
+       }},
+      {{}, to, [=](Sources, To d) { return FillWith(kFills[choice & 3], d); }}};
+  return all[input.ConsumeIntegralInRange<size_t>(0, std::size(all) - 1)];
 }
 
 // A refusal depends on formats and arguments only, not on the buffers.

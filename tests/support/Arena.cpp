@@ -25,16 +25,9 @@ constexpr int kMostSources = 4;
 constexpr uint32_t kCallerMode = 0x1F80;
 constexpr uint8_t kFirstPadding = 0x5A, kSecondPadding = 0xA5;
 
-const char* GuardName(Guard guard) {
-  static constexpr const char* kNames[] = {"Behind", "Before", "Shifted", "Packed"};
-  return kNames[static_cast<int>(guard)];
-}
-
-const char* ContentsName(Contents contents) {
-  static constexpr const char* kNames[] = {"Random",     "Extremes",  "Zeros",      "Maximum",
-                                           "ClearAlpha", "TinyAlpha", "OpaqueAlpha"};
-  return kNames[static_cast<int>(contents)];
-}
+constexpr const char* kGuardNames[] = {"Behind", "Before", "Shifted", "Packed"};
+constexpr const char* kContentsNames[] = {"Random",     "Extremes",  "Zeros",      "Maximum",
+                                          "ClearAlpha", "TinyAlpha", "OpaqueAlpha"};
 
 // ---- Memory: pictures between unreadable pages
 
@@ -51,11 +44,6 @@ constexpr size_t kMargin = 256;
 
 void Check(bool done, const char* what) {
   if (!done) throw std::system_error(errno, std::generic_category(), what);
-}
-
-size_t SampleBytes(VX_PixelFormat format) {
-  if (Depth(format) == kDepth8u) return 1;
-  return Depth(format) == kDepth15u || (Depth(format) == kDepth10u && Is420(format)) ? 2 : 4;
 }
 
 // Reserved address space that faults on every access.
@@ -320,8 +308,8 @@ class Arena {
               " (row bytes " + std::to_string(src.rowBytes) + ") ";
     }
     return text + "-> " + FormatName(dst.format) + " " + std::to_string(dst.width) + "x" + std::to_string(dst.height) +
-           " (row bytes " + std::to_string(dst.rowBytes) + "), " + GuardName(mGuard) + ", " + ContentsName(mContents) +
-           ", " + KernelVariantName(mVariant);
+           " (row bytes " + std::to_string(dst.rowBytes) + "), " + kGuardNames[static_cast<int>(mGuard)] + ", " +
+           kContentsNames[static_cast<int>(mContents)] + ", " + KernelVariantName(mVariant);
   }
 
   std::string DescribeFault(const uint8_t* address, bool write) const {

@@ -51,18 +51,18 @@ std::vector<int> Range(int first, int last);
 
 struct ArenaCase {
   std::string name;
-  std::vector<VX_PixelFormat> sources;
+  std::vector<VX_PixelFormat> sources = {};
   VX_PixelFormat destination{};
   size_t elementBytes = 0;  // if not 0: rows of elements of this size instead of the formats' pixels, at any address
   // sources points to as many frames as there are source formats. May be called any number of times.
-  std::function<VX_Result(const ArenaFrame* sources, const ArenaFrame& destination)> run;
+  std::function<VX_Result(const ArenaFrame* sources, const ArenaFrame& destination)> run = {};
 
   bool destinationIsInput = false;  // in place: the destination holds pixels, equal ones in both runs
   VX_Result expected = VX_Success;  // any other code: the destination must stay as it was
   std::vector<int> widths = Range(1, 130);
   std::vector<int> heights = Range(1, 8);  // one is drawn for each width and guard
   // The size of a source for a destination size; the same if empty.
-  std::function<ArenaSize(int source, ArenaSize destination)> sourceSize;
+  std::function<ArenaSize(int source, ArenaSize destination)> sourceSize = {};
   bool everyContents = false;  // for each width and guard all contents, instead of one drawn
   int passes = 1;
   uint64_t seed = 1;

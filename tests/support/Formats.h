@@ -20,6 +20,15 @@ inline std::vector<VX_PixelFormat> RasterFormats() {
   return formats;
 }
 
+inline int DepthBits(VX_PixelFormat f) {
+  return Depth(f) == kDepth8u ? 8 : Depth(f) == kDepth10u ? 10 : Depth(f) == kDepth15u ? 15 : 32;
+}
+// Of a sample, or of the word of three that rasters of ten bits have.
+inline size_t SampleBytes(VX_PixelFormat f) {
+  if (Depth(f) == kDepth8u) return 1;
+  return Depth(f) == kDepth15u || (Depth(f) == kDepth10u && Is420(f)) ? 2 : 4;
+}
+
 // All 4:2:0 formats: 16 planar ones and 22 biplanar ones.
 inline std::vector<VX_PixelFormat> Formats420() {
   std::vector<VX_PixelFormat> formats;

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "support/Arena.h"
+#include "support/Formats.h"
 #include "support/Operations.h"
 #include "support/PaddedRows.h"
 #include "support/Test.h"
@@ -40,32 +41,40 @@ struct Image {
 // Where the alpha of a pixel of four channels is.
 inline size_t AlphaAt(VX_PixelFormat format) { return IsReversed(format) ? 0 : 3; }
 
-// Samples of 8u, 15u and 32f as numbers.
-inline double FullScale(VX_PixelFormat f) { return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth15u ? 32768 : 1; }
-inline size_t SampleBytes(VX_PixelFormat f) { return Depth(f) == kDepth8u ? 1 : Depth(f) == kDepth15u ? 2 : 4; }
-inline size_t SampleCount(const Image& image) { return image.bytes.size() / SampleBytes(image.format); }
+inline double FullScale(VX_PixelFormat f) {
+  return Depth(f) == kDepth8u ? 255 : Depth(f) == kDepth10u ? 1023 : Depth(f) == kDepth15u ? 32768 : 1;
+}
 
+// Samples as numbers, of ten bits the three of each word.
+inline size_t SampleCount(const Image& image) {
+  return image.bytes.size() / SampleBytes(image.format) * (Depth(image.format) == kDepth10u ? 3 : 1);
+}
 inline double SampleAt(const uint8_t* samples, size_t i, VX_PixelFormat f) {
-  uint16_t word = samples[i * SampleBytes(f)];
-  float real;
-  if (Depth(f) != kDepth8u) std::memcpy(&word, samples + 2 * i, 2);
-  if (Depth(f) != kDepth32f) return word;
-  std::memcpy(&real, samples + 4 * i, 4);
-  return double{real};
+  const auto get = [&](auto sample, size_t index) {
+    std::memcpy(&sample, samples + index * sizeof sample, sizeof sample);
+    return sample;
+  };
+  if (Depth(f) == kDepth8u) return samples[i];
+  if (Depth(f) == kDepth15u) return get(uint16_t{}, i);
+  if (Depth(f) == kDepth32f) return double{get(0.0f, i)};
+  return get(0u, i / 3) >> (i % 3 * 10 + (IsV210(f) ? 0 : 2)) & 1023;
 }
 inline void PutSample(uint8_t* samples, size_t i, VX_PixelFormat f, double value) {
   const auto put = [&](auto sample) { std::memcpy(samples + i * sizeof sample, &sample, sizeof sample); };
-  if (Depth(f) == kDepth32f)
-    put(static_cast<float>(value));
-  else if (Depth(f) == kDepth15u)
-    put(static_cast<uint16_t>(static_cast<int>(value)));
-  else
-    put(static_cast<uint8_t>(value));
+  if (Depth(f) == kDepth32f) return put(static_cast<float>(value));
+  if (Depth(f) == kDepth15u) return put(static_cast<uint16_t>(static_cast<int>(value)));
+  put(static_cast<uint8_t>(value));
 }
 
 // Whether pixels have a fourth channel, and whether a matte colour may be taken from them.
 inline bool IsPixels(VX_PixelFormat f) { return Layout(f) == kLayout4444 && AlphaKind(f) != kAlphaNone; }
 inline bool IsMatted(VX_PixelFormat f) { return IsPixels(f) && !IsYuv(f) && AlphaKind(f) != kAlphaIgnored; }
+// Whether alpha may be set in place.
+inline bool IsSettable(VX_PixelFormat f) {
+  constexpr F kSettable[] = {F::BGRA_4444_8u,         F::VUYA_4444_8u,  F::BGRA_4444_15u, F::BGRA_4444_32f,
+                             F::BGRA_4444_32f_Linear, F::VUYA_4444_32f, F::ARGB_4444_32f, F::ARGB_4444_32f_Linear};
+  return std::find(std::begin(kSettable), std::end(kSettable), f) != std::end(kSettable);
+}
 
 // Whether a format has alpha to honour.
 inline bool CarriesAlpha(VX_PixelFormat format) {
