@@ -70,6 +70,12 @@ bool CanStream(const Job& job, int elementSize) {
          reinterpret_cast<uintptr_t>(job.dst) % static_cast<unsigned>(elementSize) == 0;
 }
 
+// Whether a frame passed through once would push itself out of the cache.
+bool IsLarge(const Job& job, int elementSize) {
+  const size_t bytes = static_cast<size_t>(job.width) * elementSize * job.height;
+  return VX_GetCacheSize() != 0 && bytes >= VX_GetCacheSize() / 2;
+}
+
 // Up to a tile of elements from (x, y) on, moved in a copy.
 void TransposeEdge(const Job& job, int elementSize, TransposeTile transpose, int32_t x, int32_t y, int32_t columns,
                    int32_t rows) {
@@ -78,7 +84,7 @@ void TransposeEdge(const Job& job, int elementSize, TransposeTile transpose, int
   uint8_t* to = job.dst + x * job.dstRowBytes + static_cast<ptrdiff_t>(y) * elementSize;
   for (int32_t i = 0; i < rows; ++i)
     std::memcpy(in + i * kTileBytes, from + i * job.srcRowBytes, static_cast<size_t>(columns) * elementSize);
-  transpose(in, kTileBytes, out, kTileBytes, 1, 1);
+  transpose(in, kTileBytes, out, kTileBytes, 1, 1, 4);
   for (int32_t i = 0; i < columns; ++i)
     std::memcpy(to + i * job.dstRowBytes, out + i * kTileBytes, static_cast<size_t>(rows) * elementSize);
 }
@@ -87,6 +93,8 @@ void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
   const int sizeLog = std::countr_zero(static_cast<unsigned>(elementSize));
   const int32_t tile = kTileBytes >> sizeLog;
   const bool stream = CanStream(job, elementSize);
+  // Memory gives longer runs of a row sooner; small elements have the most rows side by side.
+  const size_t ahead = elementSize < 4 && IsLarge(job, elementSize) ? 8 : 4;
   const TransposeTile stored = kTransposeTiles[sizeLog][variant];
   const TransposeTile transpose = stream ? kStreamTiles[sizeLog][variant] : stored;
   // When streaming, the first source rows bring the destination columns to a line's start.
@@ -106,7 +114,7 @@ void TransposeByTiles(const Job& job, int elementSize, KernelVariant variant) {
       const int32_t y1 = std::min(y0 + block, bottom);
       transpose(job.src + y0 * job.srcRowBytes + (static_cast<ptrdiff_t>(panel) << sizeLog), job.srcRowBytes,
                 job.dst + panel * job.dstRowBytes + (static_cast<ptrdiff_t>(y0) << sizeLog), job.dstRowBytes,
-                static_cast<size_t>((y1 - y0) / tile), static_cast<size_t>((right - panel) / tile));
+                static_cast<size_t>((y1 - y0) / tile), static_cast<size_t>((right - panel) / tile), ahead);
       for (int32_t y = y0; y < y1; y += tile) edge(right, panelEnd - right, y, tile);
     }
     for (int32_t x = panel; x < panelEnd; x += tile) edge(x, std::min(tile, panelEnd - x), bottom, job.height - bottom);
@@ -129,12 +137,6 @@ int RotationPixelBytes(VX_PixelFormat format) noexcept {
     default:
       return 0;
   }
-}
-
-// Whether a frame copied row by row would push itself out of the cache.
-bool IsLarge(const Job& job, int pixelBytes) {
-  const size_t bytes = static_cast<size_t>(job.width) * pixelBytes * job.height;
-  return VX_GetCacheSize() != 0 && bytes >= VX_GetCacheSize() / 2;
 }
 
 void CopyRows(const Job& job, int pixelBytes, KernelVariant variant) {

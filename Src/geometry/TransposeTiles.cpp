@@ -17,8 +17,6 @@ namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 namespace {
 
-constexpr size_t kAhead = 4;  // lines of a row that are fetched together
-
 // 16 bytes of one row in each block of a vector.
 template <class D>
 HWY_INLINE hn::VFromD<D> LoadBlocks(D d, const uint8_t* src, [[maybe_unused]] ptrdiff_t rowBytes) {
@@ -101,6 +99,18 @@ HWY_INLINE void Columns(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst,
 }
 
 #if HWY_TARGET == HWY_AVX3
+// Exchanges rows and columns of 4 x 4 blocks of 16 bytes.
+template <class V>
+HWY_INLINE void ExchangeBlocks(V r0, V r1, V r2, V r3, V* HWY_RESTRICT columns, size_t step) {
+  const auto even = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0x88)}; };
+  const auto odd = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0xDD)}; };
+  const V even01 = even(r0, r1), even23 = even(r2, r3), odd01 = odd(r0, r1), odd23 = odd(r2, r3);
+  columns[0] = even(even01, even23);
+  columns[step] = even(odd01, odd23);
+  columns[2 * step] = odd(even01, even23);
+  columns[3 * step] = odd(odd01, odd23);
+}
+
 // Reads and writes each line of a tile once, whatever places in the cache its rows share.
 template <class T, int kSize, bool kStream>
 HWY_INLINE void WholeLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes) {
@@ -115,21 +125,39 @@ HWY_INLINE void WholeLines(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* d
     for (int i = 0; i < n; ++i) rows[b][i] = hn::BitCast(d, hn::LoadU(d8, src + (b * n + i) * srcRowBytes));
     TransposeBlocks(rows[b]);
   }
-  // Then the blocks change places.
-  const auto even = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0x88)}; };
-  const auto odd = [](V v, V w) HWY_ATTR { return V{_mm512_shuffle_i32x4(v.raw, w.raw, 0xDD)}; };
   HWY_UNROLL(4)
-  for (int i = 0; i < n; ++i) {
-    const V even01 = even(rows[0][i], rows[1][i]), even23 = even(rows[2][i], rows[3][i]);
-    const V odd01 = odd(rows[0][i], rows[1][i]), odd23 = odd(rows[2][i], rows[3][i]);
-    lines[0][i] = even(even01, even23);
-    lines[1][i] = even(odd01, odd23);
-    lines[2][i] = odd(even01, even23);
-    lines[3][i] = odd(odd01, odd23);
-  }
+  for (int i = 0; i < n; ++i) ExchangeBlocks(rows[0][i], rows[1][i], rows[2][i], rows[3][i], &lines[0][i], n);
   HWY_UNROLL(4)
   for (int b = 0; b < 4; ++b) HWY_UNROLL(4)
   for (int i = 0; i < n; ++i) StoreBytes<kStream>(lines[b][i], dst + (b * n + i) * dstRowBytes);
+}
+
+// The same for a tile that is more than the registers hold, by way of its blocks.
+template <class T, int kSize, bool kStream, class Fetch>
+HWY_INLINE void ThinTile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes,
+                         const Fetch& fetch) {
+  const hn::ScalableTag<uint8_t> d8;
+  const hn::ScalableTag<T> d;
+  using V = hn::VFromD<decltype(d)>;
+  constexpr int n = 16 / kSize;
+  alignas(64) uint8_t blocks[4][n][kTileBytes];
+  for (auto& group : blocks) {
+    fetch(n);
+    V rows[n];
+    HWY_UNROLL(16)
+    for (int i = 0; i < n; ++i) rows[i] = hn::BitCast(d, hn::LoadU(d8, src + i * srcRowBytes));
+    TransposeBlocks(rows);
+    HWY_UNROLL(16)
+    for (int i = 0; i < n; ++i) hn::Store(hn::BitCast(d8, rows[i]), d8, group[i]);
+    src += n * srcRowBytes;
+  }
+  for (int i = 0; i < n; ++i, dst += dstRowBytes) {
+    const auto load = [&](int group) HWY_ATTR { return hn::Load(d8, blocks[group][i]); };
+    hn::VFromD<decltype(d8)> lines[4];
+    ExchangeBlocks(load(0), load(1), load(2), load(3), lines, 1);
+    HWY_UNROLL(4)
+    for (int b = 0; b < 4; ++b) StoreBytes<kStream>(lines[b], dst + b * n * dstRowBytes);
+  }
 }
 #endif
 
@@ -148,25 +176,25 @@ HWY_INLINE void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, pt
   }
 }
 
-template <class T, int kSize, bool kStream>
+template <class T, int kSize, bool kStream, size_t kAhead>
 HWY_INLINE void Strip(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down,
                       size_t across) {
   constexpr ptrdiff_t kRows = kTileBytes / kSize;
-  constexpr int kColumns = kTileBytes / 16, n = 16 / kSize;
   const size_t rows = down * kRows;
+  constexpr int kColumns = kTileBytes / 16, n = 16 / kSize;
   // Lines at such distances share few places in the cache: source lines are read once, and destination lines written
   // four in a row.
-  const bool gather = kSize < 4 && (srcRowBytes % (1024 * kSize) == 0 || dstRowBytes % (1024 * kSize) == 0);
+  constexpr int kGatherSize = HWY_TARGET == HWY_AVX3 ? 1 : 2;
+  const bool gather = kSize <= kGatherSize && (srcRowBytes % (1024 * kSize) == 0 || dstRowBytes % (1024 * kSize) == 0);
   for (size_t x = 0; x < across; ++x, dst += kRows * dstRowBytes) {
     // So many rows at once are more than the hardware follows. With each tile, the lines of the next tiles are fetched
     // for some of the rows; after the last tile, those of the rows below.
     const size_t next = x / kAhead * kAhead + kAhead;
-    const uint8_t* ahead =
-        (next < across ? src + next * kTileBytes : src + static_cast<ptrdiff_t>(rows) * srcRowBytes) +
-        static_cast<ptrdiff_t>(x % kAhead * rows / kAhead) * srcRowBytes;
+    const uint8_t* line = (next < across ? src + next * kTileBytes : src + static_cast<ptrdiff_t>(rows) * srcRowBytes) +
+                          static_cast<ptrdiff_t>(x % kAhead * rows / kAhead) * srcRowBytes;
     const auto fetch = [&](size_t count) HWY_ATTR {
-      for (size_t i = 0; i < count; ++i, ahead += srcRowBytes)
-        for (size_t k = 0; k < kAhead; ++k) __builtin_prefetch(ahead + k * kTileBytes);
+      for (size_t i = 0; i < count; i += kAhead, line += srcRowBytes)
+        for (size_t k = 0; k < kAhead; ++k) __builtin_prefetch(line + k * kTileBytes);
     };
     const uint8_t* from = src + x * kTileBytes;
     if (gather) {
@@ -181,19 +209,28 @@ HWY_INLINE void Strip(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, p
       }
       for (int c = 0; c < kColumns; ++c)
         Columns<T, kSize, kStream, 1, kTiles>(in + 16 * c, kTileBytes, dst + c * n * dstRowBytes, dstRowBytes, down);
-    } else {
-      for (size_t t = 0; t < down; ++t, from += kRows * srcRowBytes) {
-        fetch(kRows / kAhead);
-        Tile<T, kSize, kStream>(from, srcRowBytes, dst + t * kTileBytes, dstRowBytes);
+      continue;
+    }
+    for (size_t t = 0; t < down; ++t, from += kRows * srcRowBytes) {
+#if HWY_TARGET == HWY_AVX3
+      if constexpr (kSize < 4) {
+        ThinTile<T, kSize, kStream>(from, srcRowBytes, dst + t * kTileBytes, dstRowBytes, fetch);
+        continue;
       }
+#endif
+      fetch(kRows);
+      Tile<T, kSize, kStream>(from, srcRowBytes, dst + t * kTileBytes, dstRowBytes);
     }
   }
 }
 
 #define VX_TILE(name, T, kSize, kStream)                                                                 \
   void name(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down, \
-            size_t across) {                                                                             \
-    Strip<T, kSize, kStream>(src, srcRowBytes, dst, dstRowBytes, down, across);                          \
+            size_t across, size_t ahead) {                                                               \
+    if (kSize < 4 && ahead == 8)                                                                         \
+      Strip < T, kSize, kStream, kSize<4 ? 8 : 4>(src, srcRowBytes, dst, dstRowBytes, down, across);     \
+    else                                                                                                 \
+      Strip<T, kSize, kStream, 4>(src, srcRowBytes, dst, dstRowBytes, down, across);                     \
   }
 VX_TILE(Tile1, uint8_t, 1, false)
 VX_TILE(Tile2, uint16_t, 2, false)
@@ -267,7 +304,8 @@ namespace plain {
 namespace {
 
 template <int kSize>
-void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down, size_t across) {
+void Tile(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes, size_t down, size_t across,
+          size_t) {
   constexpr size_t kColumns = kTileBytes / kSize;
   const auto rows = static_cast<ptrdiff_t>(kColumns * down), columns = static_cast<ptrdiff_t>(kColumns * across);
   for (ptrdiff_t x = 0; x < columns; ++x)

@@ -15,9 +15,10 @@ inline constexpr int kTileBytes = 64;
 // 4,096 bytes apart; four in a row are not.
 inline constexpr size_t kStripTiles = 4;
 
-// Full tiles of kTileBytes / size elements each way, up to kStripTiles `down` and any number `across`.
+// Full tiles of kTileBytes / size elements each way, up to kStripTiles `down` and any number `across`; `ahead` lines of
+// a row, 4 or 8, are fetched together.
 using TransposeTile = void (*)(const uint8_t* src, ptrdiff_t srcRowBytes, uint8_t* dst, ptrdiff_t dstRowBytes,
-                               size_t down, size_t across);
+                               size_t down, size_t across, size_t ahead);
 
 // For element sizes 1, 2, 4, 8 and 16; index is the logarithm of the size.
 extern const KernelVariants<TransposeTile> kTransposeTiles[5];

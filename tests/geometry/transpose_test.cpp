@@ -82,7 +82,8 @@ TEST(Transpose, LargePictures) {
   for (size_t size = 1; size <= 16; ++size)
     for (const auto& [width, lines, offset] :
          {std::tuple{2055, 0, 3}, {1021, 0, 0}, {700, 1, 0}, {700, 1, 48}, {1021, 1, 16}, {2127, 1, 16}}) {
-      if (lines && (size & (size - 1))) continue;  // the others are not streamed
+      if (lines && (size & (size - 1))) continue;                       // the others are not streamed
+      const SmallCache cache(offset == 16 ? 1024 : VX_GetCacheSize());  // where more is fetched ahead
       const int step = static_cast<int>(size), height = lines ? (1 << 20) / (width * step) + 37 : 261;
       const int padding = lines ? 64 - height * step % 64 : 2 * step;
       PaddedRows src(static_cast<size_t>(width * step), height, 3 * step, lines == 0, 1, 5);
