@@ -102,6 +102,14 @@ TEST(Planner, ExplainsSpecialEnds) {
   EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME, 2, formats, &count), VX_ErrFormatNotHandled);
 }
 
+TEST(Planner, RefusesSpecialAndUnknownFormats) {
+  Plan plan;
+  EXPECT_EQ(MakePlan(F::PALDV25, F::BGRA_4444_8u, 2, &plan), VX_ErrUnsupportedFormat);
+  EXPECT_EQ(MakePlan(F::BGRA_4444_8u, F::YUV_420_MPEG2_FRAME, 2, &plan), VX_ErrUnsupportedDestinationFormat);
+  EXPECT_EQ(MakePlan(FromBits(0x105), F::BGRA_4444_8u, 2, &plan), VX_ErrFailed);
+  EXPECT_EQ(MakePlan(F::BGRA_4444_8u, FromBits(0x00FFFFFF), 2, &plan), VX_ErrFailed);
+}
+
 TEST(Planner, RenderQualityPicksTheChromaKernelOnly) {
   Plan low, high;
   ASSERT_EQ(MakePlan(F::UYVY_422_32f, F::VUYA_4444_32f, 1, &low), VX_Success);
