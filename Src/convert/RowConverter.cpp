@@ -20,13 +20,18 @@ bool OutlastsMemory(const RowKernelSet* kernel) {
          kernel == &kLinearToBgrx32f;
 }
 
+// Steps that leave pixels as they are where alpha is 1.
+bool ScalesByAlpha(const RowKernelSet* kernel) {
+  return kernel == &kPremultiplyLast32f || kernel == &kPremultiplyFirst32f || kernel == &kUnpremultiplyLast32f ||
+         kernel == &kUnpremultiplyFirst32f;
+}
+
 }  // namespace
 
 VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, int32_t width,
                                 KernelVariant variant) noexcept {
   Plan plan;
   if (const VX_Result result = MakePlan(src, dst, renderQuality, &plan)) return result;
-  mStepCount = plan.stepCount;
   mWidth = static_cast<size_t>(std::max(width, 0));
   mDstFormat = dst;
   mSrcBytesPerSixPixels = BytesPerSixPixels(src);
@@ -36,10 +41,23 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
   mStream = false;
   mWholeRow = false;
   mOutlastsMemory = false;
-  for (int i = 0; i < mStepCount; ++i) {
-    mSteps[i] = (*plan.steps[i].kernel)[variant];
+  // What had no alpha gets an opaque one on its way. Numbers that come from floats are left to their steps, which may
+  // flush or quiet them.
+  const bool opaque =
+      AlphaKind(src) != kAlphaStraight && AlphaKind(src) != kAlphaPremultiplied && Depth(src) != kDepth32f;
+  const RowKernelSet* before = nullptr;
+  mStepCount = 0;
+  for (int i = 0; i < plan.stepCount; ++i) {
+    const RowKernelSet* kernel = plan.steps[i].kernel;
+    if (opaque && ScalesByAlpha(kernel)) continue;
+    if (before == &kWiden8uTo32f && kernel == &kBgra32fToLinear) {
+      kernel = &kBgra8ToLinear;
+      --mStepCount;
+    }
+    mSteps[mStepCount++] = (*kernel)[variant];
     mWholeRow |= plan.steps[i].span == StepSpan::Row;
-    mOutlastsMemory |= OutlastsMemory(plan.steps[i].kernel);
+    mOutlastsMemory |= OutlastsMemory(kernel);
+    before = kernel;
   }
   if (const RowKernelSet* fused = FusedKernelFor(src, dst)) {
     mSteps[0] = (*fused)[variant];
