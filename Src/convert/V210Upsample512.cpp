@@ -4,7 +4,12 @@
 
 #include <cstring>
 
+#include "convert/PixelWords512.h"
+
 namespace vexel {
+
+using namespace words512;
+
 namespace {
 
 constexpr size_t kBlockPixels = 96, kBlockBytes = 256, kStepBytes = 64, kStepPixelBytes = 128, kFetchAhead = 8192;
@@ -35,8 +40,6 @@ VX_VBMI_INLINE __m512i AtTop(const uint8_t* block) {
   return _mm512_mullo_epi16(words, _mm512_load_si512(kSamples.factors));
 }
 
-VX_VBMI_INLINE __m512i Words(int value) { return _mm512_set1_epi16(static_cast<int16_t>(value)); }
-
 // Codes times 64; what is below a sample is left in the words of luma.
 template <size_t kStep>
 VX_VBMI_INLINE __m512i Luma(const uint8_t* block) {
@@ -47,35 +50,11 @@ VX_VBMI_INLINE __m512i Chroma(const uint8_t* block) {
   return _mm512_and_si512(AtTop<kStep, 0>(block), Words(0xFFC0));
 }
 
-// Bytes of 32 pixels, from those of their first and third channel in each 16 bytes and of their second and fourth.
-struct PixelOrder {
-  constexpr PixelOrder() : bytes{} {
-    for (uint32_t i = 0; i < 128; ++i) {
-      const uint32_t pixel = i / 4, channel = i % 4, at = pixel / 8 * 16 + pixel % 8;
-      bytes[i] = static_cast<uint8_t>(at + channel / 2 * 8 + channel % 2 * 64);
-    }
-  }
-  alignas(64) uint8_t bytes[128];
-};
-
-VX_VBMI_INLINE void StoreOrdered(__m512i a, const uint8_t* order, __m512i b, uint8_t* dst) {
-  _mm512_storeu_si512(dst, _mm512_permutex2var_epi8(a, _mm512_load_si512(order), b));
-  _mm512_storeu_si512(dst + 64, _mm512_permutex2var_epi8(a, _mm512_load_si512(order + 64), b));
-}
-
-VX_VBMI_INLINE void StoreChannels(__m512i c0, __m512i c1, __m512i c2, uint8_t* dst) {
-  static constexpr PixelOrder kOrder;
-  StoreOrdered(_mm512_packus_epi16(c0, c2), kOrder.bytes, _mm512_packus_epi16(c1, Words(255)), dst);
-}
-
 // Chroma of the pixels about 0, from pairs of words (U, V) for the even and for the odd pixels.
 struct PixelChroma {
   VX_VBMI_INLINE PixelChroma(__m512i even, __m512i odd) {
-    const __m512i low = _mm512_set4_epi32(0x0D0C0D0C, 0x09080908, 0x05040504, 0x01000100),
-                  high = _mm512_set4_epi32(0x0F0E0F0E, 0x0B0A0B0A, 0x07060706, 0x03020302);
     even = _mm512_xor_si512(even, Words(0x8000)), odd = _mm512_xor_si512(odd, Words(0x8000));
-    u = _mm512_mask_shuffle_epi8(even, 0xCCCCCCCCCCCCCCCC, odd, low);
-    v = _mm512_mask_shuffle_epi8(odd, 0x3333333333333333, even, high);
+    u = JoinLow(even, odd), v = JoinHigh(even, odd);
   }
   __m512i u, v;
 };
