@@ -36,10 +36,13 @@ void RemoveWhenInterrupted(const std::string& path) {
   WhenInterrupted(RemoveUnfinished);
 }
 
+// Beside the target, whose name may be as long as names can be.
 std::string UnfinishedName(const std::string& target) {
-  char number[16];
-  std::snprintf(number, sizeof number, "%08x", static_cast<unsigned>(std::random_device()()));
-  return target + '.' + number + ".part";
+  constexpr size_t kMostKept = 200;
+  char suffix[24];
+  std::snprintf(suffix, sizeof suffix, ".%08x.part", static_cast<unsigned>(std::random_device()()));
+  const fs::path path(target);
+  return (path.parent_path() / (path.filename().string().substr(0, kMostKept) + suffix)).string();
 }
 
 // Whether a file that is there may be written to; renaming would replace it all the same.
@@ -64,9 +67,11 @@ void OutputFile::Open() {
   }
   std::error_code error;
   const fs::path canonical = fs::canonical(mPath, error);
-  mTarget = error ? mPath : canonical.string();
-  const bool exists = fs::exists(mTarget, error);
-  if (exists && !fs::is_regular_file(mTarget, error)) {
+  const bool isResolved = !error;
+  mTarget = isResolved ? canonical.string() : mPath;
+  // A link whose end has no name, or is not there yet, exists as well; renaming would replace the link.
+  const bool exists = fs::exists(fs::symlink_status(mTarget, error));
+  if (exists && !(isResolved && fs::is_regular_file(mTarget, error))) {
     mFile = std::fopen(mTarget.c_str(), "wb");
   } else if (!exists || IsWritable(mTarget)) {
     const std::string unfinished = UnfinishedName(mTarget);

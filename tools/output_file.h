@@ -11,8 +11,8 @@ namespace tool {
 
 class OutputFile {
  public:
-  // "-" is standard output; what is there and no regular file (a device, a named pipe) is written in place. Nothing is
-  // made before the first Write().
+  // "-" is standard output; what is there and no regular file (a device, a named pipe, a link to nothing) is written in
+  // place. Nothing is made before the first Write().
   explicit OutputFile(std::string path) : mPath(std::move(path)) {}
   ~OutputFile();
   OutputFile(const OutputFile&) = delete;

@@ -72,6 +72,12 @@ convert link.raw link.raw "${raw[@]}" --format BGRX_4444_8u
 convert noise.raw other.raw "${raw[@]}" --format BGRX_4444_8u
 same self.raw other.raw "a file converted onto itself"
 [ -L link.raw ] && [ "$(stat -c %a self.raw)" = 640 ] || fail "a file converted onto itself: $(ls -l)"
+ln -s later.raw early.raw
+for name in early "$(printf '%0251d')"; do
+  convert noise.raw "$name.raw" "${raw[@]}" --format BGRX_4444_8u
+  same "$name.raw" other.raw "a link to nothing, and the longest name"
+done
+same later.raw other.raw "a link to nothing"
 mkfifo pipe.raw && cat pipe.raw >piped &
 until [ -p pipe.raw ]; do sleep 0.01; done
 convert noise.raw pipe.raw "${raw[@]}" --format BGRX_4444_8u
