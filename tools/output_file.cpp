@@ -24,9 +24,15 @@ extern "C" void RemoveUnfinished(int signal) {
   std::raise(signal);
 }
 
+constexpr int kInterruptions[] = {
+#ifdef SIGHUP
+    SIGHUP,
+#endif
+    SIGINT, SIGTERM};
+
 // Signals that are ignored stay so.
 void WhenInterrupted(void (*handler)(int)) {
-  for (const int signal : {SIGINT, SIGTERM})
+  for (const int signal : kInterruptions)
     if (std::signal(signal, handler) == SIG_IGN) std::signal(signal, SIG_IGN);
 }
 

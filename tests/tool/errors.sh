@@ -54,14 +54,16 @@ cp picture.png kept.raw
 refuses 1 'ends in the middle of a frame' convert noise.raw kept.raw --raw-format BGRA_4444_8u --size 64x40 "${to_bgra[@]}"
 same picture.png kept.raw "a failed conversion over a file"
 mkfifo endless
-"$vexel" convert endless kept.raw "${raw[@]}" "${to_bgra[@]}" --threads 1 >log 2>&1 &
-{
-  cat noise.raw noise.raw
-  for ((i = 0; i < 100; ++i)); do [ -n "$(ls *.part 2>/dev/null)" ] && break || sleep 0.1; done
-  kill $!
-} >endless
-wait $!
-[ $? = 143 ] || fail "an interruption goes unnoticed: $(cat log)"
+for signal in HUP TERM; do
+  "$vexel" convert endless kept.raw "${raw[@]}" "${to_bgra[@]}" --threads 1 >log 2>&1 &
+  {
+    cat noise.raw noise.raw
+    for ((i = 0; i < 100; ++i)); do [ -n "$(ls *.part 2>/dev/null)" ] && break || sleep 0.1; done
+    kill -$signal $!
+  } >endless
+  wait $! 2>/dev/null
+  [ "$(kill -l $?)" = $signal ] || fail "an interruption goes unnoticed: $(cat log)"
+done
 same picture.png kept.raw "an interrupted conversion over a file"
 rm -f endless kept.raw
 [ "$(ls | grep -vx -e err -e out -e before)" = "$(grep -vx -e err -e out -e before before)" ] || fail "left behind: $(ls)"
