@@ -148,7 +148,7 @@ void OtherSizeCases(Size size) {
 
 // Conversions by way of a raster that the decoder makes or the encoder takes.
 void ConvertCases(Size size) {
-  const F nv12 = FromBits(0x0E000A31), i420 = F::YUV_420_MPEG4_FRAME_709;
+  const F nv12 = FromBits(0x0E000A31), p010 = FromBits(0x0E000A71), i420 = F::YUV_420_MPEG4_FRAME_709;
   const struct {
     const char* name;
     F src, dst;
@@ -157,7 +157,10 @@ void ConvertCases(Size size) {
                {"I420 709 to BGRA32f", i420, F::BGRA_4444_32f},
                {"NV12 709 to V210 709", nv12, F::V210_422_10u_709},
                {"UYVY8 709 to I420 709", F::UYVY_422_8u_709, i420},
+               {"V210 709 to I420 709", F::V210_422_10u_709, i420},
                {"BGRA8 to I420 full range", F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME_FullRange},
+               {"NV12 709 to I420 709", nv12, i420},
+               {"P010 709 to I420 709", p010, i420},
                {"NV12 709 to I420 full range", nv12, F::YUV_420_MPEG4_FRAME_FullRange}};
   for (const auto& c : cases) {
     const auto bytes = [&](F format) {

@@ -5,6 +5,7 @@
 #include "convert/Encode420Kernels.h"
 #include "convert/RgbKernels.h"
 #include "convert/RowConverter.h"
+#include "convert/YuvKernels.h"
 #include "convert/YuvMatrices.h"
 #include "frame/FpModeGuard.h"
 #include "frame/Scratch.h"
@@ -25,17 +26,42 @@ VX_PixelFormat WorkingFormat(VX_PixelFormat dst) noexcept {
   return IsVideoRange(dst) ? VX_PixelFormat::VUYX_4444_8u_709 : VX_PixelFormat::BGRX_4444_8u;
 }
 
-// Kernels that read the rows of a format as they are; null for rows that are converted first.
-const PairKernels* KernelsOf(VX_PixelFormat src, VX_PixelFormat working, int32_t quality) noexcept {
-  const PairKernels* const kernels = IsYuv(working) ? &kFromVuyx : &kFromBgrx;
-  if (src == working) return kernels;
+// Kernels, and the format of the rows that they read.
+struct Input {
+  const PairKernels* kernels;
+  VX_PixelFormat rows;
+};
+
+// Whether a plan begins with the one to the format that it has after some of its steps.
+bool BeginsWith(const Plan& plan, VX_PixelFormat src, int steps, int32_t quality) noexcept {
+  Plan start;
+  const auto isSame = [](const PlannedStep& a, const PlannedStep& b) { return a.kernel == b.kernel; };
+  return MakePlan(src, plan.steps[static_cast<size_t>(steps - 1)].to, quality, &start) == VX_Success &&
+         start.stepCount == steps &&
+         std::equal(plan.steps.begin(), plan.steps.begin() + steps, start.steps.begin(), isSame);
+}
+
+// Rows are converted no further than to what kernels read: they do not look at the fourth channel, and know the last
+// steps of some chains.
+Input InputOf(VX_PixelFormat src, VX_PixelFormat working, int32_t quality) noexcept {
+  const Input whole = {IsYuv(working) ? &kFromVuyx : &kFromBgrx, working};
   Plan plan;
-  if (MakePlan(src, working, quality, &plan) != VX_Success) return nullptr;
-  // They do not look at the fourth channel.
-  const PlannedStep &first = plan.steps[0], &last = plan.steps[static_cast<size_t>(plan.stepCount - 1)];
-  if (last.kernel != &kOpaqueLast8u) return nullptr;
-  if (plan.stepCount == 1) return kernels;
-  return plan.stepCount == 2 && first.kernel == &kPremultiplyLast8u ? &kFromBgra : nullptr;
+  if (src == working || MakePlan(src, working, quality, &plan) != VX_Success) return whole;
+  int steps = plan.stepCount;
+  const auto endsWith = [&](const RowKernelSet& kernel) {
+    const bool ends = steps > 0 && plan.steps[static_cast<size_t>(steps - 1)].kernel == &kernel;
+    if (ends) --steps;
+    return ends;
+  };
+  const PairKernels* kernels = whole.kernels;
+  if (endsWith(kOpaqueLast8u))
+    kernels = endsWith(kPremultiplyLast8u) ? &kFromBgra : kernels;
+  else if (endsWith(kUyvy8ToVuyx8))
+    kernels = &kFromUyvy;
+  else if (endsWith(kYuyv8ToVuyx8))
+    kernels = &kFromYuyv;
+  if (steps == 0) return {kernels, src};
+  return BeginsWith(plan, src, steps, quality) ? Input{kernels, plan.steps[static_cast<size_t>(steps - 1)].to} : whole;
 }
 
 constexpr int16_t Factor(double value) { return static_cast<int16_t>(value * 32768 + (value < 0 ? -0.5 : 0.5)); }
@@ -191,12 +217,9 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
   if (IsSpecial(srcFormat) || !CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
   const FpModeGuard fpMode;
   Lines lines(width);
-  const VX_PixelFormat working = WorkingFormat(dstFormat);
-  const PairKernels* kernels = KernelsOf(srcFormat, working, quality);
-  if (!kernels) {
-    if (const VX_Result result = lines.Convert(srcFormat, working, quality)) return result;
-    kernels = KernelsOf(working, working, quality);
-  }
+  const Input input = InputOf(srcFormat, WorkingFormat(dstFormat), quality);
+  if (input.rows != srcFormat)
+    if (const VX_Result result = lines.Convert(srcFormat, input.rows, quality)) return result;
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;
@@ -205,7 +228,7 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
     lines.SetRaster(top + (height - 1) * ptrdiff_t{srcRowBytes}, -ptrdiff_t{srcRowBytes});
   else
     lines.SetRaster(top, srcRowBytes);
-  return Encoder(dstFormat, dst, width, height, kernels).Run(lines);
+  return Encoder(dstFormat, dst, width, height, input.kernels).Run(lines);
 }
 
 VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat decoded, int32_t decodeQuality, void* dst,
@@ -216,13 +239,13 @@ VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat de
   const Picture420 picture = PictureFromBlock(src, srcFormat, width, height);
   Lines lines(width);
   if (const VX_Result result = lines.Decode(picture, decoded, decodeQuality)) return result;
-  const VX_PixelFormat working = WorkingFormat(dstFormat);
-  if (const VX_Result result = lines.Convert(decoded, working, quality)) return result;
+  const Input input = InputOf(decoded, WorkingFormat(dstFormat), quality);
+  if (const VX_Result result = lines.Convert(decoded, input.rows, quality)) return result;
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;
   TraceFullSize420(picture);
-  return Encoder(dstFormat, dst, width, height, KernelsOf(working, working, quality)).Run(lines);
+  return Encoder(dstFormat, dst, width, height, input.kernels).Run(lines);
 }
 
 }  // namespace vexel

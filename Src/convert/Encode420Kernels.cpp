@@ -5,12 +5,14 @@
 #include <cstdint>
 #include <cstring>
 
+#include "convert/PairOrder.h"
+
 #undef HWY_TARGET_INCLUDE
 #define HWY_TARGET_INCLUDE "convert/Encode420Kernels.cpp"
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
-#include "convert/YuvVectors8-inl.h"
+#include "convert/Pairs422-inl.h"
 #include "frame/KernelTable.h"
 
 #ifndef VEXEL_CONVERT_ENCODE420KERNELS_SCALES
@@ -281,6 +283,116 @@ HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
   std::memcpy(lines.v + x / 2, v, lines.chromaWidth - x / 2);
 }
 
+// Two lines of packed 4:2:2. An odd pixel has the mean of its neighbours' chroma, rounded up.
+template <class W, PairOrder kOrder>
+class PairEncoder {
+ public:
+  // Pixels of two vectors of pairs. A step takes the luma of a block and, as its chroma needs the pairs after it, makes
+  // the chroma of the block before.
+  static constexpr size_t kStep = 4 * kVectorPairs, kStepBytes = 2 * kStep;
+
+  // The first pair goes on to the left.
+  HWY_INLINE PairEncoder(uint32_t pairA, uint32_t pairB) { mBefore = Join(Dwords(pairA), Dwords(pairB)); }
+
+  HWY_INLINE void Luma(const uint8_t* pairs, uint8_t* luma) const {
+    constexpr int kByte = LumaByte(kOrder);
+    const auto words = [&](size_t i) HWY_ATTR { return AsI16(WordBytes<kByte>(LoadVector<uint8_t>(pairs, i))); };
+    StoreVector(OrderPacked2(PackBlocks(words(0), words(1))), luma);
+  }
+  HWY_INLINE void Take(const uint8_t* a, const uint8_t* b) {
+    mNext[0] = Join(LoadVector<uint8_t>(a, 0), LoadVector<uint8_t>(b, 0));
+    mNext[1] = Join(LoadVector<uint8_t>(a, 1), LoadVector<uint8_t>(b, 1));
+  }
+  HWY_INLINE void Chroma(uint8_t* u, uint8_t* v) {
+    static constexpr ShuffleTable kPlanes({0, 2, 4, 6, 8, 10, 12, 14, 1, 3, 5, 7, 9, 11, 13, 15});
+    const ScalableTag<uint8_t> d;
+    const hn::Half<decltype(d)> dHalf;
+    const I16 low = Filter(mNow[0], mNow[1]), high = Filter(mNow[1], mNext[0]);
+    const U8 chroma = OrderPacked4(hn::TableLookupBytes(PackBlocks(low, high), kPlanes.Load()));
+    hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
+    hn::StoreU(hn::UpperHalf(dHalf, chroma), dHalf, v);
+    Advance();
+  }
+  HWY_INLINE void Advance() { mNow[0] = mNext[0], mNow[1] = mNext[1]; }
+
+ private:
+  // Chroma of line a in the low bytes of words, of line b in the high ones.
+  static HWY_INLINE U8 Join(U8 a, U8 b) {
+    const U16 high = AsU16(Dwords(0xFF00FF00)), wordsA = AsU16(a), wordsB = AsU16(b);
+    if constexpr (kOrder == PairOrder::Uyvy) return AsU8(hn::Or(hn::AndNot(high, wordsA), hn::ShiftLeft<8>(wordsB)));
+    return AsU8(hn::OrAnd(hn::ShiftRight<8>(wordsA), wordsB, high));
+  }
+  // (1, 2, 1) about the even pixels, in all 2^kBits.
+  HWY_INLINE I16 Filter(U8 even, U8 following) {
+    const U8 weights = Dwords(W::kA * 0x00010001 + W::kB * 0x01000100), twice = hn::Add(weights, weights);
+    const U8 odd = hn::AverageRound(even, ShiftLaneIn(even, following)), before = ShiftLaneOut(mBefore, odd);
+    mBefore = odd;
+    const I16 sum = hn::Add(WeighBytes(even, twice), hn::Add(WeighBytes(odd, weights), WeighBytes(before, weights)));
+    return hn::ShiftRight<W::kBits>(hn::Add(sum, hn::Set(ScalableTag<int16_t>(), 1 << (W::kBits - 1))));
+  }
+
+  U8 mNow[2], mNext[2];
+  U8 mBefore;  // the odd pixels before, the last one in the last place
+};
+
+template <class W, PairOrder kOrder>
+HWY_INLINE void EncodePairs(const LinePair& lines) {
+  using Pairs = PairEncoder<W, kOrder>;
+  constexpr size_t kStep = Pairs::kStep, kStepBytes = Pairs::kStepBytes;
+  const size_t steps = lines.width / kStep, rest = lines.width % kStep, pairs = (lines.width + 1) / 2;
+  // The last pair goes on to the right.
+  alignas(64) uint8_t a[2 * kStepBytes], b[2 * kStepBytes];
+  uint32_t firstA, firstB, lastA, lastB;
+  std::memcpy(&firstA, lines.a, 4);
+  std::memcpy(&firstB, lines.b, 4);
+  std::memcpy(&lastA, lines.a + 4 * (pairs - 1), 4);
+  std::memcpy(&lastB, lines.b + 4 * (pairs - 1), 4);
+  for (size_t i = 0; i < 4; ++i) StoreVector(Dwords(lastA), a, i), StoreVector(Dwords(lastB), b, i);
+  std::memcpy(a, lines.a + steps * kStepBytes, (rest + 1) / 2 * 4);
+  std::memcpy(b, lines.b + steps * kStepBytes, (rest + 1) / 2 * 4);
+
+  Pairs encoder(firstA, firstB);
+  const auto take = [&](size_t i) HWY_ATTR {
+    encoder.Take(lines.a + i * kStepBytes, lines.b + i * kStepBytes);
+    encoder.Luma(lines.a + i * kStepBytes, lines.lumaA + i * kStep);
+    encoder.Luma(lines.b + i * kStepBytes, lines.lumaB + i * kStep);
+  };
+  const auto finish = [&](size_t i) HWY_ATTR { encoder.Chroma(lines.u + i * kStep / 2, lines.v + i * kStep / 2); };
+  if (steps > 0) {
+    take(0);
+    encoder.Advance();
+    for (size_t i = 1; i < steps; ++i) {
+      Fetch<kStepBytes>(lines.nextA + i * kStepBytes);
+      Fetch<kStepBytes>(lines.nextB + i * kStepBytes);
+      take(i);
+      finish(i - 1);
+    }
+    encoder.Take(a, b);
+    finish(steps - 1);
+  } else {
+    encoder.Take(a, b);
+    encoder.Advance();
+  }
+  if (rest == 0) return;
+  alignas(64) uint8_t luma[kStep], u[kStep / 2], v[kStep / 2];
+  encoder.Luma(a, luma);
+  std::memcpy(lines.lumaA + steps * kStep, luma, rest);
+  encoder.Luma(b, luma);
+  std::memcpy(lines.lumaB + steps * kStep, luma, rest);
+  encoder.Take(a + kStepBytes, b + kStepBytes);
+  encoder.Chroma(u, v);
+  std::memcpy(lines.u + steps * kStep / 2, u, lines.chromaWidth - steps * kStep / 2);
+  std::memcpy(lines.v + steps * kStep / 2, v, lines.chromaWidth - steps * kStep / 2);
+}
+
+template <class W>
+void EncodeUyvy(const LinePair& lines, const Factors&) {
+  EncodePairs<W, PairOrder::Uyvy>(lines);
+}
+template <class W>
+void EncodeYuyv(const LinePair& lines, const Factors&) {
+  EncodePairs<W, PairOrder::Yuyv>(lines);
+}
 template <class W>
 void EncodeBgrx(const LinePair& lines, const Factors& factors) {
   EncodeRows<W, FromBgr<false>>(lines, factors);
@@ -376,6 +488,39 @@ void EncodeRows(const LinePair& lines, const Factors& factors) {
   }
 }
 
+template <class W, PairOrder kOrder>
+void EncodePairs(const LinePair& lines) {
+  const size_t pairs = (lines.width + 1) / 2;
+  const auto at = [&](const uint8_t* line, size_t i) {
+    return vexel::plain::LoadPair(kOrder, line + 4 * std::min(i, pairs - 1));
+  };
+  for (size_t x = 0; x < lines.width; ++x) {
+    lines.lumaA[x] = static_cast<uint8_t>(at(lines.a, x / 2).y[x % 2]);
+    lines.lumaB[x] = static_cast<uint8_t>(at(lines.b, x / 2).y[x % 2]);
+  }
+  for (size_t i = 0; i < lines.chromaWidth; ++i) {
+    int32_t u = 0, v = 0;
+    const auto add = [&](const uint8_t* line, int32_t weight) {
+      const auto left = at(line, i == 0 ? 0 : i - 1), own = at(line, i), right = at(line, i + 1);
+      const auto across = [](int l, int c, int r) { return (l + c + 1) / 2 + 2 * c + (c + r + 1) / 2; };
+      u += weight * across(left.u, own.u, right.u);
+      v += weight * across(left.v, own.v, right.v);
+    };
+    add(lines.a, W::kA);
+    add(lines.b, W::kB);
+    lines.u[i] = Round<W::kBits>(u);
+    lines.v[i] = Round<W::kBits>(v);
+  }
+}
+
+template <class W>
+void EncodeUyvy(const LinePair& lines, const Factors&) {
+  EncodePairs<W, PairOrder::Uyvy>(lines);
+}
+template <class W>
+void EncodeYuyv(const LinePair& lines, const Factors&) {
+  EncodePairs<W, PairOrder::Yuyv>(lines);
+}
 template <class W>
 void EncodeBgrx(const LinePair& lines, const Factors& factors) {
   EncodeRows<W, FromBgr<false>>(lines, factors);
@@ -397,6 +542,8 @@ void EncodeVuyx(const LinePair& lines, const Factors& factors) {
 const PairKernels kFromBgrx = VX_PAIR_KERNELS(EncodeBgrx);
 const PairKernels kFromBgra = VX_PAIR_KERNELS(EncodeBgra);
 const PairKernels kFromVuyx = VX_PAIR_KERNELS(EncodeVuyx);
+const PairKernels kFromUyvy = VX_PAIR_KERNELS(EncodeUyvy);
+const PairKernels kFromYuyv = VX_PAIR_KERNELS(EncodeYuyv);
 #undef VX_PAIR_KERNELS
 
 }  // namespace vexel::encode420

@@ -33,5 +33,7 @@ struct PairKernels {
 };
 extern const PairKernels kFromBgrx, kFromVuyx;
 extern const PairKernels kFromBgra;  // premultiplied first
+// Packed 4:2:2: pairs of pixels, the last one whole, with the chroma that kUyvy8ToVuyx8 and kYuyv8ToVuyx8 give them.
+extern const PairKernels kFromUyvy, kFromYuyv;
 
 }  // namespace vexel::encode420
