@@ -9,6 +9,7 @@
 #include "convert/YuvMatrices.h"
 #include "frame/FpModeGuard.h"
 #include "frame/Scratch.h"
+#include "frame/StreamCopy.h"
 
 namespace vexel {
 
@@ -85,11 +86,13 @@ class Lines {
   // Both come before the memory is known. Codes as those of the decoder and of the planner.
   VX_Result Decode(const Picture420& src, VX_PixelFormat format, int32_t quality) noexcept {
     mDecodes = true;
+    mSrcRowBytes = int64_t{mWidth} * 3 / (HasWideSamples(src.format) ? 1 : 2);
     return mDecoder.Prepare(src, format, src.width, src.height, 0, quality);
   }
   VX_Result Convert(VX_PixelFormat from, VX_PixelFormat to, int32_t quality) noexcept {
     mConverts = from != to;
-    return mConverter.Prepare(from, to, quality, mWidth);
+    if (!mDecodes) mSrcRowBytes = UnpaddedRowBytes(from, mWidth);
+    return mConverts ? mConverter.Prepare(from, to, quality, mWidth) : VX_Success;
   }
 
   void SetRaster(const uint8_t* top, ptrdiff_t rowBytes) noexcept {
@@ -99,6 +102,8 @@ class Lines {
 
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept;
+
+  int64_t RowBytes() const noexcept { return mSrcRowBytes; }
 
   // Where a line is read from, as far as it is in memory before.
   uintptr_t Address(int64_t line) const noexcept {
@@ -119,6 +124,7 @@ class Lines {
   RowConverter mConverter;
   const uint8_t* mTop = nullptr;
   ptrdiff_t mRowBytes = 0;
+  int64_t mSrcRowBytes = 0;
   uint8_t* mSlots[3] = {};  // the last one for what is decoded, then converted
 };
 
@@ -168,6 +174,7 @@ class Encoder {
 
  private:
   Pair PairOf(int64_t row) const noexcept;
+  bool GoesPastCache(const Lines& lines) const noexcept;
   uint8_t* PlaneRow(int plane, int64_t row) const noexcept {
     return static_cast<uint8_t*>(mPlanes[plane]) + row * mRowBytes[plane];
   }
@@ -186,6 +193,16 @@ Pair Encoder::PairOf(int64_t row) const noexcept {
   return {first, first + 2, (parity == 0 ? mKernels.nearFirst : mKernels.nearSecond)[mVariant]};
 }
 
+// Whether reading the source would push the planes out of the cache before anyone looks at them, and they suit stores
+// past it.
+bool Encoder::GoesPastCache(const Lines& lines) const noexcept {
+  const uint32_t cache = VX_GetCacheSize();
+  uintptr_t places = 0;
+  for (int i = 0; i < 3; ++i) places |= reinterpret_cast<uintptr_t>(mPlanes[i]) | static_cast<uintptr_t>(mRowBytes[i]);
+  const int64_t planeBytes = int64_t{mWidth} * mHeight * 3 / 2;
+  return places % 64 == 0 && cache != 0 && lines.RowBytes() * mHeight + planeBytes >= int64_t{cache / 2};
+}
+
 VX_Result Encoder::Run(Lines& lines) const noexcept {
   const Factors& factors = Colorimetry(mFormat) == 0 ? kFactors601 : kFactors709;
   const auto width = static_cast<size_t>(mWidth);
@@ -195,6 +212,7 @@ VX_Result Encoder::Run(Lines& lines) const noexcept {
   VX_SCRATCH(scratch, noChromaBytes + lines.ScratchBytes());
   if (!scratch) return VX_ErrOutOfMemory;
   lines.UseScratch(scratch.get() + noChromaBytes);
+  const bool stream = GoesPastCache(lines);
   for (int64_t row = 0; row < pairs; ++row) {
     const Pair pair = PairOf(row), next = PairOf(row + 1);
     if (pair.a >= mHeight) continue;
@@ -204,9 +222,10 @@ VX_Result Encoder::Run(Lines& lines) const noexcept {
     const bool hasChroma = row < chromaRows;
     pair.encode({a, b, PlaneRow(0, pair.a), PlaneRow(0, lineB), hasChroma ? PlaneRow(1, row) : scratch.get(),
                  hasChroma ? PlaneRow(2, row) : scratch.get(), lines.Address(next.a), lines.Address(next.b), width,
-                 chromaWidth},
+                 chromaWidth, stream},
                 factors);
   }
+  if (stream) StreamFence();
   return VX_Success;
 }
 
@@ -218,8 +237,7 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
   const FpModeGuard fpMode;
   Lines lines(width);
   const Input input = InputOf(srcFormat, WorkingFormat(dstFormat), quality);
-  if (input.rows != srcFormat)
-    if (const VX_Result result = lines.Convert(srcFormat, input.rows, quality)) return result;
+  if (const VX_Result result = lines.Convert(srcFormat, input.rows, quality)) return result;
   if (width < 1 || height < 1) return VX_Success;
   if (!src) return VX_ErrNullSource;
   if (!dst) return VX_ErrNullDestination;

@@ -101,6 +101,20 @@ HWY_INLINE I16 ReplaceFirst(I16 first, I16 others) {
 #endif
 }
 
+// U in the lower half, V in the upper one.
+template <bool kStream>
+HWY_INLINE void WriteChroma(U8 chroma, uint8_t* u, uint8_t* v) {
+  const hn::Half<ScalableTag<uint8_t>> d;
+  const auto low = hn::LowerHalf(d, chroma), high = hn::UpperHalf(d, chroma);
+  if constexpr (kStream) {
+    hn::Stream(low, d, u);
+    hn::Stream(high, d, v);
+  } else {
+    hn::StoreU(low, d, u);
+    hn::StoreU(high, d, v);
+  }
+}
+
 // Bytes of four vectors of pixels, from words (0, 1) and (2, 3) side by side, to memory order.
 HWY_INLINE U8 PackLuma(I16 words01, I16 words23) {
   static constexpr ShuffleTable kOrder({0, 2, 4, 6, 1, 3, 5, 7, 8, 10, 12, 14, 9, 11, 13, 15});
@@ -205,15 +219,12 @@ class Encoder {
     mBefore = WeightedSum<W>(Op::Split(Dwords(pixelA)).chroma, Op::Split(Dwords(pixelB)).chroma);
   }
 
+  template <bool kStream>
   HWY_INLINE void Block(const uint8_t* a, const uint8_t* b, uint8_t* lumaA, uint8_t* lumaB, uint8_t* u, uint8_t* v) {
-    const ScalableTag<uint8_t> d;
-    const hn::Half<decltype(d)> dHalf;
     const Step low = Next(a, b), high = Next(a + 2 * HWY_MAX_BYTES, b + 2 * HWY_MAX_BYTES);
-    StoreVector(PackLuma(low.lumaA, high.lumaA), lumaA);
-    StoreVector(PackLuma(low.lumaB, high.lumaB), lumaB);
-    const U8 chroma = mOp.template Chroma<W::kBits>(low.chroma, high.chroma);
-    hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
-    hn::StoreU(hn::UpperHalf(dHalf, chroma), dHalf, v);
+    WriteVector<kStream>(PackLuma(low.lumaA, high.lumaA), lumaA, 0);
+    WriteVector<kStream>(PackLuma(low.lumaB, high.lumaB), lumaB, 0);
+    WriteChroma<kStream>(mOp.template Chroma<W::kBits>(low.chroma, high.chroma), u, v);
   }
 
  private:
@@ -257,14 +268,15 @@ HWY_INLINE void Fetch(uintptr_t address) {
     __builtin_prefetch(reinterpret_cast<const void*>(address + offset));
 }
 
-template <class W, class Op>
+template <class W, class Op, bool kStream>
 HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
   Encoder<W, Op> encoder(factors, lines.a, lines.b);
   size_t x = 0;
   for (; x + kBlock <= lines.width; x += kBlock) {
     Fetch<4 * kBlock>(lines.nextA + 4 * x);
     Fetch<4 * kBlock>(lines.nextB + 4 * x);
-    encoder.Block(lines.a + 4 * x, lines.b + 4 * x, lines.lumaA + x, lines.lumaB + x, lines.u + x / 2, lines.v + x / 2);
+    encoder.template Block<kStream>(lines.a + 4 * x, lines.b + 4 * x, lines.lumaA + x, lines.lumaB + x, lines.u + x / 2,
+                                    lines.v + x / 2);
   }
   const size_t rest = lines.width - x;
   if (rest == 0) return;
@@ -276,7 +288,7 @@ HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
   std::memcpy(a + 4 * rest, lines.a + 4 * (lines.width - 1), 4);
   std::memcpy(b + 4 * rest, lines.b + 4 * (lines.width - 1), 4);
   alignas(64) uint8_t lumaA[kBlock], lumaB[kBlock], u[kBlock / 2], v[kBlock / 2];
-  encoder.Block(a, b, lumaA, lumaB, u, v);
+  encoder.template Block<false>(a, b, lumaA, lumaB, u, v);
   std::memcpy(lines.lumaA + x, lumaA, rest);
   std::memcpy(lines.lumaB + x, lumaB, rest);
   std::memcpy(lines.u + x / 2, u, lines.chromaWidth - x / 2);
@@ -294,23 +306,21 @@ class PairEncoder {
   // The first pair goes on to the left.
   HWY_INLINE PairEncoder(uint32_t pairA, uint32_t pairB) { mBefore = Join(Dwords(pairA), Dwords(pairB)); }
 
+  template <bool kStream>
   HWY_INLINE void Luma(const uint8_t* pairs, uint8_t* luma) const {
     constexpr int kByte = LumaByte(kOrder);
     const auto words = [&](size_t i) HWY_ATTR { return AsI16(WordBytes<kByte>(LoadVector<uint8_t>(pairs, i))); };
-    StoreVector(OrderPacked2(PackBlocks(words(0), words(1))), luma);
+    WriteVector<kStream>(OrderPacked2(PackBlocks(words(0), words(1))), luma, 0);
   }
   HWY_INLINE void Take(const uint8_t* a, const uint8_t* b) {
     mNext[0] = Join(LoadVector<uint8_t>(a, 0), LoadVector<uint8_t>(b, 0));
     mNext[1] = Join(LoadVector<uint8_t>(a, 1), LoadVector<uint8_t>(b, 1));
   }
+  template <bool kStream>
   HWY_INLINE void Chroma(uint8_t* u, uint8_t* v) {
     static constexpr ShuffleTable kPlanes({0, 2, 4, 6, 8, 10, 12, 14, 1, 3, 5, 7, 9, 11, 13, 15});
-    const ScalableTag<uint8_t> d;
-    const hn::Half<decltype(d)> dHalf;
     const I16 low = Filter(mNow[0], mNow[1]), high = Filter(mNow[1], mNext[0]);
-    const U8 chroma = OrderPacked4(hn::TableLookupBytes(PackBlocks(low, high), kPlanes.Load()));
-    hn::StoreU(hn::LowerHalf(dHalf, chroma), dHalf, u);
-    hn::StoreU(hn::UpperHalf(dHalf, chroma), dHalf, v);
+    WriteChroma<kStream>(OrderPacked4(hn::TableLookupBytes(PackBlocks(low, high), kPlanes.Load())), u, v);
     Advance();
   }
   HWY_INLINE void Advance() { mNow[0] = mNext[0], mNow[1] = mNext[1]; }
@@ -335,7 +345,7 @@ class PairEncoder {
   U8 mBefore;  // the odd pixels before, the last one in the last place
 };
 
-template <class W, PairOrder kOrder>
+template <class W, PairOrder kOrder, bool kStream>
 HWY_INLINE void EncodePairs(const LinePair& lines) {
   using Pairs = PairEncoder<W, kOrder>;
   constexpr size_t kStep = Pairs::kStep, kStepBytes = Pairs::kStepBytes;
@@ -354,10 +364,12 @@ HWY_INLINE void EncodePairs(const LinePair& lines) {
   Pairs encoder(firstA, firstB);
   const auto take = [&](size_t i) HWY_ATTR {
     encoder.Take(lines.a + i * kStepBytes, lines.b + i * kStepBytes);
-    encoder.Luma(lines.a + i * kStepBytes, lines.lumaA + i * kStep);
-    encoder.Luma(lines.b + i * kStepBytes, lines.lumaB + i * kStep);
+    encoder.template Luma<kStream>(lines.a + i * kStepBytes, lines.lumaA + i * kStep);
+    encoder.template Luma<kStream>(lines.b + i * kStepBytes, lines.lumaB + i * kStep);
   };
-  const auto finish = [&](size_t i) HWY_ATTR { encoder.Chroma(lines.u + i * kStep / 2, lines.v + i * kStep / 2); };
+  const auto finish = [&](size_t i) HWY_ATTR {
+    encoder.template Chroma<kStream>(lines.u + i * kStep / 2, lines.v + i * kStep / 2);
+  };
   if (steps > 0) {
     take(0);
     encoder.Advance();
@@ -375,35 +387,37 @@ HWY_INLINE void EncodePairs(const LinePair& lines) {
   }
   if (rest == 0) return;
   alignas(64) uint8_t luma[kStep], u[kStep / 2], v[kStep / 2];
-  encoder.Luma(a, luma);
+  encoder.template Luma<false>(a, luma);
   std::memcpy(lines.lumaA + steps * kStep, luma, rest);
-  encoder.Luma(b, luma);
+  encoder.template Luma<false>(b, luma);
   std::memcpy(lines.lumaB + steps * kStep, luma, rest);
   encoder.Take(a + kStepBytes, b + kStepBytes);
-  encoder.Chroma(u, v);
+  encoder.template Chroma<false>(u, v);
   std::memcpy(lines.u + steps * kStep / 2, u, lines.chromaWidth - steps * kStep / 2);
   std::memcpy(lines.v + steps * kStep / 2, v, lines.chromaWidth - steps * kStep / 2);
 }
 
 template <class W>
 void EncodeUyvy(const LinePair& lines, const Factors&) {
-  EncodePairs<W, PairOrder::Uyvy>(lines);
+  lines.stream ? EncodePairs<W, PairOrder::Uyvy, true>(lines) : EncodePairs<W, PairOrder::Uyvy, false>(lines);
 }
 template <class W>
 void EncodeYuyv(const LinePair& lines, const Factors&) {
-  EncodePairs<W, PairOrder::Yuyv>(lines);
+  lines.stream ? EncodePairs<W, PairOrder::Yuyv, true>(lines) : EncodePairs<W, PairOrder::Yuyv, false>(lines);
 }
 template <class W>
 void EncodeBgrx(const LinePair& lines, const Factors& factors) {
-  EncodeRows<W, FromBgr<false>>(lines, factors);
+  lines.stream ? EncodeRows<W, FromBgr<false>, true>(lines, factors)
+               : EncodeRows<W, FromBgr<false>, false>(lines, factors);
 }
 template <class W>
 void EncodeBgra(const LinePair& lines, const Factors& factors) {
-  EncodeRows<W, FromBgr<true>>(lines, factors);
+  lines.stream ? EncodeRows<W, FromBgr<true>, true>(lines, factors)
+               : EncodeRows<W, FromBgr<true>, false>(lines, factors);
 }
 template <class W>
 void EncodeVuyx(const LinePair& lines, const Factors& factors) {
-  EncodeRows<W, FromVuy>(lines, factors);
+  lines.stream ? EncodeRows<W, FromVuy, true>(lines, factors) : EncodeRows<W, FromVuy, false>(lines, factors);
 }
 
 }  // namespace

@@ -24,6 +24,7 @@ struct LinePair {
   uint8_t *u, *v;
   uintptr_t nextA, nextB;     // asked for, not read: lines that lie downward in memory are not fetched ahead
   size_t width, chromaWidth;  // chroma may lack the last sample of an odd width
+  bool stream;                // past the cache; for planes' rows on lines of it
 };
 using EncodeLines = void (*)(const LinePair& lines, const Factors& factors);
 

@@ -623,28 +623,40 @@ TEST(Encode420, Colours) {
   }
 }
 
-// Straight alpha in runs, opaque and not, is encoded as what premultiplying makes of it.
-TEST(Encode420, StraightAlphaIsPremultiplied) {
+// What the encoder reads without converting it first is encoded as what its last steps make of it. Alpha comes in runs,
+// opaque and not.
+TEST(Encode420, SavesStepsOfConversions) {
+  const F full = F::YUV_420_MPEG2_FRAME_FullRange, fullFields = F::YUV_420_MPEG4_FIELD_FullRange_709;
+  const F video = F::YUV_420_MPEG4_FRAME_709, videoFields = F::YUV_420_MPEG2_FIELD_709;
+  const struct {
+    F from, through;
+    F to[2];
+  } cases[] = {{F::BGRA_4444_8u, F::BGRP_4444_8u, {full, fullFields}},
+               {F::BGRP_4444_8u, F::BGRX_4444_8u, {full, fullFields}},
+               {F::ARGB_4444_8u, F::BGRX_4444_8u, {full, fullFields}},
+               {F::UYVY_422_8u_709, F::VUYX_4444_8u_709, {video, videoFields}},
+               {F::YUYV_422_8u_709, F::VUYX_4444_8u_709, {video, videoFields}},
+               {F::UYVY_422_8u, F::VUYX_4444_8u_709, {video, videoFields}},
+               {F::V210_422_10u_709, F::VUYX_4444_8u_709, {video, videoFields}}};
   Random random(5);
-  for (const F format : {F::YUV_420_MPEG2_FRAME_FullRange, F::YUV_420_MPEG4_FIELD_FullRange_709})
-    for (const int width : {1, 3, 31, 130, 389}) {
-      const int height = 9;
-      Raster straight(width, height), premultiplied(width, height);
-      random.Fill(straight.bytes.data(), straight.bytes.size());
-      for (size_t i = 3; i < straight.bytes.size(); i += 4)
-        if (i / 4 / 97 % 3 != 0) straight.bytes[i] = 255;
-      ASSERT_EQ(VX_Success, VX_Convert(straight.bytes.data(), 4 * width, F::BGRA_4444_8u, premultiplied.bytes.data(),
-                                       4 * width, F::BGRP_4444_8u, width, height, 2));
-      Block420 expected(format, width, height), fromBgra(format, width, height), fromBgrp(format, width, height);
-      const auto encode = [&](Raster& src, F from, Block420& dst) {
-        return Encode420(src.bytes.data(), 4 * width, from, dst.bytes.data(), format, width, height);
-      };
-      ASSERT_EQ(VX_Success, encode(premultiplied, F::BGRX_4444_8u, expected));
-      ASSERT_EQ(VX_Success, encode(premultiplied, F::BGRP_4444_8u, fromBgrp));
-      ASSERT_EQ(VX_Success, encode(straight, F::BGRA_4444_8u, fromBgra));
-      ASSERT_EQ(expected.bytes, fromBgrp.bytes) << width;
-      ASSERT_EQ(expected.bytes, fromBgra.bytes) << width;
-    }
+  for (const auto& c : cases)
+    for (const F format : c.to)
+      for (const int width : {1, 2, 3, 31, 64, 130, 389}) {
+        const int height = 9;
+        const auto bytes = [&](F f) { return static_cast<size_t>(VX_PixelFormatSize(f, width, height)); };
+        std::vector<uint8_t> src(bytes(c.from)), through(bytes(c.through));
+        random.Fill(src.data(), src.size());
+        for (size_t i = 0; i < src.size(); i += 4)
+          if (i / 4 / 97 % 3 != 0) src[i + (IsReversed(c.from) ? 0 : 3)] = 255;
+        const auto rowBytes = static_cast<int32_t>(src.size()) / height, throughBytes = 4 * width;
+        ASSERT_EQ(VX_Success,
+                  VX_Convert(src.data(), rowBytes, c.from, through.data(), throughBytes, c.through, width, height, 2));
+        Block420 expected(format, width, height), dst(format, width, height);
+        ASSERT_EQ(VX_Success,
+                  Encode420(through.data(), throughBytes, c.through, expected.bytes.data(), format, width, height));
+        ASSERT_EQ(VX_Success, Encode420(src.data(), rowBytes, c.from, dst.bytes.data(), format, width, height));
+        ASSERT_EQ(expected.bytes, dst.bytes) << VX_PixelFormatName(c.from) << " " << width;
+      }
 }
 
 TEST(Encode420, Refuses) {
