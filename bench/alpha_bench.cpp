@@ -5,19 +5,16 @@
 #include <string>
 
 #include "support/Bench.h"
+#include "support/Pixman.h"
 #include "vexel/compositing.h"
 
 #ifdef VEXEL_PEER_YUV
 #include <libyuv/planar_functions.h>
 #endif
-#ifdef VEXEL_PEER_PIXMAN
-#include <pixman.h>
-#endif
 
 namespace {
 
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
+using namespace vexel::bench;
 using F = VX_PixelFormat;
 
 struct Picture {
@@ -86,13 +83,12 @@ struct Pictures {
   Memory sources, dst;
 };
 
-void UtilityCase(const Utility& utility, const char* size, int width, int height,
-                 const std::shared_ptr<Pictures>& pictures) {
-  const size_t pixels = static_cast<size_t>(width) * static_cast<size_t>(height);
-  const size_t bytes = pixels * static_cast<size_t>(utility.pixelBytes);
+void UtilityCase(const Utility& utility, Size size, const std::shared_ptr<Pictures>& pictures) {
+  const int width = size.width, height = size.height;
+  const size_t bytes = size.Pixels() * static_cast<size_t>(utility.pixelBytes);
   uint8_t *const src = pictures->sources.data(), *const dst = pictures->dst.data();
   const Picture picture = {src, src + bytes, dst, width, height, width * utility.pixelBytes};
-  BenchCase report(std::string(utility.name) + " " + size, pixels);
+  BenchCase report(std::string(utility.name) + " " + size.name, size.Pixels());
   report.Add("vexel", [=] {
     utility.run(picture);
     (void)pictures;
@@ -105,38 +101,28 @@ void UtilityCase(const Utility& utility, const char* size, int width, int height
 #endif
 #ifdef VEXEL_PEER_PIXMAN
   if (utility.run == Mask<F::BGRA_4444_8u>) {
-    const auto image = [=](pixman_format_code_t format, const uint8_t* base, int rowBytes) {
-      auto* words = reinterpret_cast<uint32_t*>(const_cast<uint8_t*>(base));
-      return std::shared_ptr<pixman_image_t>(pixman_image_create_bits(format, width, height, words, rowBytes),
-                                             pixman_image_unref);
-    };
-    auto from = image(PIXMAN_x8r8g8b8, picture.src, picture.rowBytes),
-         to = image(PIXMAN_x8r8g8b8, picture.dst, picture.rowBytes);
-    auto mask = image(PIXMAN_a1, src, width / 8);
+    const auto from = PixmanImage(PIXMAN_x8r8g8b8, size, picture.src, picture.rowBytes),
+               to = PixmanImage(PIXMAN_x8r8g8b8, size, picture.dst, picture.rowBytes),
+               mask = PixmanImage(PIXMAN_a1, size, src, width / 8);
     report.Add("pixman over with a1 mask", [=] {
       pixman_image_composite32(PIXMAN_OP_OVER, from.get(), mask.get(), to.get(), 0, 0, 0, 0, 0, 0, width, height);
     });
   }
 #endif
-  // In place of AddFloor, which has memory of its own.
   const size_t read = bytes * static_cast<size_t>(std::max(utility.pixelsRead, 1));
-  report.Add("floor cached", [=] { vexel::bench::FloorCached(src, read, dst, bytes); });
-  // What is read before it is written cannot go past the cache.
-  if (utility.pixelsRead == 0) return;
-  report.Add("floor streamed", [=] { vexel::bench::FloorStreamed(src, read, dst, bytes); });
+  report.AddFloor(src, read, dst, bytes, utility.pixelsRead != 0);
 }
 
 }  // namespace
 
 void RegisterBenchmarks() {
-  VX_Terminate();  // without an executor everything runs on one thread, as the floor does
-  constexpr size_t kMost = size_t{1920} * 1080 * 16;
-  const auto noise = std::make_shared<Pictures>(kMost), floats = std::make_shared<Pictures>(kMost);
+  const size_t most = kHd.Pixels() * 16;
+  const auto noise = std::make_shared<Pictures>(most), floats = std::make_shared<Pictures>(most);
   noise->sources.FillBytes();
   floats->sources.FillFloats();
   for (const Utility& utility : kUtilities) {
     const auto& pictures = utility.pixelBytes == 16 ? floats : noise;
-    UtilityCase(utility, "1080p", 1920, 1080, pictures);
-    if (utility.pixelBytes <= 4) UtilityCase(utility, "2160p", 3840, 2160, pictures);
+    UtilityCase(utility, kHd, pictures);
+    if (utility.pixelBytes <= 4) UtilityCase(utility, kUhd, pictures);
   }
 }

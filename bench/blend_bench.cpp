@@ -7,21 +7,13 @@
 #include <string>
 #include <utility>
 
-#include "frame/KernelVariant.h"
 #include "support/Bench.h"
+#include "support/Pixman.h"
 #include "vexel/compositing.h"
-#include "vexel_host/host.h"
-
-#ifdef VEXEL_PEER_PIXMAN
-#include <pixman.h>
-#endif
 
 namespace {
 
-using vexel::bench::BenchCase;
-using vexel::bench::FloorCached;
-using vexel::bench::FloorStreamed;
-using vexel::bench::Memory;
+using namespace vexel::bench;
 using F = VX_PixelFormat;
 using M = VX_BlendMode;
 
@@ -55,23 +47,17 @@ constexpr Mode kModes[] = {
 constexpr unsigned kFlushDenormals = 0x8040;
 #endif
 
-struct Size {
-  const char* name;
-  int width, height;
-};
-
 // One set for all cases of a size and format: what they are called with does not depend on the mode.
 struct Pictures {
-  Pictures(Size size, int pixelBytes)
-      : width(size.width), height(size.height), rowBytes(size.width * pixelBytes), sources(2 * Bytes()), dst(Bytes()) {
+  Pictures(Size s, int pixelBytes) : size(s), rowBytes(size.width * pixelBytes), sources(2 * Bytes()), dst(Bytes()) {
     pixelBytes == 4 ? sources.FillBytes() : sources.FillFloats();
   }
-  size_t Bytes() const { return static_cast<size_t>(rowBytes) * static_cast<size_t>(height); }
-  size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
+  size_t Bytes() const { return static_cast<size_t>(rowBytes) * static_cast<size_t>(size.height); }
   uint8_t* Src() const { return sources.data(); }
   uint8_t* Background() const { return sources.data() + Bytes(); }
 
-  int width, height, rowBytes;
+  Size size;
+  int rowBytes;
   Memory sources, dst;
 };
 
@@ -84,24 +70,20 @@ std::shared_ptr<Pictures> PicturesOf(Size size, F format) {
 
 void Blend(Pictures& p, M mode, F format) {
   VX_CompositeWithBlendMode(p.Src(), p.rowBytes, format, p.Background(), p.rowBytes, format, p.dst.data(), p.rowBytes,
-                            format, p.width, p.height, 1.0f, static_cast<int32_t>(mode), 3, false);
+                            format, p.size.width, p.size.height, 1.0f, static_cast<int32_t>(mode), 3, false);
 }
 
 #ifdef VEXEL_PEER_PIXMAN
 // pixman composes in place, again and again, so values end as denormals; those must not slow it down.
 void AddPixman(BenchCase& report, const std::shared_ptr<Pictures>& p, const Mode& mode, pixman_format_code_t format) {
   if (mode.pixmanOperator < 0) return;
-  const auto image = [&](uint8_t* pixels) {
-    return std::shared_ptr<pixman_image_t>(
-        pixman_image_create_bits(format, p->width, p->height, reinterpret_cast<uint32_t*>(pixels), p->rowBytes),
-        pixman_image_unref);
-  };
-  const auto src = image(p->Src()), dst = image(p->dst.data());
+  const auto src = PixmanImage(format, p->size, p->Src(), p->rowBytes),
+             dst = PixmanImage(format, p->size, p->dst.data(), p->rowBytes);
   report.Add("pixman", [=] {
     const unsigned before = _mm_getcsr();
     _mm_setcsr(before | kFlushDenormals);
     pixman_image_composite32(static_cast<pixman_op_t>(mode.pixmanOperator), src.get(), nullptr, dst.get(), 0, 0, 0, 0,
-                             0, 0, p->width, p->height);
+                             0, 0, p->size.width, p->size.height);
     _mm_setcsr(before);
   });
 }
@@ -110,14 +92,9 @@ void AddPixman(BenchCase& report, const std::shared_ptr<Pictures>& p, const Mode
 void ModeCase(const Mode& mode, Size size, F format) {
   const bool inBytes = format == F::BGRA_4444_8u;
   const auto p = PicturesOf(size, format);
-  BenchCase report(std::string(mode.name) + (inBytes ? " 8u " : " 32f ") + size.name, p->Pixels());
-  report.Add("vexel", [=] {
-    vexel_host::SetThreadLimit(1);
-    Blend(*p, mode.mode, format);
-    vexel_host::SetThreadLimit(0);
-  });
-  report.Add("floor cached", [=] { FloorCached(p->Src(), 2 * p->Bytes(), p->dst.data(), p->Bytes()); });
-  report.Add("floor streamed", [=] { FloorStreamed(p->Src(), 2 * p->Bytes(), p->dst.data(), p->Bytes()); });
+  BenchCase report(std::string(mode.name) + (inBytes ? " 8u " : " 32f ") + size.name, size.Pixels());
+  report.Add("vexel", [=] { Blend(*p, mode.mode, format); });
+  report.AddFloor(p->Src(), 2 * p->Bytes(), p->dst.data(), p->Bytes());
 #ifdef VEXEL_PEER_PIXMAN
   AddPixman(report, p, mode, inBytes ? PIXMAN_a8r8g8b8 : PIXMAN_rgba_float);
 #endif
@@ -126,19 +103,14 @@ void ModeCase(const Mode& mode, Size size, F format) {
 void TwoThreadsCase(const Mode& mode, Size size, F format) {
   const auto p = PicturesOf(size, format);
   BenchCase report(std::string(mode.name) + (format == F::BGRA_4444_8u ? " 8u " : " 32f ") + size.name + ", threads",
-                   p->Pixels());
+                   size.Pixels());
   for (const int threads : {1, 2})
-    report.Add(threads == 1 ? "vexel" : "two threads", [=] {
-      vexel_host::SetThreadLimit(threads);
-      Blend(*p, mode.mode, format);
-      vexel_host::SetThreadLimit(0);
-    });
+    report.AddThreaded(threads == 1 ? "vexel" : "two threads", threads, [=] { Blend(*p, mode.mode, format); });
 }
 
 }  // namespace
 
 void RegisterBenchmarks() {
-  constexpr Size kHd{"1080p", 1920, 1080}, kUhd{"2160p", 3840, 2160};
   for (const F format : {F::BGRA_4444_8u, F::BGRA_4444_32f}) {
     for (const Mode& mode : kModes) ModeCase(mode, kHd, format);
     for (const Mode& mode : {kModes[0], kModes[3], kModes[10]}) ModeCase(mode, kUhd, format);

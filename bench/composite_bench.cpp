@@ -4,16 +4,12 @@
 #include <string>
 #include <tuple>
 
-#include <vexel_host/host.h>
-
 #include "formats/FormatBits.h"
 #include "support/Bench.h"
+#include "support/Pixman.h"
 #include "vexel/compositing.h"
 #include "zovcore/Threads.h"
 
-#ifdef VEXEL_PEER_PIXMAN
-#include <pixman.h>
-#endif
 #ifdef VEXEL_PEER_YUV
 #include <libyuv.h>
 #endif
@@ -21,15 +17,7 @@
 namespace {
 
 using F = VX_PixelFormat;
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
-
-struct Size {
-  const char* name;
-  int width, height;
-  size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
-};
-constexpr Size k1080p = {"1080p", 1920, 1080}, k2160p = {"2160p", 3840, 2160};
+using namespace vexel::bench;
 
 enum class Alpha { Opaque, Soft };
 
@@ -72,23 +60,15 @@ class Frame {
   std::shared_ptr<Memory> mMemory;
 };
 
-void AddThreads(BenchCase& report, const std::function<void()>& work) {
-  for (const int threads : {1, 2})
-    report.AddThreaded(threads == 1 ? "vexel, wall clock" : "vexel, two threads", [=] {
-      vexel_host::SetThreadLimit(threads);
-      work();
-    });
-}
-
 // What the memory itself gains by a second thread: both sources read and the destination written, half by half.
 void AddMemoryOnTwoThreads(BenchCase& report, const Frame& src, const Frame& background, const Frame& dst) {
-  report.AddThreaded("memory, two threads", [=] {
+  report.AddThreaded("memory, two threads", 2, [=] {
     zovcore::threads::ExecuteCPUBoundTaskOnAllProcessors(
         [&](int half) {
           const auto part = [half](const Frame& frame) { return frame.data() + frame.size() / 2 * half; };
           const size_t dstBytes = dst.size() / 4;
-          vexel::bench::FloorStreamed(part(src), src.size() / 2, part(dst), dstBytes);
-          vexel::bench::FloorStreamed(part(background), background.size() / 2, part(dst) + dstBytes, dstBytes);
+          FloorStreamed(part(src), src.size() / 2, part(dst), dstBytes);
+          FloorStreamed(part(background), background.size() / 2, part(dst) + dstBytes, dstBytes);
         },
         2);
   });
@@ -109,12 +89,9 @@ void CompositeCase(const char* name, const Over& over, Size size) {
                  background.format(), dst.data(), dst.rowBytes(), dst.format(), size.width, size.height, over.opacity,
                  3, false);
   };
-  report.Add("vexel", [=] {
-    vexel_host::SetThreadLimit(1);
-    work();
-  });
+  report.Add("vexel", work);
   report.AddFloor(src.size() + background.size(), dst.size());
-  AddThreads(report, work);
+  report.AddThreaded("vexel, wall clock", 1, work).AddThreaded("vexel, two threads", 2, work);
   AddMemoryOnTwoThreads(report, src, background, dst);
   if (vexel::IsYuv(over.dst) || vexel::IsReversed(over.dst) || vexel::Depth(over.dst) != vexel::kDepth8u) return;
   if (over.opacity != 1) return;
@@ -123,10 +100,7 @@ void CompositeCase(const char* name, const Over& over, Size size) {
 #ifdef VEXEL_PEER_PIXMAN
   // In place, since it knows no third picture; what accumulates there costs the same.
   const auto image = [size](const Frame& frame) {
-    return std::shared_ptr<pixman_image_t>(
-        pixman_image_create_bits(PIXMAN_a8r8g8b8, size.width, size.height, reinterpret_cast<uint32_t*>(frame.data()),
-                                 frame.rowBytes()),
-        pixman_image_unref);
+    return PixmanImage(PIXMAN_a8r8g8b8, size, frame.data(), frame.rowBytes());
   };
   report.Add("pixman OVER in place, premultiplied", [=, fromImage = image(from), dstImage = image(dst)] {
     pixman_image_composite32(PIXMAN_OP_OVER, fromImage.get(), nullptr, dstImage.get(), 0, 0, 0, 0, 0, 0, size.width,
@@ -147,7 +121,6 @@ void ToBlackCase(F format, float opacity, Size size, bool tested) {
                        (opacity == 1 ? " " : " at 0.6 ") + size.name,
                    size.Pixels());
   report.Add("vexel", [=] {
-    vexel_host::SetThreadLimit(1);
     int32_t state;
     if (tested)
       VX_CompositeToBlackAndTestSourceAlpha(src.data(), src.rowBytes(), format, dst.data(), dst.rowBytes(), format,
@@ -163,7 +136,7 @@ void ToBlackCase(F format, float opacity, Size size, bool tested) {
 
 void RegisterBenchmarks() {
   const F bgra = F::BGRA_4444_8u;
-  for (const Size size : {k1080p, k2160p}) {
+  for (const Size size : {kHd, kUhd}) {
     for (const float opacity : {1.0f, 0.6f}) {
       CompositeCase("over opaque BGRA8", {bgra, bgra, bgra, Alpha::Soft, Alpha::Opaque, opacity}, size);
       CompositeCase("over BGRX8 in BGRX8",

@@ -1,7 +1,5 @@
 // VX_Convert on whole frames, one thread, beside the peers that know the same conversion.
 #include <algorithm>
-#include <cstdio>
-#include <cstdlib>
 #include <memory>
 #include <string>
 #include <vector>
@@ -28,12 +26,6 @@ namespace {
 using namespace vexel;
 using namespace vexel::bench;
 using F = VX_PixelFormat;
-
-struct Size {
-  const char* name;
-  int width, height;
-};
-constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
 
 // A frame in one format with the library's row padding.
 struct Frame {
@@ -64,35 +56,24 @@ struct Job {
   BenchCase report;
 };
 
-void Check(bool ok, const char* what) {
-  if (ok) return;
-  std::fprintf(stderr, "benchmark set-up failed: %s\n", what);
-  std::exit(1);
-}
-
 // The frame conversion, its floor, and the job for adding peers.
 Job Convert(const std::string& name, F srcFormat, F dstFormat, Size size, bool opaque = false) {
   auto src = std::make_shared<Frame>(srcFormat, size, opaque), dst = std::make_shared<Frame>(dstFormat, size);
-  Job job{src, dst, size,
-          BenchCase("VX_Convert " + name + " " + size.name, static_cast<size_t>(size.width) * size.height)};
+  Job job{src, dst, size, BenchCase("VX_Convert " + name + " " + size.name, size.Pixels())};
   const auto work = [=] {
     return VX_Convert(src->data(), src->rowBytes, src->format, dst->data(), dst->rowBytes, dst->format, size.width,
                       size.height, 2);
   };
-  Check(work() == VX_Success, name.c_str());
+  Check(work(), name);
   job.report.Add("vexel", work);
   job.report.AddFloor(src->memory.size(), dst->memory.size());
   return job;
 }
 
 void AddSwscale(Job& job, const char* srcName, const char* dstName) {
-  for (const bool accurate : {false, true}) {
-    auto scaler = std::make_shared<Swscale>(srcName, dstName, job.size.width, job.size.height, accurate);
-    if (!scaler->valid()) continue;
-    job.report.Add(scaler->name(), [=, src = job.src, dst = job.dst] {
-      scaler->Run(src->data(), src->rowBytes, dst->data(), dst->rowBytes);
-    });
-  }
+  bench::AddSwscale(job.report, srcName, dstName, job.size, [src = job.src, dst = job.dst](auto& swscale) {
+    swscale.Run(src->data(), src->rowBytes, dst->data(), dst->rowBytes);
+  });
 }
 
 #ifdef VEXEL_PEER_OPENCV
@@ -116,10 +97,10 @@ void Yuv8Cases(Size size) {
     libyuv::ARGBToUYVY(encode.src->data(), encode.src->rowBytes, encode.dst->data(), encode.dst->rowBytes, size.width,
                        size.height);
   });
-  auto planes = std::make_shared<Memory>(static_cast<size_t>(size.width) * size.height * 3);
+  auto planes = std::make_shared<Memory>(size.Pixels() * 3);
   matrix.report.Add("libyuv (I444)", [=] {
     uint8_t* y = planes->data();
-    const size_t plane = static_cast<size_t>(size.width) * size.height;
+    const size_t plane = size.Pixels();
     libyuv::ARGBToI444(matrix.src->data(), matrix.src->rowBytes, y, size.width, y + plane, size.width, y + 2 * plane,
                        size.width, size.width, size.height);
   });
@@ -198,7 +179,7 @@ void FloatCases(Size size) {
   babl(coded, "RGBA float", "R'G'B'A u8");
 #endif
 #ifdef VEXEL_PEER_OPENCV
-  auto from = std::make_shared<Memory>(static_cast<size_t>(size.width) * size.height * 12);
+  auto from = std::make_shared<Memory>(size.Pixels() * 12);
   auto to = std::make_shared<Memory>(from->size());
   from->FillFloats();
   matrix.report.Add("OpenCV (3 channels)", [=] {
@@ -222,7 +203,7 @@ void ChainCases() {
     Job job = Convert(std::string("chain ") + chain.name, chain.src, chain.dst, size);
     F formats[9];
     int32_t count = 0;
-    Check(VX_ExplainConversion(chain.src, chain.dst, 2, formats, &count) == VX_Success, chain.name);
+    Check(VX_ExplainConversion(chain.src, chain.dst, 2, formats, &count), chain.name);
     auto frames = std::make_shared<std::vector<std::unique_ptr<Frame>>>();
     for (int i = 0; i < count; ++i) frames->push_back(std::make_unique<Frame>(formats[i], size));
     job.report.Add("sum of its steps", [=] {
@@ -242,7 +223,7 @@ void ChainCases() {
 }  // namespace
 
 void RegisterBenchmarks() {
-  for (const Size size : kSizes) {
+  for (const Size size : {kHd, kUhd}) {
     Yuv8Cases(size);
     DepthCases(size);
     MoveCases(size);

@@ -9,7 +9,6 @@
 #include "formats/FormatBits.h"
 #include "support/Bench.h"
 #include "vexel/compositing.h"
-#include "vexel_host/host.h"
 
 #ifdef VEXEL_PEER_OPENCV
 #include <opencv2/core.hpp>
@@ -18,16 +17,11 @@
 namespace {
 
 using F = VX_PixelFormat;
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
+using namespace vexel::bench;
 
-struct Size {
-  const char* name;
-  int width, height;
-};
 // 640 x 60 stays in the cache, and on one thread.
 constexpr Size kSmall = {"640 x 60", 640, 60};
-constexpr Size kSizes[] = {kSmall, {"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
+constexpr Size kSizes[] = {kSmall, kHd, kUhd};
 
 struct Frame {
   Frame(F f, Size s) : format(f), size(s), rowBytes(static_cast<int32_t>(vexel::UnpaddedRowBytes(f, s.width))) {
@@ -42,17 +36,9 @@ struct Frame {
   std::shared_ptr<Memory> memory;
 };
 
-size_t Pixels(Size size) { return static_cast<size_t>(size.width) * size.height; }
-
-// RegisterBenchmarks limits everything to one thread.
 void AddOurs(BenchCase& report, Size size, const std::function<void()>& call) {
   report.Add("vexel", call);
-  if (size.height == kSmall.height) return;
-  report.Add("vexel, 2 threads", [=] {
-    vexel_host::SetThreadLimit(2);
-    call();
-    vexel_host::SetThreadLimit(1);
-  });
+  if (size.height != kSmall.height) report.AddThreaded("vexel, 2 threads", 2, call);
 }
 
 #ifdef VEXEL_PEER_OPENCV
@@ -69,8 +55,8 @@ cv::Mat Samples(const Frame& frame) {
 
 void FillCase(const char* name, F format, Size size) {
   const Frame dst(format, size);
-  const size_t bytes = vexel::Is420(format) ? Pixels(size) * 3 / 2 : dst.memory->size();
-  BenchCase report(std::string("black ") + name + " " + size.name, Pixels(size));
+  const size_t bytes = vexel::Is420(format) ? size.Pixels() * 3 / 2 : dst.memory->size();
+  BenchCase report(std::string("black ") + name + " " + size.name, size.Pixels());
   AddOurs(report, size, [=] { VX_FillWithOpaqueBlack(dst.data(), dst.rowBytes, size.width, size.height, format); });
   report.AddFloor(0, bytes);
   report.Add("memset", [=] { std::memset(dst.data(), 0x5A, bytes); });
@@ -93,7 +79,7 @@ void DvCase() {
 
 void DissolveCase(const char* name, F format, Size size) {
   const Frame a(format, size), b(format, size), dst(format, size);
-  BenchCase report(std::string("dissolve ") + name + " " + size.name, Pixels(size));
+  BenchCase report(std::string("dissolve ") + name + " " + size.name, size.Pixels());
   AddOurs(report, size, [=] {
     VX_CrossDissolve(a.data(), a.rowBytes, format, b.data(), b.rowBytes, format, dst.data(), dst.rowBytes, format,
                      size.width, size.height, 0.3f, 3);
@@ -101,12 +87,14 @@ void DissolveCase(const char* name, F format, Size size) {
   report.AddFloor(2 * a.memory->size(), a.memory->size());
 #ifdef VEXEL_PEER_OPENCV
   if (vexel::AlphaKind(format) != vexel::kAlphaStraight && vexel::Depth(format) != vexel::kDepth10u)
-    for (const int threads : {1, 2})
-      report.Add(threads == 1 ? "OpenCV" : "OpenCV, 2 threads", [=] {
+    for (const int threads : {1, 2}) {
+      const auto work = [=] {
         cv::setNumThreads(threads);
         cv::Mat out = Samples(dst);
         cv::addWeighted(Samples(a), 0.7, Samples(b), 0.3, 0, out);
-      });
+      };
+      threads == 1 ? report.Add("OpenCV", work) : report.AddThreaded("OpenCV, 2 threads", threads, work);
+    }
 #endif
 }
 
@@ -114,7 +102,7 @@ void MultiplyCase(Size size) {
   const F format = F::BGRA_4444_8u;
   const Frame src(format, size), dst(format, size);
   static constexpr uint8_t kFactors[4] = {200, 100, 50, 255};
-  BenchCase report(std::string("multiply BGRA8 ") + size.name, Pixels(size));
+  BenchCase report(std::string("multiply BGRA8 ") + size.name, size.Pixels());
   AddOurs(report, size, [=] {
     VX_MultiplyByConstant(size.width, size.height, src.data(), src.rowBytes, dst.data(), dst.rowBytes, kFactors, 8);
   });
@@ -132,7 +120,7 @@ void MultiplyCase(Size size) {
 void AccumulateCase(F format, const char* name, Size size) {
   const std::vector<Frame> srcs = {{format, size}, {format, size}, {format, size}, {format, size}};
   const Frame dst(format, size);
-  BenchCase report(std::string("mean of four ") + name + " " + size.name, Pixels(size));
+  BenchCase report(std::string("mean of four ") + name + " " + size.name, size.Pixels());
   AddOurs(report, size, [=] {
     const void* bases[4];
     int32_t rowBytes[4];
@@ -143,7 +131,7 @@ void AccumulateCase(F format, const char* name, Size size) {
   });
   report.AddFloor(4 * dst.memory->size(), dst.memory->size());
 #ifdef VEXEL_PEER_OPENCV
-  auto sum = std::make_shared<Memory>(Pixels(size) * 16);
+  auto sum = std::make_shared<Memory>(size.Pixels() * 16);
   report.Add("OpenCV", [=] {
     cv::setNumThreads(1);
     cv::Mat total(size.height, size.width, CV_32FC4, sum->data()), out = Samples(dst);
@@ -157,7 +145,6 @@ void AccumulateCase(F format, const char* name, Size size) {
 }  // namespace
 
 void RegisterBenchmarks() {
-  vexel_host::SetThreadLimit(1);
   for (const Size size : kSizes) {
     FillCase("BGRA8", F::BGRA_4444_8u, size);
     FillCase("UYVY8", F::UYVY_422_8u, size);
@@ -177,6 +164,6 @@ void RegisterBenchmarks() {
     MultiplyCase(size);
     AccumulateCase(F::BGRA_4444_32f, "BGRA32f", size);
   }
-  AccumulateCase(F::BGRA_4444_8u, "BGRA8", kSizes[1]);
+  AccumulateCase(F::BGRA_4444_8u, "BGRA8", kHd);
   DvCase();
 }

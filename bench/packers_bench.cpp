@@ -10,14 +10,7 @@
 
 namespace {
 
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
-
-struct Size {
-  const char* name;
-  int width, height;
-};
-constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
+using namespace vexel::bench;
 
 // One picture on each side, or one for both where destination bytes are 0.
 struct Packer {
@@ -58,7 +51,7 @@ constexpr Packer kPackers[] = {
      }}};
 
 void PackerCase(const Packer& packer, Size size) {
-  const size_t pixels = static_cast<size_t>(size.width) * static_cast<size_t>(size.height);
+  const size_t pixels = size.Pixels();
   const bool inPlace = packer.dstBytes == 0;
   const size_t srcBytes = pixels * static_cast<size_t>(packer.srcBytes) / 6;
   auto src = std::make_shared<Memory>(srcBytes);
@@ -66,9 +59,8 @@ void PackerCase(const Packer& packer, Size size) {
   auto dst = inPlace ? src : std::make_shared<Memory>(pixels * static_cast<size_t>(packer.dstBytes) / 6);
   BenchCase report(std::string(packer.name) + " " + size.name, pixels);
   report.Add("vexel", [=] { packer.run(src->data(), dst->data(), size.width, size.height); });
-  // In place, the lines that are written are the ones just read.
   if (inPlace)
-    report.Add("floor cached", [=] { vexel::bench::FloorCached(src->data(), src->size(), src->data(), src->size()); });
+    report.AddFloor(src->data(), src->size(), src->data(), src->size(), false);
   else
     report.AddFloor(src->size(), dst->size());
 }
@@ -108,6 +100,6 @@ void CanonLog3LoopCase() {
 
 void RegisterBenchmarks() {
   for (const Packer& packer : kPackers)
-    for (const Size size : kSizes) PackerCase(packer, size);
+    for (const Size size : {kHd, kUhd}) PackerCase(packer, size);
   CanonLog3LoopCase();
 }

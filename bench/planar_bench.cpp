@@ -1,6 +1,4 @@
 // 4:2:0 decoding and encoding of whole frames, one thread, beside libyuv and swscale.
-#include <cstdio>
-#include <cstdlib>
 #include <memory>
 #include <string>
 
@@ -19,16 +17,10 @@ using namespace vexel;
 using namespace vexel::bench;
 using F = VX_PixelFormat;
 
-struct Size {
-  const char* name;
-  int width, height;
-};
-constexpr Size kSizes[] = {{"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
-
 // Bytes of a picture itself, without what lies between its rows and planes.
 size_t PictureBytes(F format, Size size) {
   if (!Is420(format)) return static_cast<size_t>(UnpaddedRowBytes(format, size.width)) * size.height;
-  return static_cast<size_t>(size.width) * size.height * 3 / 2 * (HasWideSamples(format) ? 2 : 1);
+  return size.Pixels() * 3 / 2 * (HasWideSamples(format) ? 2 : 1);
 }
 
 struct Block {
@@ -45,12 +37,6 @@ struct Block {
   int32_t rowBytes[3];
 };
 
-void Check(VX_Result result, const std::string& what) {
-  if (result == VX_Success) return;
-  std::fprintf(stderr, "benchmark set-up failed: %s (%s)\n", what.c_str(), VX_ResultName(result));
-  std::exit(1);
-}
-
 struct Job {
   std::shared_ptr<Block> src;
   std::shared_ptr<Memory> dst;
@@ -65,9 +51,7 @@ Job Decode(const std::string& name, F format, Size size, Size dstSize, bool inte
   const int rowBytes = dstSize.width * 4;
   const auto dst = std::make_shared<Memory>(static_cast<size_t>(rowBytes) * dstSize.height);
   const std::string chroma = interpolates ? " (interpolated) " : " (nearest) ";
-  Job job{
-      src, dst, rowBytes, size,
-      BenchCase("decode " + name + " to BGRA8" + chroma + size.name, static_cast<size_t>(size.width) * size.height)};
+  Job job{src, dst, rowBytes, size, BenchCase("decode " + name + " to BGRA8" + chroma + size.name, size.Pixels())};
   const auto work = [=] {
     return VX::DecompressYUV_420_8u(src->planes, src->rowBytes, size.width, size.height, format, dst->data(), rowBytes,
                                     dstSize.width, dstSize.height, F::BGRA_4444_8u,
@@ -81,15 +65,12 @@ Job Decode(const std::string& name, F format, Size size, Size dstSize, bool inte
 }
 
 void AddSwscale(Job& job, const char* format) {
-  for (const bool accurate : {false, true}) {
-    const auto scaler = std::make_shared<Swscale>(format, "bgra", job.size.width, job.size.height, accurate);
-    if (!scaler->valid()) continue;
-    job.report.Add(scaler->name(), [=, src = job.src, dst = job.dst, rowBytes = job.rowBytes] {
-      const uint8_t* planes[4] = {src->plane(0), src->plane(1), src->plane(2)};
-      const int rows[4] = {src->rowBytes[0], src->rowBytes[1], src->rowBytes[2]};
-      scaler->RunPlanes(planes, rows, dst->data(), rowBytes);
-    });
-  }
+  const auto run = [src = job.src, dst = job.dst, rowBytes = job.rowBytes](auto& swscale) {
+    const uint8_t* planes[4] = {src->plane(0), src->plane(1), src->plane(2)};
+    const int rows[4] = {src->rowBytes[0], src->rowBytes[1], src->rowBytes[2]};
+    swscale.RunPlanes(planes, rows, dst->data(), rowBytes);
+  };
+  bench::AddSwscale(job.report, format, "bgra", job.size, run);
 }
 
 #ifdef VEXEL_PEER_YUV
@@ -173,7 +154,7 @@ void ConvertCases(Size size) {
       return VX_Convert(src->data(), srcRow, c.src, dst->data(), dstRow, c.dst, size.width, size.height, 2);
     };
     Check(work(), c.name);
-    BenchCase report(std::string("convert ") + c.name + " " + size.name, static_cast<size_t>(size.width) * size.height);
+    BenchCase report(std::string("convert ") + c.name + " " + size.name, size.Pixels());
     report.Add("vexel", work).AddFloor(PictureBytes(c.src, size), PictureBytes(c.dst, size));
   }
 }
@@ -182,7 +163,7 @@ void EncodeCases(Size size) {
   for (const F format : {F::YUV_420_MPEG4_FRAME_FullRange, F::YUV_420_MPEG4_FRAME_709}) {
     const bool video = format == F::YUV_420_MPEG4_FRAME_709;
     const F input = video ? F::VUYX_4444_8u_709 : F::BGRX_4444_8u;
-    const auto src = std::make_shared<Memory>(static_cast<size_t>(size.width) * size.height * 4);
+    const auto src = std::make_shared<Memory>(size.Pixels() * 4);
     const auto dst = std::make_shared<Block>(format, size);
     src->FillBytes();
     const auto work = [=] {
@@ -190,7 +171,7 @@ void EncodeCases(Size size) {
     };
     const std::string name = std::string("encode ") + (video ? "VUYX8 to I420 709 " : "BGRX8 to I420 full range ");
     Check(work(), name);
-    BenchCase report(name + size.name, static_cast<size_t>(size.width) * size.height);
+    BenchCase report(name + size.name, size.Pixels());
     report.Add("vexel", work).AddFloor(src->size(), dst->pixelBytes());
 #ifdef VEXEL_PEER_YUV
     if (!video)
@@ -206,7 +187,7 @@ void EncodeCases(Size size) {
 }  // namespace
 
 void RegisterBenchmarks() {
-  for (const Size& size : kSizes) {
+  for (const Size size : {kHd, kUhd}) {
     FullSizeCases(size);
     OtherSizeCases(size);
     EncodeCases(size);

@@ -90,8 +90,7 @@ void Register(const KernelCase& kernelCase, const Buffers& buffers, const std::s
   const KernelVariant variant = ActiveKernelVariant();
   const RowKernel kernel = (*kernelCase.kernels)[variant];
   BenchCase bench(std::string(kernelCase.name) + " " + size, pixels);
-  bench.Add("floor cached", [=] { FloorCached(src, srcBytes, dst, dstBytes); });
-  bench.Add("floor streamed", [=] { FloorStreamed(src, srcBytes, dst, dstBytes); });
+  bench.AddFloor(src, srcBytes, dst, dstBytes);
   const bool streams = srcBytes + dstBytes >= VX_GetCacheSize() / 2;
   bench.Add("vexel", [=, &kernelCase] {
     if (streams)

@@ -14,24 +14,17 @@
 
 namespace {
 
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
+using namespace vexel::bench;
 
-struct Size {
-  const char* name;
-  int width, height;
-};
 // 2048 x 2048: row bytes of 4-byte elements are a multiple of 4,096 on both sides.
-constexpr Size kSizes[] = {
-    {"1080p", 1920, 1080}, {"2160p", 3840, 2160}, {"8K", 7680, 4320}, {"2048 x 2048", 2048, 2048}};
+constexpr Size kSizes[] = {kHd, kUhd, {"8K", 7680, 4320}, {"2048 x 2048", 2048, 2048}};
 
 void TransposeCase(Size size, int bytes) {
   const int srcRow = size.width * bytes, dstRow = (size.height * bytes + 63) / 64 * 64;
   auto src = std::make_shared<Memory>(static_cast<size_t>(srcRow) * size.height);
   auto dst = std::make_shared<Memory>(static_cast<size_t>(dstRow) * size.width);
   src->FillBytes();
-  BenchCase report("transpose " + std::to_string(bytes) + " B " + size.name,
-                   static_cast<size_t>(size.width) * size.height);
+  BenchCase report("transpose " + std::to_string(bytes) + " B " + size.name, size.Pixels());
   report.Add("vexel", [=] {
     VX_Transpose(src->data(), srcRow, dst->data(), dstRow, size.width, size.height, static_cast<uint8_t>(bytes));
   });
@@ -62,8 +55,7 @@ void RotateCase(Size size, int angle) {
   auto src = std::make_shared<Memory>(static_cast<size_t>(srcRow) * size.height);
   auto dst = std::make_shared<Memory>(static_cast<size_t>(dstRow) * rows);
   src->FillBytes();
-  BenchCase report("rotate BGRA8 by " + std::to_string(angle) + " " + size.name,
-                   static_cast<size_t>(size.width) * size.height);
+  BenchCase report("rotate BGRA8 by " + std::to_string(angle) + " " + size.name, size.Pixels());
   report.Add("vexel", [=] {
     VX_RotateImageAndFlip(src->data(), srcRow, dst->data(), dstRow, size.width, size.height,
                           VX_PixelFormat::BGRA_4444_8u, angle, false);

@@ -27,14 +27,9 @@ namespace {
 
 using vexel::KernelVariant;
 using vexel::RowKernelSet;
-using vexel::bench::BenchCase;
-using vexel::bench::Memory;
+using namespace vexel::bench;
 
-struct Size {
-  const char* name;
-  size_t width, height;
-};
-constexpr Size kSizes[] = {{"row", 1920, 1}, {"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
+constexpr Size kSizes[] = {{"row", 1920, 1}, kHd, kUhd};
 
 // A picture of three planes, as the peers know it.
 struct Planes {
@@ -42,8 +37,11 @@ struct Planes {
   bool isFloat = false, isRgb = false, isHalf = false;  // half: 4:2:2
 
   size_t SampleBytes() const { return isFloat ? 4 : bits > 8 ? 2 : 1; }
-  size_t PlaneWidth(Size size, int plane) const { return isHalf && plane > 0 ? size.width / 2 : size.width; }
-  size_t RowBytes(Size size, int plane) const { return (PlaneWidth(size, plane) * SampleBytes() + 63) / 64 * 64; }
+  size_t RowBytes(Size size, int plane) const {
+    const int width = isHalf && plane > 0 ? size.width / 2 : size.width;
+    return (static_cast<size_t>(width) * SampleBytes() + 63) / 64 * 64;
+  }
+  size_t Bytes(Size size, int plane) const { return RowBytes(size, plane) * static_cast<size_t>(size.height); }
 };
 constexpr Planes kRgb8{8, false, true, false}, kYuv8{8, false, false, false}, k422_8{8, false, false, true},
     k422_10{10, false, false, true}, kRgbFloat{32, true, true, false}, kYuvFloat{32, true, false, false};
@@ -115,8 +113,8 @@ class ZimgPeer {
   static std::vector<Plane> MakePlanes(const Planes& planes, Size size) {
     std::vector<Plane> result;
     for (int i = 0; i < 3; ++i) {
-      const size_t stride = planes.RowBytes(size, i);
-      result.push_back({std::make_unique<Memory>(stride * size.height), static_cast<ptrdiff_t>(stride)});
+      result.push_back(
+          {std::make_unique<Memory>(planes.Bytes(size, i)), static_cast<ptrdiff_t>(planes.RowBytes(size, i))});
       if (planes.isFloat) result.back().memory->FillFloats();
     }
     return result;
@@ -144,65 +142,64 @@ class ZimgPeer {
 #ifdef VEXEL_PEER_SWSCALE
 // Planar 4:2:2 of 10 bits to BGRA, swscale's nearest to V210; its default flags and its accurate ones.
 void AddSwscale(BenchCase& report, Size size, const char* name, int flags) {
-  const auto context = std::shared_ptr<SwsContext>(
-      sws_getContext(static_cast<int>(size.width), static_cast<int>(size.height), AV_PIX_FMT_YUV422P10LE,
-                     static_cast<int>(size.width), static_cast<int>(size.height), AV_PIX_FMT_BGRA, flags, nullptr,
-                     nullptr, nullptr),
-      sws_freeContext);
+  const auto context =
+      std::shared_ptr<SwsContext>(sws_getContext(size.width, size.height, AV_PIX_FMT_YUV422P10LE, size.width,
+                                                 size.height, AV_PIX_FMT_BGRA, flags, nullptr, nullptr, nullptr),
+                                  sws_freeContext);
   if (!context) return;
   std::shared_ptr<Memory> planes[3];
-  for (int i = 0; i < 3; ++i) planes[i] = std::make_shared<Memory>(k422_10.RowBytes(size, i) * size.height);
-  const auto dst = std::make_shared<Memory>(4 * size.width * size.height);
+  for (int i = 0; i < 3; ++i) planes[i] = std::make_shared<Memory>(k422_10.Bytes(size, i));
+  const auto dst = std::make_shared<Memory>(4 * size.Pixels());
   report.Add(name, [=] {
     const uint8_t* in[4] = {planes[0]->data(), planes[1]->data(), planes[2]->data(), nullptr};
     const int inStride[4] = {static_cast<int>(k422_10.RowBytes(size, 0)), static_cast<int>(k422_10.RowBytes(size, 1)),
                              static_cast<int>(k422_10.RowBytes(size, 2)), 0};
     uint8_t* out[4] = {dst->data()};
-    const int outStride[4] = {static_cast<int>(4 * size.width)};
-    sws_scale(context.get(), in, inStride, 0, static_cast<int>(size.height), out, outStride);
+    const int outStride[4] = {4 * size.width};
+    sws_scale(context.get(), in, inStride, 0, size.height, out, outStride);
   });
 }
 #endif
 
 void AddCase(const Case& c, Size size) {
-  const size_t srcRow = RowBytes(c.srcBits, size.width), dstRow = RowBytes(c.dstBits, size.width);
+  const size_t width = static_cast<size_t>(size.width), height = static_cast<size_t>(size.height);
+  const size_t srcRow = RowBytes(c.srcBits, width), dstRow = RowBytes(c.dstBits, width);
   const size_t block = c.needsRow ? vexel::kStreamBlock : vexel::kChainBlock, reach = c.needsRow ? vexel::kReach : 0;
-  const auto src = std::make_shared<Memory>(srcRow * size.height), dst = std::make_shared<Memory>(dstRow * size.height),
+  const auto src = std::make_shared<Memory>(srcRow * height), dst = std::make_shared<Memory>(dstRow * height),
              scratch = std::make_shared<Memory>(RowBytes(c.dstBits, block + 2 * reach));
   if (c.isFloatSource)
     src->FillFloats();
   else
     src->FillBytes();
-  BenchCase report(std::string(c.name) + " " + size.name, size.width * size.height);
+  BenchCase report(std::string(c.name) + " " + size.name, size.Pixels());
   const KernelVariant variant = vexel::ActiveKernelVariant();
   const auto kernel = (*c.kernels)[variant];
   const bool streams = VX_GetCacheSize() != 0 && src->size() + dst->size() >= VX_GetCacheSize() / 2;
   report.Add(streams ? "vexel ordinary stores" : "vexel", [=] {
     const vexel::FpModeGuard guard;
-    for (size_t row = 0; row < size.height; ++row)
-      kernel(src->data() + row * srcRow, dst->data() + row * dstRow, size.width);
+    for (size_t row = 0; row < height; ++row) kernel(src->data() + row * srcRow, dst->data() + row * dstRow, width);
   });
-  if (size.height > 1)
+  if (height > 1)
     report.Add(streams ? "vexel" : "vexel streamed", [=, srcBits = c.srcBits, dstBits = c.dstBits] {
       const vexel::FpModeGuard guard;
-      for (size_t row = 0; row < size.height; ++row)
-        for (size_t x = 0; x < size.width; x += block) {
-          const size_t first = x - std::min(x, reach), end = std::min(size.width, x + block + reach);
+      for (size_t row = 0; row < height; ++row)
+        for (size_t x = 0; x < width; x += block) {
+          const size_t first = x - std::min(x, reach), end = std::min(width, x + block + reach);
           kernel(src->data() + row * srcRow + RowBytes(srcBits, first), scratch->data(), end - first);
           vexel::StreamCopy(dst->data() + row * dstRow + RowBytes(dstBits, x),
                             scratch->data() + RowBytes(dstBits, x - first),
-                            RowBytes(dstBits, std::min(block, size.width - x)), variant);
+                            RowBytes(dstBits, std::min(block, width - x)), variant);
         }
       vexel::StreamFence();
     });
   report.AddFloor(src->size(), dst->size());
 #ifdef VEXEL_PEER_ZIMG
-  if (c.from && size.height > 1)
+  if (c.from && height > 1)
     if (const auto peer = std::make_shared<ZimgPeer>(*c.from, *c.to, size); *peer)
       report.Add("zimg (planes)", [peer] { peer->Run(); });
 #endif
 #ifdef VEXEL_PEER_SWSCALE
-  if (c.kernels == &vexel::kV210ToBgrx8_709 && size.height > 1) {
+  if (c.kernels == &vexel::kV210ToBgrx8_709 && height > 1) {
     AddSwscale(report, size, "swscale (planes, bilinear)", SWS_BILINEAR);
     AddSwscale(report, size, "swscale (planes, accurate)",
                SWS_BILINEAR | SWS_ACCURATE_RND | SWS_FULL_CHR_H_INT | SWS_FULL_CHR_H_INP);

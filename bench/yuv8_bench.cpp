@@ -17,12 +17,7 @@ namespace {
 using namespace vexel;
 using namespace vexel::bench;
 
-struct Size {
-  const char* name;
-  int width, height;
-  size_t Pixels() const { return static_cast<size_t>(width) * static_cast<size_t>(height); }
-};
-constexpr Size kSizes[] = {{"8 rows of 1080p", 1920, 8}, {"1080p", 1920, 1080}, {"2160p", 3840, 2160}};
+constexpr Size kSizes[] = {{"8 rows of 1080p", 1920, 8}, kHd, kUhd};
 
 // An image with all that its contenders need. Four-byte sources get random alpha, or 255.
 struct Work {
@@ -64,14 +59,10 @@ struct Work {
     });
   }
   void AddSwscale(const char* srcName, const char* dstName) {
-    for (const bool accurate : {false, true}) {
-      auto scaler = std::make_shared<Swscale>(srcName, dstName, size.width, size.height, accurate);
-      if (!scaler->valid()) continue;
-      report.Add(std::string(scaler->name()) + " to " + dstName,
-                 [=, from = src, to = dst, srcBytes = srcRow, dstBytes = dstRow] {
-                   scaler->Run(from->data(), srcBytes, to->data(), dstBytes);
-                 });
-    }
+    const auto run = [from = src, to = dst, srcBytes = srcRow, dstBytes = dstRow](auto& swscale) {
+      swscale.Run(from->data(), srcBytes, to->data(), dstBytes);
+    };
+    bench::AddSwscale(report, srcName, dstName, size, run, std::string(" to ") + dstName);
   }
 
   Size size;

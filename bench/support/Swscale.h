@@ -1,7 +1,12 @@
-// swscale as a peer: one conversion without scaling, with its fast flags or its accurate ones. They differ thirtyfold.
+// swscale as a peer: one conversion without scaling, with its fast flags and with its accurate ones. They differ
+// thirtyfold.
 #pragma once
 
 #include <cstdint>
+#include <memory>
+#include <string>
+
+#include "support/Bench.h"
 
 #ifdef VEXEL_PEER_SWSCALE
 extern "C" {
@@ -35,7 +40,7 @@ class Swscale {
   Swscale& operator=(const Swscale&) = delete;
 
   bool valid() const { return mContext != nullptr; }
-  const char* name() const {
+  std::string name() const {
     return mAccurate ? "swscale accurate_rnd+bitexact+full_chroma_int" : "swscale fast_bilinear";
   }
   void Run(const uint8_t* src, int srcRowBytes, uint8_t* dst, int dstRowBytes) {
@@ -59,14 +64,19 @@ class Swscale {
   bool mAccurate;
   std::vector<std::vector<uint8_t>> mPlanes;
 };
-#else
-struct Swscale {
-  Swscale(const char*, const char*, int, int, bool) {}
-  bool valid() const { return false; }
-  const char* name() const { return ""; }
-  void Run(const uint8_t*, int, uint8_t*, int) {}
-  void RunPlanes(const uint8_t* const*, const int*, uint8_t*, int) {}
-};
 #endif
+
+// Both settings, where swscale knows the formats; run(swscale) converts once. `note` is added to its name.
+template <class Run>
+void AddSwscale([[maybe_unused]] BenchCase& report, [[maybe_unused]] const char* srcFormat,
+                [[maybe_unused]] const char* dstFormat, [[maybe_unused]] Size size, [[maybe_unused]] const Run& run,
+                [[maybe_unused]] const std::string& note = "") {
+#ifdef VEXEL_PEER_SWSCALE
+  for (const bool accurate : {false, true}) {
+    const auto swscale = std::make_shared<Swscale>(srcFormat, dstFormat, size.width, size.height, accurate);
+    if (swscale->valid()) report.Add(swscale->name() + note, [=] { run(*swscale); });
+  }
+#endif
+}
 
 }  // namespace vexel::bench
