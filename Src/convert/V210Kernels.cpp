@@ -364,11 +364,6 @@ struct ToBgr8 {
   }
 };
 
-struct ToVuy8 {
-  static HWY_INLINE I16 Round(I16 v) { return hn::Add(hn::ShiftRight<8>(hn::SaturatedAdd(v, Set16(128))), Set16(128)); }
-  static HWY_INLINE Channels16 Apply(I16 luma, I16 u, I16 v) { return {{Round(v), Round(u), Round(luma)}}; }
-};
-
 template <const RecodingFixed& kR>
 struct RecodeToVuy8 {
   static HWY_INLINE Channels16 Apply(I16 luma, I16 u, I16 v) {
@@ -433,29 +428,58 @@ HWY_INLINE void StorePixels(const Channels16& pixels, uint8_t* HWY_RESTRICT dst)
   StoreVector(hn::InterleaveUpper(d16, lower, upper), dst, 1);
 }
 
+// Steps make kStepPixels pixels of their samples, which continue with those of the next pair.
+template <class Matrix>
+struct MatrixStep {
+  static HWY_INLINE void Store(const uint8_t* HWY_RESTRICT pairs, uint8_t* HWY_RESTRICT dst) {
+    StorePixels(StepPixels<Matrix>(pairs), dst);
+  }
+};
+
+// Rounded codes are the upper bytes of words: those of the samples and those of the chroma between pairs.
+struct RoundStep {
+  static HWY_INLINE U8 Pixels(U16 own, U16 next) {
+    static constexpr uint8_t Z = 0x80;
+    alignas(16) static constexpr uint8_t kOwn[16] = {5, 1, 3, Z, Z, Z, 7, Z, 13, 9, 11, Z, Z, Z, 15, Z};
+    alignas(16) static constexpr uint8_t kBetween[16] = {Z, Z, Z, Z, 5, 1, Z, Z, Z, Z, Z, Z, 13, 9, Z, Z};
+    const hn::ScalableTag<uint8_t> d8;
+    const hn::ScalableTag<uint16_t> d16;
+    const auto round = [&](U16 v) HWY_ATTR { return hn::BitCast(d8, hn::SaturatedAdd(v, hn::Set(d16, 128))); };
+    const auto colors = hn::Or(hn::TableLookupBytesOr0(round(own), Repeat(kOwn)),
+                               hn::TableLookupBytesOr0(round(hn::AverageRound(own, next)), Repeat(kBetween)));
+    return WriteAlpha<AlphaWrite::OpaqueLast, uint8_t>(colors);
+  }
+  static HWY_INLINE void Store(const uint8_t* HWY_RESTRICT pairs, uint8_t* HWY_RESTRICT dst) {
+    StoreVector(Pixels(LoadVector<uint16_t>(pairs, 0), LoadVector<uint16_t>(pairs + 8, 0)), dst, 0);
+    StoreVector(Pixels(LoadVector<uint16_t>(pairs, 1), LoadVector<uint16_t>(pairs + 8, 1)), dst, 1);
+  }
+};
+
 constexpr size_t kChunkGroups = 32, kChunkPixels = 6 * kChunkGroups;
 
 // Runs of a row small enough to stay in the cache as 16-bit samples.
 template <class Step>
 HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
   // A chunk, the pair after it, and what the last step reads beyond.
-  alignas(64) uint16_t samples[(kChunkGroups + 1) * kGroupSamples + 2 * kStepPixels] = {};
+  alignas(64) uint16_t samples[(kChunkGroups + 1) * kGroupSamples + 2 * kStepPixels];
   const auto* bytes = reinterpret_cast<const uint8_t*>(samples);
   for (; count > 0; src += kChunkGroups * kGroupBytes) {
     const size_t pixels = count < kChunkPixels ? count : kChunkPixels;
     const size_t groups = GroupsOf(count) <= kChunkGroups ? GroupsOf(count) : kChunkGroups + 1;
-    for (size_t i = 0; i < groups; ++i) UnpackGroup(src + i * kGroupBytes, samples + i * kGroupSamples);
+    uint16_t* end = samples;
+    for (const uint8_t* group = src; group != src + groups * kGroupBytes; group += kGroupBytes, end += kGroupSamples)
+      UnpackGroup(group, end);
     if (count <= kChunkPixels) {  // the row ends: its last chroma repeats
       const size_t last = 4 * (PairsOf(count) - 1);
       samples[last + 4] = samples[last];
       samples[last + 6] = samples[last + 2];
+      std::memset(end + 4, 0, 4 * kStepPixels);
     }
     size_t x = 0;
-    for (; x + kStepPixels <= pixels; x += kStepPixels, dst += 4 * kStepPixels)
-      StorePixels(StepPixels<Step>(bytes + 4 * x), dst);
+    for (; x + kStepPixels <= pixels; x += kStepPixels, dst += 4 * kStepPixels) Step::Store(bytes + 4 * x, dst);
     if (x < pixels) {
       alignas(64) uint8_t out[4 * kStepPixels];
-      StorePixels(StepPixels<Step>(bytes + 4 * x), out);
+      Step::Store(bytes + 4 * x, out);
       std::memcpy(dst, out, 4 * (pixels - x));
     }
     count -= pixels;
@@ -465,17 +489,17 @@ HWY_INLINE void UpsampleRow(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRI
 template <const BgrFixed& kM>
 HWY_INLINE void ToBgrx8(const uint8_t* src, uint8_t* dst, size_t count) {
   if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return V210ToBgrx512(src, dst, count, kM);
-  UpsampleRow<ToBgr8<kM>>(src, dst, count);
+  UpsampleRow<MatrixStep<ToBgr8<kM>>>(src, dst, count);
 }
 void V210ToBgrx8_601(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8<kBgrFixed601>(src, dst, count); }
 void V210ToBgrx8_709(const uint8_t* src, uint8_t* dst, size_t count) { ToBgrx8<kBgrFixed709>(src, dst, count); }
 void V210ToVuyx8(const uint8_t* src, uint8_t* dst, size_t count) {
   if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return V210ToVuyx512(src, dst, count);
-  UpsampleRow<ToVuy8>(src, dst, count);
+  UpsampleRow<RoundStep>(src, dst, count);
 }
 void V210_709ToVuyx8_601(const uint8_t* src, uint8_t* dst, size_t count) {
   if (HWY_TARGET == HWY_AVX3 && HasVbmi()) return RecodeV210ToVuyx512(src, dst, count, kRecodingFixed709To601);
-  UpsampleRow<RecodeToVuy8<kRecodingFixed709To601>>(src, dst, count);
+  UpsampleRow<MatrixStep<RecodeToVuy8<kRecodingFixed709To601>>>(src, dst, count);
 }
 
 }  // namespace
