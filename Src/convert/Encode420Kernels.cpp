@@ -101,12 +101,12 @@ HWY_INLINE I16 ReplaceFirst(I16 first, I16 others) {
 #endif
 }
 
-// U in the lower half, V in the upper one.
+// U in the lower half, V in the upper one. Nothing shorter than 16 bytes goes past the cache.
 template <bool kStream>
 HWY_INLINE void WriteChroma(U8 chroma, uint8_t* u, uint8_t* v) {
   const hn::Half<ScalableTag<uint8_t>> d;
   const auto low = hn::LowerHalf(d, chroma), high = hn::UpperHalf(d, chroma);
-  if constexpr (kStream) {
+  if constexpr (kStream && HWY_MAX_BYTES > 16) {
     hn::Stream(low, d, u);
     hn::Stream(high, d, v);
   } else {
