@@ -42,8 +42,8 @@ VX_BlendMode ParseBlendMode(const std::string& name) {
     if (SameName(name, entry.name) || name == std::to_string(static_cast<int>(entry.mode))) return entry.mode;
     names.push_back(entry.name);
   }
-  throw ToolError("unknown blend mode \"" + name + "\"; did you mean " + NearestNames(name, names) +
-                  "? (\"vexel composite --help\" lists all)");
+  throw ToolError("unknown blend mode \"" + name + "\"" + DidYouMean(name, names) +
+                  " (\"vexel composite --help\" lists all)");
 }
 
 Picture BlendPictures(const Picture& back, const Picture& front, const BlendOptions& options) {

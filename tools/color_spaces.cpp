@@ -30,8 +30,8 @@ const NamedColorSpace& ParseColorSpace(const std::string& name) {
     if (SameName(name, space.name)) return space;
     names.push_back(space.name);
   }
-  throw ToolError("unknown colour space \"" + name + "\"; did you mean " + NearestNames(name, names) +
-                  "? (\"vexel color --help\" lists all)");
+  throw ToolError("unknown colour space \"" + name + "\"" + DidYouMean(name, names) +
+                  " (\"vexel color --help\" lists all)");
 }
 
 std::string ColorSpaceNames() {

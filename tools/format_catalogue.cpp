@@ -38,8 +38,7 @@ VX_PixelFormat ParseFormat(const std::string& name) {
     if (name == entry.name) return entry.format;
   std::vector<std::string> names;
   for (const CatalogueEntry& entry : Catalogue()) names.push_back(entry.name);
-  throw ToolError("unknown format \"" + name + "\"; did you mean " + NearestNames(name, names) +
-                  "? (\"vexel formats\" lists all)");
+  throw ToolError("unknown format \"" + name + "\"" + DidYouMean(name, names) + " (\"vexel formats\" lists all)");
 }
 
 size_t TightRowBytes(VX_PixelFormat format, int width) {

@@ -32,13 +32,22 @@ void AddCommands(CLI::App& app) {
   tool::AddUnpackCommand(app);
 }
 
-// A word that is no command deserves better than "a command is required".
+// What is missing or unknown in front of the command deserves better than "a subcommand is required".
 std::string ExplainUsageError(const CLI::App& app, const CLI::ParseError& error, int argc, char** argv) {
-  if (argc < 2 || argv[1][0] == '-') return error.what();
-  std::vector<std::string> names;
-  for (const CLI::App* command : app.get_subcommands({})) names.push_back(command->get_name());
-  if (std::find(names.begin(), names.end(), argv[1]) != names.end()) return error.what();
-  return std::string("unknown command \"") + argv[1] + "\"; did you mean " + tool::NearestNames(argv[1], names) + "?";
+  std::string usage = "vexel --help\" or \"vexel COMMAND --help", text = error.what();
+  if (argc < 2) {
+    text = "a command is required";
+  } else if (argv[1][0] == '-') {
+    text = std::string("unknown option \"") + argv[1] + "\" before a command";
+  } else {
+    std::vector<std::string> names;
+    for (const CLI::App* command : app.get_subcommands({})) names.push_back(command->get_name());
+    if (std::find(names.begin(), names.end(), argv[1]) != names.end())
+      usage = std::string("vexel ") + argv[1] + " --help";
+    else
+      text = std::string("unknown command \"") + argv[1] + "\"" + tool::DidYouMean(argv[1], names);
+  }
+  return text + "\nRun \"" + usage + "\" for usage.";
 }
 
 struct Library {
@@ -59,10 +68,9 @@ int main(int argc, char** argv) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::Success& success) {
-    return app.exit(success);
+    app.exit(success);
   } catch (const CLI::ParseError& error) {
-    std::cerr << "vexel: " << ExplainUsageError(app, error, argc, argv)
-              << "\nRun \"vexel --help\" or \"vexel COMMAND --help\" for usage.\n";
+    std::cerr << "vexel: " << ExplainUsageError(app, error, argc, argv) << '\n';
     return kExitUsage;
   } catch (const tool::ToolError& error) {
     std::cerr << "vexel: " << error.what() << '\n';

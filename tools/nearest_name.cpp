@@ -37,15 +37,16 @@ bool SameName(const std::string& a, const std::string& b) {
   return std::equal(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) { return Lower(x) == Lower(y); });
 }
 
-std::string NearestNames(const std::string& name, const std::vector<std::string>& names) {
+std::string DidYouMean(const std::string& name, const std::vector<std::string>& names) {
   std::vector<std::pair<int, std::string>> ranked;
   for (const std::string& candidate : names)
     ranked.emplace_back(Contains(candidate, name) ? 0 : EditDistance(name, candidate), candidate);
   std::stable_sort(ranked.begin(), ranked.end(), [](auto& a, auto& b) { return a.first < b.first; });
-  std::string text = ranked.at(0).second;
+  if (name.empty() || 2 * static_cast<size_t>(ranked.at(0).first) > name.size()) return {};
+  std::string text = "; did you mean " + ranked[0].second;
   for (size_t i = 1; i < std::min<size_t>(3, ranked.size()) && ranked[i].first <= ranked[0].first + 1; ++i)
     text += ", " + ranked[i].second;
-  return text;
+  return text + "?";
 }
 
 }  // namespace tool
