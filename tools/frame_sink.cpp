@@ -52,7 +52,7 @@ Container ContainerOf(const std::string& path) {
 std::unique_ptr<FrameSink> OpenSink(const std::string& path, const SinkOptions& options, int64_t firstNumber) {
   const Container container = options.container ? *options.container : ContainerOf(path);
   if (container == Container::Y4m || container == Container::Raw)
-    return OpenStreamSink(path, container, options.frameRate);
+    return OpenStreamSink(path, container, options.frameRate, firstNumber);
   return OpenImageSink(path, container, firstNumber);
 }
 

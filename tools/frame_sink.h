@@ -44,8 +44,8 @@ class FrameSink {
   virtual void Close() {}
 };
 
-// `path` may be "-" for standard output, or a printf pattern ("out_%04d.png") for a sequence numbered from
-// `firstNumber`.
+// `path` may be "-" for standard output, or a printf pattern ("out_%04d.png") for a sequence of pictures. `firstNumber`
+// is the first frame's, in such names and in messages.
 std::unique_ptr<FrameSink> OpenSink(const std::string& path, const SinkOptions& options, int64_t firstNumber = 0);
 
 // What reports call it: standard output, or the path.
@@ -56,6 +56,7 @@ std::vector<uint8_t> RawBytes(const Picture& picture);
 
 // Defined by image_sink.cpp and stream_sink.cpp.
 std::unique_ptr<FrameSink> OpenImageSink(const std::string& path, Container container, int64_t firstNumber);
-std::unique_ptr<FrameSink> OpenStreamSink(const std::string& path, Container container, std::pair<int, int> frameRate);
+std::unique_ptr<FrameSink> OpenStreamSink(const std::string& path, Container container, std::pair<int, int> frameRate,
+                                          int64_t firstNumber = 0);
 
 }  // namespace tool

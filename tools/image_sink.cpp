@@ -1,6 +1,5 @@
 // Pictures through libavcodec's encoders: one file, or one per frame.
-#include <cinttypes>
-#include <cstdio>
+#include <optional>
 
 extern "C" {
 #include <libavutil/opt.h>
@@ -9,6 +8,7 @@ extern "C" {
 #include "format_catalogue.h"
 #include "frame_export.h"
 #include "frame_sink.h"
+#include "numbered_path.h"
 #include "output_file.h"
 #include "tool_error.h"
 
@@ -80,30 +80,17 @@ Storage StorageOf(const ImageKind& kind, VX_PixelFormat format) {
   return deep ? (alpha ? kind.alphaDeep : kind.opaqueDeep) : (alpha ? kind.alpha8 : kind.opaque8);
 }
 
-// "out_%04d.png" and a number; the one conversion of the pattern is checked before.
-std::string NumberedPath(const std::string& pattern, int64_t number) {
-  const size_t percent = pattern.find('%'), d = pattern.find('d', percent);
-  char digits[64];
-  const std::string width = pattern.substr(percent + 1, d - percent - 1);
-  const int columns = width.empty() ? 0 : std::stoi(width);
-  std::snprintf(digits, sizeof digits, width[0] == '0' ? "%0*" PRId64 : "%*" PRId64, columns, number);
-  return pattern.substr(0, percent) + digits + pattern.substr(d + 1);
-}
-
-// True for one "%d", "%4d" or "%04d"; throws for any other use of the percent sign.
-bool IsPattern(const std::string& path) {
-  const size_t percent = path.find('%');
-  if (percent == std::string::npos) return false;
-  const size_t d = path.find_first_not_of("0123456789", percent + 1);
-  if (d == std::string::npos || path[d] != 'd' || d - percent > 3 || path.find('%', d) != std::string::npos)
+std::optional<NumberedPath> ParsePattern(const std::string& path) {
+  const std::optional<NumberedPath> pattern = ParseNumberedPath(path);
+  if (pattern ? pattern->after.find('%') != std::string::npos : path.find('%') != std::string::npos)
     throw ToolError("\"" + path + "\" is not a sequence pattern: it takes one number, as in out_%04d.png");
-  return true;
+  return pattern;
 }
 
 class ImageSink : public FrameSink {
  public:
   ImageSink(const std::string& path, Container container, int64_t firstNumber)
-      : mPath(path), mKind(KindOf(container)), mNumber(firstNumber), mPattern(IsPattern(path)) {
+      : mPath(path), mKind(KindOf(container)), mNumber(firstNumber), mPattern(ParsePattern(path)) {
     CollectAvMessages();
   }
 
@@ -140,7 +127,7 @@ class ImageSink : public FrameSink {
   }
 
   void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
-    OutputFile file(mPattern ? NumberedPath(mPath, mNumber++) : mPath);
+    OutputFile file(mPattern ? mPattern->At(mNumber++) : mPath);
     file.Write(encoded.data(), encoded.size());
     file.Close();
   }
@@ -158,7 +145,7 @@ class ImageSink : public FrameSink {
   std::string mPath;
   const ImageKind& mKind;
   int64_t mNumber;
-  bool mPattern;
+  std::optional<NumberedPath> mPattern;
 };
 
 }  // namespace

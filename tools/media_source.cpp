@@ -13,6 +13,7 @@ extern "C" {
 #include "av_handles.h"
 #include "format_catalogue.h"
 #include "frame_source.h"
+#include "numbered_path.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -25,7 +26,13 @@ InputContext OpenInput(const std::string& path) {
     throw ToolError("cannot read " + SourceName(path) + ": the file is empty");
   AVFormatContext* context = nullptr;
   const std::string url = path == "-" ? "pipe:0" : path;
-  CheckAv(avformat_open_input(&context, url.c_str(), nullptr, nullptr), "cannot read " + SourceName(path));
+  AVDictionary* options = nullptr;
+  // A sequence may begin anywhere; libav alone looks for the numbers 0 to 4.
+  if (const auto numbered = ParseNumberedPath(path))
+    if (const auto first = numbered->FirstThere()) av_dict_set_int(&options, "start_number", *first, 0);
+  const int opened = avformat_open_input(&context, url.c_str(), nullptr, &options);
+  av_dict_free(&options);
+  CheckAv(opened, "cannot read " + SourceName(path));
   InputContext input(context);
   CheckAv(avformat_find_stream_info(context, nullptr), "cannot read " + SourceName(path));
   return input;

@@ -10,24 +10,54 @@ extern "C" {
 #include "frame_export.h"
 #include "frame_import.h"
 #include "frame_sink.h"
+#include "numbered_path.h"
 #include "output_file.h"
+#include "tool_error.h"
 
 namespace tool {
 namespace {
 
-class RawSink : public FrameSink {
+// One file for all frames, which must be of one size: nothing in it says where another begins.
+class StreamSink : public FrameSink {
  public:
-  explicit RawSink(const std::string& path) : mFile(path) {}
-  VX_PixelFormat StorageFormat(VX_PixelFormat format, int) const override { return format; }
-  std::vector<uint8_t> Encode(const Picture& picture) const override { return RawBytes(picture); }
-  void Append(const Picture&, const std::vector<uint8_t>& encoded) override {
-    mFile.Write(encoded.data(), encoded.size());
+  StreamSink(const std::string& path, int64_t firstNumber) : mFile(path), mNumber(firstNumber) {
+    if (ParseNumberedPath(path))
+      throw ToolError("\"" + path +
+                      "\" would be one file of all frames; only pictures are numbered, as in out_%04d.png");
   }
   bool TakesManyFrames() const override { return true; }
   void Close() override { mFile.Close(); }
 
- private:
+ protected:
+  void CheckSize(const Picture& picture) {
+    const auto text = [](int width, int height) { return std::to_string(width) + "x" + std::to_string(height); };
+    if (mWidth == 0) {
+      mWidth = picture.Width();
+      mHeight = picture.Height();
+    } else if (picture.Width() != mWidth || picture.Height() != mHeight) {
+      throw ToolError("frame " + std::to_string(mNumber) + " is " + text(picture.Width(), picture.Height()) +
+                      ", those before are " + text(mWidth, mHeight) +
+                      "; one file of frames has one size, numbered pictures (out_%04d.png) take any");
+    }
+    ++mNumber;
+  }
+
   OutputFile mFile;
+
+ private:
+  int64_t mNumber;
+  int mWidth = 0, mHeight = 0;
+};
+
+class RawSink : public StreamSink {
+ public:
+  using StreamSink::StreamSink;
+  VX_PixelFormat StorageFormat(VX_PixelFormat format, int) const override { return format; }
+  std::vector<uint8_t> Encode(const Picture& picture) const override { return RawBytes(picture); }
+  void Append(const Picture& picture, const std::vector<uint8_t>& encoded) override {
+    CheckSize(picture);
+    mFile.Write(encoded.data(), encoded.size());
+  }
 };
 
 // How Y4M names a coding, and the frame layout of its planes.
@@ -45,9 +75,10 @@ Y4mCoding Y4mCodingOf(VX_PixelFormat format) {
   return {"444", AV_PIX_FMT_YUV444P};
 }
 
-class Y4mSink : public FrameSink {
+class Y4mSink : public StreamSink {
  public:
-  Y4mSink(const std::string& path, std::pair<int, int> frameRate) : mFile(path), mFrameRate(frameRate) {}
+  Y4mSink(const std::string& path, std::pair<int, int> frameRate, int64_t firstNumber)
+      : StreamSink(path, firstNumber), mFrameRate(frameRate) {}
 
   // Y4M has no straight or premultiplied alpha beyond 8 bits, and does not name its matrix: RGB takes the one that
   // readers assume.
@@ -82,12 +113,11 @@ class Y4mSink : public FrameSink {
   }
 
   void Append(const Picture& picture, const std::vector<uint8_t>& encoded) override {
+    CheckSize(picture);
     if (!mHeaderWritten) WriteHeader(picture);
     mFile.Write("FRAME\n", 6);
     mFile.Write(encoded.data(), encoded.size());
   }
-  bool TakesManyFrames() const override { return true; }
-  void Close() override { mFile.Close(); }
 
  private:
   void WriteHeader(const Picture& picture) {
@@ -105,16 +135,16 @@ class Y4mSink : public FrameSink {
     mHeaderWritten = true;
   }
 
-  OutputFile mFile;
   std::pair<int, int> mFrameRate;
   bool mHeaderWritten = false;
 };
 
 }  // namespace
 
-std::unique_ptr<FrameSink> OpenStreamSink(const std::string& path, Container container, std::pair<int, int> frameRate) {
-  if (container == Container::Raw) return std::make_unique<RawSink>(path);
-  return std::make_unique<Y4mSink>(path, frameRate);
+std::unique_ptr<FrameSink> OpenStreamSink(const std::string& path, Container container, std::pair<int, int> frameRate,
+                                          int64_t firstNumber) {
+  if (container == Container::Raw) return std::make_unique<RawSink>(path, firstNumber);
+  return std::make_unique<Y4mSink>(path, frameRate, firstNumber);
 }
 
 }  // namespace tool
