@@ -43,6 +43,17 @@ const char* Colorimetry(VX_PixelFormat format) {
 const char* Range(VX_PixelFormat format) { return IsYuv(format) && !IsFullRangeYuv(format) ? "video" : "full"; }
 const char* Origin(VX_PixelFormat format) { return VX_IsOriginTopLeft(format) ? "top" : "bottom"; }
 
+// Whether the library converts from and to a format; others are for buffers, planes and fills.
+const char* Converts(VX_PixelFormat format) {
+  constexpr VX_PixelFormat kPartners[] = {VX_PixelFormat::BGRA_4444_32f, VX_PixelFormat::BGRA_4444_8u};
+  const VX_PixelFormat partner = kPartners[format == kPartners[0]];
+  VX_PixelFormat chain[9];
+  int32_t count = 0;
+  const bool from = VX_ExplainConversion(format, partner, 3, chain, &count) == VX_Success;
+  const bool to = VX_ExplainConversion(partner, format, 3, chain, &count) == VX_Success;
+  return from ? (to ? "from and to" : "from") : to ? "to" : "no";
+}
+
 std::string Hex(VX_PixelFormat format) {
   char text[16];
   std::snprintf(text, sizeof text, "0x%08X", static_cast<unsigned>(Bits(format)));
@@ -51,28 +62,30 @@ std::string Hex(VX_PixelFormat format) {
 
 void PrintTable() {
   const auto row = [](auto name, auto value, auto depth, auto layout, auto alpha, auto colour, auto range, auto rows,
-                      auto origin) {
+                      auto origin, auto converts) {
     std::cout << std::left << std::setw(52) << name << std::setw(12) << value << std::setw(6) << depth << std::setw(9)
               << layout << std::setw(15) << alpha << std::setw(13) << colour << std::setw(7) << range << std::setw(29)
-              << rows << origin << '\n';
+              << rows << std::setw(11) << origin << converts << '\n';
   };
-  row("name", "value", "depth", "layout", "alpha", "colour", "range", "row rule", "first row");
+  row("name", "value", "depth", "layout", "alpha", "colour", "range", "row rule", "first row", "converts");
   for (const CatalogueEntry& entry : Catalogue())
     row(entry.name, Hex(entry.format), Depth(entry.format), Layout(entry.format), Alpha(entry.format),
-        Colorimetry(entry.format), Range(entry.format), RowRule(entry.format), Origin(entry.format));
+        Colorimetry(entry.format), Range(entry.format), RowRule(entry.format), Origin(entry.format),
+        Converts(entry.format));
 }
 
 void PrintMarkdown() {
   std::cout
       << "# Pixel formats\n\nWritten by `vexel formats --markdown`. The value's bits are explained in "
          "[pixel_formats.h](../include/vexel/pixel_formats.h). *First row* is the picture row that is stored first; "
-         "*row rule* is what `VX_AllocatePixelBuffer` gives.\n\n"
-         "| name | value | depth | layout | alpha | colour | range | row rule | first row |\n"
-         "|---|---|---|---|---|---|---|---|---|\n";
+         "*row rule* is what `VX_AllocatePixelBuffer` gives; *converts* says which ways `VX_Convert` goes.\n\n"
+         "| name | value | depth | layout | alpha | colour | range | row rule | first row | converts |\n"
+         "|---|---|---|---|---|---|---|---|---|---|\n";
   for (const CatalogueEntry& entry : Catalogue()) {
     const VX_PixelFormat f = entry.format;
     std::cout << "| `" << entry.name << "` | " << Hex(f) << " | " << Depth(f) << " | " << Layout(f) << " | " << Alpha(f)
-              << " | " << Colorimetry(f) << " | " << Range(f) << " | " << RowRule(f) << " | " << Origin(f) << " |\n";
+              << " | " << Colorimetry(f) << " | " << Range(f) << " | " << RowRule(f) << " | " << Origin(f) << " | "
+              << Converts(f) << " |\n";
   }
 }
 
@@ -89,7 +102,8 @@ void PrintJson() {
               << text("layout", Layout(entry.format)) << text("alpha", Alpha(entry.format))
               << text("colour", Colorimetry(entry.format)) << text("range", Range(entry.format))
               << text("rowRule", RowRule(entry.format)) << text("firstRow", Origin(entry.format))
-              << text("hostName", entry.hostName) << text("hostMapping", entry.mapping) << "}";
+              << text("converts", Converts(entry.format)) << text("hostName", entry.hostName)
+              << text("hostMapping", entry.mapping) << "}";
     separator = ",\n";
   }
   std::cout << "\n]\n";
@@ -98,7 +112,8 @@ void PrintJson() {
 }  // namespace
 
 void AddFormatsCommand(CLI::App& app) {
-  CLI::App* command = app.add_subcommand("formats", "List the pixel formats: bits, row rule, origin");
+  CLI::App* command =
+      app.add_subcommand("formats", "List the pixel formats: bits, row rule, origin, which ways they convert");
   const auto style = std::make_shared<std::string>();
   CLI::Option* json = command->add_flag_callback(
       "--json", [style] { *style = "json"; }, "As JSON");

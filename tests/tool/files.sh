@@ -65,7 +65,7 @@ grep -q 'library format YUV_420_MPEG4_FRAME_709' info || fail "info: $(cat info)
 # The catalogue, and its JSON: one entry per format, each known to convert by that name.
 [ "$("$vexel" formats | wc -l)" = 94 ] || fail "formats lists $("$vexel" formats | wc -l) lines"
 [ "$("$vexel" formats --json | grep -c '"name"')" = 93 ] || fail "formats --json"
-"$vexel" formats | grep -cE '^UYVY_422_8u_709 +0x00000A11 +8u +4:2:2 +none +BT.709 +video +2 B/px, rows to 16 +top$' | grep -q 1 ||
+"$vexel" formats | grep -cE '^UYVY_422_8u_709 +0x00000A11 +8u +4:2:2 +none +BT.709 +video +2 B/px, rows to 16 +top +from and to$' | grep -q 1 ||
   fail "formats: $("$vexel" formats | grep UYVY_422_8u_709)"
 "$vexel" formats --markdown >formats.md
 same formats.md "$media/../../docs/formats.md" "docs/formats.md (./vx docs writes it)"
