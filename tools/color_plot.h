@@ -5,7 +5,8 @@
 
 namespace tool {
 
-// Writes transfer.svg, primaries.svg and tone.svg into `directory`. Throws ToolError when they cannot be written.
+// Writes transfer.svg, primaries.svg and tone.svg into `directory`, which is made
+// where it is missing. Throws ToolError when they cannot be written.
 void PlotColorSpaces(const std::string& directory);
 
 }  // namespace tool

@@ -33,7 +33,7 @@ double Response(const Filter& filter, double frequency);
 double StepOvershoot(const Filter& filter);
 
 // Writes kernel_NAME_weights.svg and kernel_NAME_response.svg for each kernel, and kernels_response.svg of all, into
-// `directory`. Throws ToolError when they cannot be written.
+// `directory`, which is made where it is missing. Throws ToolError when they cannot be written.
 void PlotKernels(const std::string& directory);
 
 }  // namespace tool

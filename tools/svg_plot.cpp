@@ -3,7 +3,9 @@
 #include <cmath>
 #include <cstdarg>
 #include <cstdio>
+#include <filesystem>
 #include <sstream>
+#include <system_error>
 
 #include "output_file.h"
 
@@ -91,6 +93,8 @@ void SvgPlot::Write(const std::string& path) const {
       << Text("<text transform='translate(20 %d) rotate(-90)' text-anchor='middle'>", (kTop + bottom) / 2) << mY.label
       << "</text>\n"
       << mBody << mLegend << "</svg>\n";
+  std::error_code ignored;  // shows when the file is written
+  std::filesystem::create_directories(std::filesystem::path(path).parent_path(), ignored);
   OutputFile file(path);
   const std::string text = out.str();
   file.Write(text.data(), text.size());

@@ -63,7 +63,7 @@ refuses 1 'no tone curve' color two.png x.png --from srgb --to srgb --tone 1,1.2
 refuses 2 'needs IN' color two.png x.png --from srgb
 refuses 1 'a JPEG holds 8 bits' color two.png x.jpg --from srgb --to PQ
 refuses 1 '--size belongs to raw frames' color two.png x.png --from srgb --to pq --size 2x1
-refuses 1 'cannot write .*: No such file or directory' color --plot nowhere
+refuses 1 'cannot write .*: Not a directory' color --plot transfer.svg
 refuses 1 'size' color p010.raw x.png --raw-format BGRA_4444_8u --size 2 --from srgb --to pq
 [ ! -e x.png ] && [ ! -e x.jpg ] || fail "a refused command wrote a file"
 exit $failed
