@@ -99,18 +99,20 @@ class ColorConversion {
     const int threads = mCommand.run.ThreadCount();
     const ConvertOptions options{3, threads};
     int64_t done = 0;
+    std::string format;
     while (const Picture frame = source->Next()) {
       const Picture signal = Convert(frame, options);
       const VX_PixelFormat storage = sink->StorageFormat(FileFormat(frame), frame.Height());
       const Picture stored = ConvertPicture(signal, storage, options);
       sink->Append(stored, sink->Encode(stored));
+      format = FormatName(FileFormat(frame));
       ++done;
       if (!sink->TakesManyFrames()) break;
     }
     if (done == 0) throw ToolError("cannot read " + SourceName(mCommand.in) + ": it holds no frame");
     sink->Close();
-    std::cerr << SinkName(mCommand.out) << ": " << done << (done == 1 ? " frame, " : " frames, ") << mFrom.name
-              << " to " << mTo.name << '\n';
+    std::cerr << SinkName(mCommand.out) << ": " << done << (done == 1 ? " frame, " : " frames, ") << format << ", "
+              << mFrom.name << " to " << mTo.name << '\n';
   }
 
  private:
@@ -158,7 +160,7 @@ void RunColor(const ColorCommand& command) {
     return;
   }
   if (command.in.empty() || command.out.empty() || command.from.empty() || command.to.empty())
-    throw CLI::RequiredError("vexel color needs IN, OUT, --from and --to (or --plot)", CLI::ExitCodes::RequiredError);
+    throw CLI::RequiredError("color needs IN, OUT, --from and --to (or --plot)", CLI::ExitCodes::RequiredError);
   ColorConversion(command).Run();
 }
 
@@ -168,7 +170,9 @@ void AddColorCommand(CLI::App& app) {
   CLI::App* command = app.add_subcommand("color", "Convert a picture or video to another colour space");
   const auto options = std::make_shared<ColorCommand>();
   command->add_option("in", options->in, "Picture, video or sequence (in_%04d.png); - is standard input");
-  command->add_option("out", options->out, "Picture, sequence (out_%04d.png) or .y4m; a picture takes the first frame");
+  command->add_option(
+      "out", options->out,
+      "Picture, which takes the first frame, sequence (out_%04d.png), .y4m or .raw; - is standard output (raw)");
   command->add_option("--from", options->from, "Colour space of IN: " + ColorSpaceNames());
   command->add_option("--to", options->to, "Colour space of OUT");
   command->add_flag("--compress-gamut", options->compressGamut, "Bring colours outside the gamut of OUT inside");

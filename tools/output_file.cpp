@@ -1,5 +1,7 @@
 #include "output_file.h"
 
+#include <unistd.h>
+
 #include <cerrno>
 #include <csignal>
 #include <cstring>
@@ -68,6 +70,7 @@ OutputFile::~OutputFile() {
 
 void OutputFile::Open() {
   if (mPath == "-") {
+    if (isatty(STDOUT_FILENO)) Fail("it is a terminal, which shows no frames; redirect it");
     mFile = stdout;
     return;
   }

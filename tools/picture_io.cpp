@@ -1,5 +1,8 @@
 #include "picture_io.h"
 
+#include <iostream>
+
+#include "format_catalogue.h"
 #include "tool_error.h"
 
 namespace tool {
@@ -20,6 +23,8 @@ void SavePicture(const Picture& picture, const std::string& path, const ConvertO
   else
     save(ConvertPicture(picture, format, convert));
   sink->Close();
+  std::cerr << SinkName(path) << ": " << picture.Width() << "x" << picture.Height() << ", "
+            << FormatName(picture.Format()) << '\n';
 }
 
 }  // namespace tool

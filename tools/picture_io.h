@@ -13,7 +13,7 @@ namespace tool {
 // The first picture of a file (or standard input, "-"), in the library format that its file format maps to.
 Picture LoadPicture(const std::string& path, const SourceOptions& options = {});
 
-// Writes one picture, converted to what the file holds, as its extension says.
+// Writes one picture, converted to what the file holds, as its extension says, and says so on standard error.
 void SavePicture(const Picture& picture, const std::string& path, const ConvertOptions& convert = {},
                  const SinkOptions& options = {});
 
