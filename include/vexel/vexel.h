@@ -140,8 +140,8 @@ VX_API VX_Result VX_FreeTransientPixelBuffer(VX_PixelFormat format, void* rawBlo
 
 /* Copies bytes between areas that do not overlap; from half the cache size on past the cache. Always VX_Success. */
 VX_API VX_Result VX_CopyMemory(void* dst, const void* src, size_t bytes) VX_NOEXCEPT;
-/* Turns a raster upside down. Row padding stays; a height below 2, a width below 1, DV and 4:2:0 do nothing.
- * VX_ErrOutOfMemory only if the scratch row of a very wide raster cannot be had. */
+/* Turns a raster upside down. Row padding stays; a height below 2 or a width below 1 does nothing. Rows of DV and 4:2:0
+ * formats count as packed 4:2:2 ones. VX_ErrOutOfMemory only if the scratch row of a very wide raster cannot be had. */
 VX_API VX_Result VX_FlipInPlace(void* base, int32_t rowBytes, int32_t width, int32_t height,
                                 VX_PixelFormat format) VX_NOEXCEPT;
 /* The address of pixel (x, y), y counting stored rows, of a 4:4:4:4 raster; nothing is clipped or checked.
