@@ -120,9 +120,9 @@ bool PlanEncode(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) n
   return *input = src, true;
 }
 
-// Only 4:2:0 has an encoder; DV goes through a module that is not there.
+// Only planar 4:2:0 has an encoder; DV goes through a module that is not there.
 bool HasEncoder(VX_PixelFormat src, VX_PixelFormat dst, VX_PixelFormat* input) noexcept {
-  return PlanEncode(src, dst, input) && Is420(dst);
+  return CanEncode420(dst) && PlanEncode(src, dst, input);
 }
 
 // What the encoder takes is reached at the render quality; what it makes of that itself, at its own.
@@ -131,12 +131,13 @@ int32_t EncodeQuality(VX_PixelFormat src, VX_PixelFormat input, int32_t renderQu
 }
 
 // The block of a planar picture above 8 bits has no defined size, so only its planes can be decoded.
-bool CanDecodeBlock(VX_PixelFormat format) noexcept { return !HasWideSamples(format) || IsBiplanar(format); }
+bool CanDecodeBlock(VX_PixelFormat format) noexcept {
+  return CanDecode420(format) && (!HasWideSamples(format) || IsBiplanar(format));
+}
 
 // From one 4:2:0 format to another, or to itself.
 VX_Result RecodePicture(const ConstBuffer& src, VX_PixelFormat decoded, VX_PixelFormat input, const Buffer& dst,
                         int32_t width, int32_t height, int32_t renderQuality) noexcept {
-  if (!CanDecodeBlock(src.format)) return VX_ErrUnsupportedFormat;
   return Recode420(src.base, src.format, decoded, renderQuality, dst.base, dst.format, width, height,
                    EncodeQuality(decoded, input, renderQuality));
 }
@@ -184,12 +185,26 @@ VX_Result ConvertFrom420(const ConstBuffer& src, const Buffer& dst, int32_t widt
 
 VX_Result ConvertFromSpecial(const ConstBuffer& src, const Buffer& dst, int32_t width, int32_t height,
                              int32_t renderQuality) noexcept {
-  if (Is420(src.format) && !CanDecodeBlock(src.format)) return VX_ErrUnsupportedFormat;
-  if (Is420(src.format)) return ConvertFrom420(src, dst, width, height, renderQuality);
+  if (CanDecodeBlock(src.format)) return ConvertFrom420(src, dst, width, height, renderQuality);
   const DecodeTarget target = PlanDvDecode(src.format, width, height, renderQuality);
   if (!target.known) return VX_ErrUnsupportedFormat;
   if (target.width != width || target.height != height) return VX_ErrUnsupportedConversion;
   return VX_ErrUnsupportedFormat;  // no DV decoder is there
+}
+
+// The rasters that a way begins and ends with: the ends themselves, or what a picture is decoded to and encoded from.
+VX_Result FindRasters(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality, VX_PixelFormat* from,
+                      VX_PixelFormat* to) noexcept {
+  *from = src;
+  *to = dst;
+  if (src != dst && IsSpecial(src)) {
+    if (!CanDecodeBlock(src)) return VX_ErrUnsupportedFormat;
+    *from = PlanDecode420(src, 2, 2, dst, 2, 2, renderQuality).format;  // the same for every size
+  }
+  if (!IsSpecial(dst)) return VX_Success;
+  if (!HasEncoder(*from, dst, to)) return VX_ErrFormatNotHandled;
+  if (IsSpecial(*from)) *from = *to;
+  return VX_Success;
 }
 
 }  // namespace
@@ -208,24 +223,17 @@ VX_Result VX_Convert(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFor
 
 VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat dstFormat, int32_t renderQuality,
                                VX_PixelFormat formats[9], int32_t* count) noexcept {
-  VX_PixelFormat from = srcFormat, to = dstFormat;
-  if (srcFormat == dstFormat && IsSpecial(dstFormat) && !PlanEncode(from, dstFormat, &to))
-    return VX_ErrFormatNotHandled;
-  if (IsSpecial(srcFormat)) {
-    if (!Is420(srcFormat)) return VX_ErrUnsupportedFormat;
-    from = PlanDecode420(srcFormat, 2, 2, dstFormat, 2, 2, renderQuality).format;  // the same for every size
-  }
-  if (IsSpecial(dstFormat) && (!Is420(dstFormat) || !PlanEncode(from, dstFormat, &to))) return VX_ErrFormatNotHandled;
+  VX_PixelFormat from, to;
+  if (const VX_Result result = FindRasters(srcFormat, dstFormat, renderQuality, &from, &to)) return result;
+  Plan plan;
+  if (const VX_Result result = MakePlan(from, to, renderQuality, &plan)) return result;
 
   VX_PixelFormat chain[kMaxSteps + 3];
   int32_t length = 0;
   chain[length++] = srcFormat;
   if (from != srcFormat) chain[length++] = from;
-  if (from != to || (srcFormat == dstFormat && !IsSpecial(srcFormat))) {
-    Plan plan;
-    if (const VX_Result result = MakePlan(from, to, renderQuality, &plan)) return result;
+  if (from != to || (from == srcFormat && to == dstFormat))
     for (int i = 0; i < plan.stepCount; ++i) chain[length++] = plan.steps[i].to;
-  }
   if (to != dstFormat) chain[length++] = dstFormat;
   if (length > 9) return VX_ErrFailed;
   std::copy_n(chain, length, formats);

@@ -20,8 +20,7 @@ bool IsReduction(int64_t srcWidth, int64_t srcHeight, int64_t dstWidth, int64_t 
 // The kernels' factors from a 4:2:0 format to an 8-bit raster format.
 decode420::Matrix MakeMatrix420(VX_PixelFormat src, VX_PixelFormat dst) noexcept;
 
-// Whether pictures of a format can be decoded, and the line of trace that belongs to every decode at full size.
-bool CanDecode420(VX_PixelFormat format) noexcept;
+// The line of trace that belongs to every decode at full size.
 void TraceFullSize420(const Picture420& src) noexcept;
 
 // Makes the rows of a decoded picture one at a time, top line first: the caller may hand each one on and needs no whole

@@ -17,11 +17,6 @@ using namespace encode420;
 
 namespace {
 
-bool CanEncode(VX_PixelFormat format) noexcept {
-  if (!Is420(format) || IsBiplanar(format) || Depth(format) != kDepth8u) return false;
-  return Colorimetry(format) == kColorimetry709 || (Colorimetry(format) == 0 && !IsVideoRange(format));
-}
-
 // What the kernels take.
 VX_PixelFormat WorkingFormat(VX_PixelFormat dst) noexcept {
   return IsVideoRange(dst) ? VX_PixelFormat::VUYX_4444_8u_709 : VX_PixelFormat::BGRX_4444_8u;
@@ -231,9 +226,14 @@ VX_Result Encoder::Run(Lines& lines) const noexcept {
 
 }  // namespace
 
+bool CanEncode420(VX_PixelFormat format) noexcept {
+  if (!Is420(format) || IsBiplanar(format) || Depth(format) != kDepth8u) return false;
+  return Colorimetry(format) == kColorimetry709 || (Colorimetry(format) == 0 && !IsVideoRange(format));
+}
+
 VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, VX_PixelFormat dstFormat,
                     int32_t width, int32_t height, int32_t quality) noexcept {
-  if (IsSpecial(srcFormat) || !CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
+  if (IsSpecial(srcFormat) || !CanEncode420(dstFormat)) return VX_ErrFormatNotHandled;
   const FpModeGuard fpMode;
   Lines lines(width);
   const Input input = InputOf(srcFormat, WorkingFormat(dstFormat), quality);
@@ -252,7 +252,7 @@ VX_Result Encode420(const void* src, int32_t srcRowBytes, VX_PixelFormat srcForm
 VX_Result Recode420(const void* src, VX_PixelFormat srcFormat, VX_PixelFormat decoded, int32_t decodeQuality, void* dst,
                     VX_PixelFormat dstFormat, int32_t width, int32_t height, int32_t quality) noexcept {
   if (!CanDecode420(srcFormat)) return VX_ErrUnsupportedFormat;
-  if (!CanEncode(dstFormat)) return VX_ErrFormatNotHandled;
+  if (!CanEncode420(dstFormat)) return VX_ErrFormatNotHandled;
   const FpModeGuard fpMode;
   const Picture420 picture = PictureFromBlock(src, srcFormat, width, height);
   Lines lines(width);

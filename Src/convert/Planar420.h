@@ -53,6 +53,9 @@ struct DecodePlan {
 DecodePlan PlanDecode420(VX_PixelFormat srcFormat, int32_t srcWidth, int32_t srcHeight, VX_PixelFormat dstFormat,
                          int32_t dstWidth, int32_t dstHeight, int32_t quality) noexcept;
 
+// Whether there is a decoder: 4:2:0 of 8 or 10 bits.
+bool CanDecode420(VX_PixelFormat format) noexcept;
+
 // Decodes a block into a raster of the same size, bottom line first where the format is stored so. The destination may
 // have any raster format. Codes as VX::DecompressYUV_420_8u.
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t width, int32_t height, void* dst,
@@ -68,6 +71,9 @@ VX_Result Decode420Through(VX_PixelFormat decoded, const void* src, VX_PixelForm
 VX_Result Decode420(const void* src, VX_PixelFormat srcFormat, int32_t srcWidth, int32_t srcHeight, void* dst,
                     int32_t dstRowBytes, int32_t dstWidth, int32_t dstHeight, VX_PixelFormat dstFormat, int32_t field,
                     int32_t quality) noexcept;
+
+// Whether there is an encoder: planar, 8 bits, full range or BT.709.
+bool CanEncode420(VX_PixelFormat format) noexcept;
 
 // Encodes a raster into a block. Planar full range takes BGRX_4444_8u (or another 8-bit BGR of four channels) and
 // planar video range BT.709 any raster; VX_ErrFormatNotHandled for every other pair. Chroma is filtered at its siting:

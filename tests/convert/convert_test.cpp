@@ -102,6 +102,21 @@ TEST(Planner, ExplainsSpecialEnds) {
   EXPECT_EQ(VX_ExplainConversion(F::BGRA_4444_8u, F::YUV_420_MPEG4_FRAME, 2, formats, &count), VX_ErrFormatNotHandled);
 }
 
+// Every special value, named or not, at either end of a way.
+TEST(Planner, ExplainsWhatConvertDoes) {
+  F formats[9];
+  int32_t count = 0;
+  for (uint32_t kind = 1; kind < 17; ++kind)
+    for (uint32_t bits = 0; bits < 0x2000; ++bits) {
+      const F special = FromBits(kind << 24 | bits);
+      for (const F other : {F::BGRX_4444_8u, F::Invalid, F::YUV_420_MPEG2_FRAME_709, FromBits(0x12345), special})
+        for (const auto& [src, dst] : {std::pair{special, other}, {other, special}})
+          ASSERT_EQ(VX_ExplainConversion(src, dst, 2, formats, &count),
+                    VX_Convert(nullptr, 0, src, nullptr, 0, dst, 0, 1, 2))
+              << std::hex << Bits(src) << " to " << Bits(dst);
+    }
+}
+
 TEST(Planner, RefusesSpecialAndUnknownFormats) {
   Plan plan;
   EXPECT_EQ(MakePlan(F::PALDV25, F::BGRA_4444_8u, 2, &plan), VX_ErrUnsupportedFormat);
@@ -155,6 +170,11 @@ TEST(Convert, RefusalsComeInOrderAndTouchNothing) {
       {F::BGRX_4444_8u, F::YUV_420_MPEG2_FRAME_FullRange, INT_MAX, 1, VX_ErrArgumentOutOfRange},
       {FromBits(0x12345), F::YUV_420_MPEG2_FRAME_709, 16, 16, VX_ErrFailed},
       {FromBits(0x0A000871), F::BGRA_4444_8u, 200, 64, VX_ErrUnsupportedFormat},
+      // No decoder and no encoder for such depths and colorimetries, whatever the size.
+      {FromBits(0x0D000CF9), F::BGRA_4444_8u, 16, 0, VX_ErrUnsupportedFormat},
+      {F::BGRX_4444_8u, FromBits(0x0A000071), 16, 0, VX_ErrFormatNotHandled},
+      {F::BGRX_4444_8u, FromBits(0x0A000431), -1, 1, VX_ErrFormatNotHandled},
+      {F::YUV_420_MPEG2_FRAME_709, FromBits(0x0A000631), 16, 0, VX_ErrFormatNotHandled},
       {FromBits(0x801), F::VUYA_4444_8u, 3, 1, VX_ErrFailed},
       {F::Invalid, FromBits(0xA01), 3, 1, VX_ErrFailed},
       // Destinations without an encoder.
