@@ -7,6 +7,7 @@
 #include "convert/RgbKernels.h"
 #include "convert/YuvKernels.h"
 #include "formats/FormatBits.h"
+#include "frame/Features.h"
 #include "frame/KernelVariant.h"
 
 namespace vexel {
@@ -64,12 +65,15 @@ const Graph& TheGraph() noexcept {
 struct FixedChain {
   int length;
   F formats[kMaxSteps + 1];
+  bool onlyWithoutSse2 = false;
 };
 constexpr FixedChain kFixedChains[] = {
     {8,
      {F::XRGB_4444_8u, F::PRGB_4444_8u, F::BGRP_4444_8u, F::BGRP_4444_32f, F::BGRA_4444_32f, F::BGRA_4444_32f_Linear,
       F::ARGB_4444_32f_Linear, F::PRGB_4444_32f_Linear}},
     {4, {F::VUYA_4444_8u, F::VUYA_4444_32f, F::VUYP_4444_32f, F::VUYX_4444_32f}},
+    {3, {F::VUYX_4444_8u, F::VUYA_4444_8u, F::BGRA_4444_8u}, true},
+    {3, {F::VUYX_4444_8u_709, F::VUYA_4444_8u_709, F::BGRA_4444_8u}, true},
 };
 
 constexpr int BitsOfDepth(F format) noexcept {
@@ -139,19 +143,15 @@ uint64_t Pack(const int* nodes, int steps) noexcept {
   return packed;
 }
 
-uint64_t FixedChainFor(const Graph& graph, F src, F dst) noexcept {
+uint64_t FixedChainFor(const Graph& graph, F src, F dst, bool hasSse2) noexcept {
   for (const FixedChain& chain : kFixedChains) {
+    if (chain.onlyWithoutSse2 && hasSse2) continue;
     if (chain.formats[0] != src || chain.formats[chain.length - 1] != dst) continue;
     int nodes[kMaxSteps + 1];
     for (int i = 0; i < chain.length; ++i) nodes[i] = graph.Find(chain.formats[i]);
     return Pack(nodes, chain.length - 1);
   }
   return kUnknown;
-}
-
-// Without SIMD these two pairs go through VUYA.
-bool NeedsSimd(const Step& step) noexcept {
-  return (step.from == F::VUYX_4444_8u || step.from == F::VUYX_4444_8u_709) && step.to == F::BGRA_4444_8u;
 }
 
 // The nameless formats inside the walks from `Invalid`; nobody can hold a buffer of them.
@@ -165,8 +165,8 @@ bool InvalidReaches(F dst) noexcept {
 }
 
 // Cheapest walk of at most kMaxSteps steps, by relaxing all steps once per length.
-uint64_t FindChain(const Graph& graph, int src, int dst, bool hasSimd) noexcept {
-  if (const uint64_t fixed = FixedChainFor(graph, graph.formats[src], graph.formats[dst])) return fixed;
+uint64_t FindChain(const Graph& graph, int src, int dst, bool hasSse2) noexcept {
+  if (const uint64_t fixed = FixedChainFor(graph, graph.formats[src], graph.formats[dst], hasSse2)) return fixed;
   constexpr uint32_t kFar = UINT32_MAX;
   uint32_t price[kMaxSteps + 1][kMaxNodes];
   uint8_t previous[kMaxSteps + 1][kMaxNodes];
@@ -179,10 +179,8 @@ uint64_t FindChain(const Graph& graph, int src, int dst, bool hasSimd) noexcept 
     for (int from = 0; from < graph.nodeCount; ++from) {
       if (price[length - 1][from] >= best || from == dst) continue;
       for (int i = graph.firstStep[from]; i < graph.endStep[from]; ++i) {
-        const Step& step = AllSteps()[i];
-        if (!hasSimd && NeedsSimd(step)) continue;
         const int to = graph.toNode[i];
-        const uint32_t total = price[length - 1][from] + pricing.Of(step);
+        const uint32_t total = price[length - 1][from] + pricing.Of(AllSteps()[i]);
         if (total >= price[length][to]) continue;
         price[length][to] = total;
         previous[length][to] = static_cast<uint8_t>(from);
@@ -250,11 +248,11 @@ VX_Result MakePlan(VX_PixelFormat src, VX_PixelFormat dst, int32_t renderQuality
 
   // Every thread that finds a pair unknown computes the same value, so relaxed stores are enough.
   static std::atomic<uint64_t> chains[2][kMaxNodes * kMaxNodes];
-  const bool hasSimd = ActiveKernelVariant() != KernelVariant::Plain;
-  std::atomic<uint64_t>& slot = chains[hasSimd][from * kMaxNodes + to];
+  const bool hasSse2 = gSwitches.sse2 && ActiveKernelVariant() != KernelVariant::Plain;
+  std::atomic<uint64_t>& slot = chains[hasSse2][from * kMaxNodes + to];
   uint64_t chain = slot.load(std::memory_order_relaxed);
   if (chain == kUnknown) {
-    chain = FindChain(graph, from, to, hasSimd);
+    chain = FindChain(graph, from, to, hasSse2);
     slot.store(chain, std::memory_order_relaxed);
   }
   if (chain == kNoChain) return VX_ErrFailed;

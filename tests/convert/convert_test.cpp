@@ -117,6 +117,28 @@ TEST(Planner, ExplainsWhatConvertDoes) {
     }
 }
 
+// In plain code, too, all others are the same.
+TEST(Planner, TwoChainsDependOnTheSse2Switch) {
+  std::map<std::string, std::string> differ;
+  for (F src : RasterFormats())
+    for (F dst : RasterFormats()) {
+      std::string chains[2];
+      for (const int on : {1, 0}) {
+        VX_SetDebugFlag(3, on);
+        chains[on] = Chain(src, dst);
+      }
+      if (chains[0] != chains[1]) differ[chains[1]] = chains[0];
+    }
+  VX_SetDebugFlag(3, 1);
+  const bool isPlain = ActiveKernelVariant() == KernelVariant::Plain;
+  EXPECT_EQ(differ.size(), isPlain ? 0u : 2u) << ::testing::PrintToString(differ);
+  for (const std::string end : {"_4444_8u", "_4444_8u_709"}) {
+    const std::string x = "VUYX" + end, direct = x + " > BGRA_4444_8u";
+    const std::string without = isPlain ? Chain(VX_PixelFormatFromName(x.c_str()), F::BGRA_4444_8u) : differ[direct];
+    EXPECT_EQ(without, x + " > VUYA" + end + " > BGRA_4444_8u");
+  }
+}
+
 TEST(Planner, RefusesSpecialAndUnknownFormats) {
   Plan plan;
   EXPECT_EQ(MakePlan(F::PALDV25, F::BGRA_4444_8u, 2, &plan), VX_ErrUnsupportedFormat);
