@@ -50,6 +50,9 @@ class Rows420 {
   size_t ScratchBytes() const noexcept;
   void UseScratch(uint8_t* scratch) noexcept;
 
+  // Whether beginning a row costs nothing: pixels are made of the picture's own samples.
+  bool ReadsSource() const noexcept { return mLumaFromSource && mChromaFromSource; }
+
   // Makes the samples of a row ready, then any part of it: `count` pixels from an even `first` on. Past the cache,
   // which takes a dst on a line of it, if `stream` says so; StreamFence (frame/StreamCopy.h) is the caller's.
   void BeginRow(int32_t row) noexcept;

@@ -1,5 +1,6 @@
 // Encoding of rasters and of decoded pictures into planar 4:2:0 blocks.
 #include <algorithm>
+#include <cstring>
 
 #include "convert/Decode420.h"
 #include "convert/Encode420Kernels.h"
@@ -85,7 +86,10 @@ class Lines {
     return mDecoder.Prepare(src, format, src.width, src.height, 0, quality);
   }
   VX_Result Convert(VX_PixelFormat from, VX_PixelFormat to, int32_t quality) noexcept {
+    Plan plan;
     mConverts = from != to;
+    if (mConverts && mDecodes && MakePlan(from, to, quality, &plan) == VX_Success && plan.stepCount == 1)
+      mConverts = !mDecoder.TakeStep(plan.steps[0]);
     if (!mDecodes) mSrcRowBytes = UnpaddedRowBytes(from, mWidth);
     return mConverts ? mConverter.Prepare(from, to, quality, mWidth) : VX_Success;
   }
@@ -106,12 +110,22 @@ class Lines {
     return reinterpret_cast<uintptr_t>(mTop) + static_cast<uintptr_t>(line * mRowBytes);
   }
 
-  // Stays until another line takes the slot, 0 or 1.
-  const uint8_t* Get(int64_t line, int slot) noexcept;
+  // How many pixels Get makes at most: what passes through memory on the way stays in the first-level cache.
+  int32_t PartPixels() const noexcept { return IsInParts() ? std::min(mWidth, kMostPixels) : mWidth; }
+
+  // Part of a line, `count` pixels from a multiple of PartPixels on. The pixel before, if any, stands before it; the
+  // parts come in order. Stays until another part takes the slot, 0 or 1.
+  const uint8_t* Get(int64_t line, int slot, int32_t first, int32_t count) noexcept;
 
  private:
-  size_t SlotBytes() const noexcept { return Pad(4 * static_cast<size_t>(mWidth)); }
+  bool IsInParts() const noexcept {
+    return mDecodes && mDecoder.ReadsSource() && (!mConverts || mConverter.IsPointWise());
+  }
+  size_t SlotBytes() const noexcept { return kBefore + Pad(4 * static_cast<size_t>(PartPixels())); }
   int SlotCount() const noexcept { return mDecodes || mConverts ? mDecodes && mConverts ? 3 : 2 : 0; }
+
+  static constexpr size_t kBefore = 64;         // bytes before a slot, for a pixel
+  static constexpr int32_t kMostPixels = 1920;  // shorter parts would read samples before they have left for the cache
 
   int32_t mWidth;
   bool mDecodes = false, mConverts = false;
@@ -129,7 +143,7 @@ size_t Lines::ScratchBytes() const noexcept {
 }
 
 void Lines::UseScratch(uint8_t* scratch) noexcept {
-  for (int i = 0; i < SlotCount(); ++i, scratch += SlotBytes()) mSlots[i] = scratch;
+  for (int i = 0; i < SlotCount(); ++i, scratch += SlotBytes()) mSlots[i] = scratch + kBefore;
   if (mConverts) {
     mConverter.UseScratch(scratch);
     scratch += Pad(mConverter.ScratchBytes());
@@ -137,17 +151,25 @@ void Lines::UseScratch(uint8_t* scratch) noexcept {
   if (mDecodes) mDecoder.UseScratch(scratch);
 }
 
-const uint8_t* Lines::Get(int64_t line, int slot) noexcept {
+const uint8_t* Lines::Get(int64_t line, int slot, int32_t first, int32_t count) noexcept {
+  uint8_t* const made = mSlots[slot];
+  if (first != 0) std::memcpy(made - 4, made + 4 * (PartPixels() - 1), 4);
   const uint8_t* pixels = mTop + line * mRowBytes;
   if (mDecodes) {
-    uint8_t* const decoded = mSlots[mConverts ? 2 : slot];
+    uint8_t* const decoded = mConverts ? mSlots[2] : made;
     mDecoder.BeginRow(static_cast<int32_t>(line));
-    mDecoder.Pixels(0, mWidth, decoded);
+    mDecoder.Pixels(first, count, decoded);
     pixels = decoded;
   }
   if (!mConverts) return pixels;
-  mConverter.Convert(pixels, mSlots[slot]);
-  return mSlots[slot];
+  if (!IsInParts()) {
+    mConverter.Convert(pixels, made);
+    return made;
+  }
+  const auto bytes = 4 * static_cast<size_t>(count);  // of four channels on either side
+  for (size_t i = 0; i < bytes; i += 4 * kChainBlock)
+    mConverter.ConvertBlock(pixels + i, made + i, std::min(bytes - i, 4 * kChainBlock) / 4);
+  return made;
 }
 
 // The lines that make a chroma row. Each line belongs to one pair; a picture of an odd number of line pairs in fields
@@ -200,25 +222,29 @@ bool Encoder::GoesPastCache(const Lines& lines) const noexcept {
 
 VX_Result Encoder::Run(Lines& lines) const noexcept {
   const Factors& factors = Colorimetry(mFormat) == 0 ? kFactors601 : kFactors709;
-  const auto width = static_cast<size_t>(mWidth);
-  const auto chromaWidth = static_cast<size_t>(ChromaWidth(PictureFromBlock(mPlanes[0], mFormat, mWidth, mHeight)));
+  const int32_t chromaWidth = ChromaWidth(PictureFromBlock(mPlanes[0], mFormat, mWidth, mHeight));
   const int64_t chromaRows = mHeight / 2 + mHeight % 2, pairs = chromaRows + (IsFieldPicture(mFormat) ? 1 : 0);
-  const size_t noChromaBytes = Pad(chromaWidth + 1);
+  const size_t noChromaBytes = Pad(static_cast<size_t>(chromaWidth) + 1);
   VX_SCRATCH(scratch, noChromaBytes + lines.ScratchBytes());
   if (!scratch) return VX_ErrOutOfMemory;
   lines.UseScratch(scratch.get() + noChromaBytes);
   const bool stream = GoesPastCache(lines);
+  const int32_t part = lines.PartPixels();
   for (int64_t row = 0; row < pairs; ++row) {
     const Pair pair = PairOf(row), next = PairOf(row + 1);
     if (pair.a >= mHeight) continue;
     const int64_t lineB = pair.b < mHeight ? pair.b : pair.a;
-    const uint8_t* const a = lines.Get(pair.a, 0);
-    const uint8_t* const b = lineB == pair.a ? a : lines.Get(lineB, 1);
     const bool hasChroma = row < chromaRows;
-    pair.encode({a, b, PlaneRow(0, pair.a), PlaneRow(0, lineB), hasChroma ? PlaneRow(1, row) : scratch.get(),
-                 hasChroma ? PlaneRow(2, row) : scratch.get(), lines.Address(next.a), lines.Address(next.b), width,
-                 chromaWidth, stream},
-                factors);
+    const auto chroma = [&](int plane) { return hasChroma ? PlaneRow(plane, row) : scratch.get(); };
+    for (int32_t x = 0; x < mWidth; x += part) {
+      const int32_t count = std::min(part, mWidth - x), half = x / 2;
+      const uint8_t* const a = lines.Get(pair.a, 0, x, count);
+      const uint8_t* const b = lineB == pair.a ? a : lines.Get(lineB, 1, x, count);
+      pair.encode({a, b, PlaneRow(0, pair.a) + x, PlaneRow(0, lineB) + x, chroma(1) + half, chroma(2) + half,
+                   lines.Address(next.a), lines.Address(next.b), static_cast<size_t>(count),
+                   static_cast<size_t>(x + count < mWidth ? count / 2 : chromaWidth - half), stream, x != 0},
+                  factors);
+    }
   }
   if (stream) StreamFence();
   return VX_Success;

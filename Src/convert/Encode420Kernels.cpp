@@ -211,7 +211,7 @@ struct FromVuy {
 template <class W, class Op>
 class Encoder {
  public:
-  // The first pixel goes on to the left.
+  // From the pixels before, or the first ones, which go on to the left.
   HWY_INLINE Encoder(const Factors& factors, const uint8_t* a, const uint8_t* b) : mOp(factors) {
     uint32_t pixelA, pixelB;
     std::memcpy(&pixelA, a, 4);
@@ -270,7 +270,8 @@ HWY_INLINE void Fetch(uintptr_t address) {
 
 template <class W, class Op, bool kStream>
 HWY_INLINE void EncodeRows(const LinePair& lines, const Factors& factors) {
-  Encoder<W, Op> encoder(factors, lines.a, lines.b);
+  const size_t before = lines.continues ? 4 : 0;
+  Encoder<W, Op> encoder(factors, lines.a - before, lines.b - before);
   size_t x = 0;
   for (; x + kBlock <= lines.width; x += kBlock) {
     Fetch<4 * kBlock>(lines.nextA + 4 * x);
@@ -493,7 +494,7 @@ void EncodeRows(const LinePair& lines, const Factors& factors) {
     for (size_t k = 0; k < 3; ++k) {
       const auto across = [&](const uint8_t* line) {
         const auto at = [&](size_t column) { return Op::Channel(line + 4 * column, k); };
-        return at(left) + 2 * at(x) + at(right);
+        return (x == 0 && lines.continues ? Op::Channel(line - 4, k) : at(left)) + 2 * at(x) + at(right);
       };
       sums[k] = W::kA * across(lines.a) + W::kB * across(lines.b);
     }

@@ -25,6 +25,7 @@ struct LinePair {
   uintptr_t nextA, nextB;     // asked for, not read: lines that lie downward in memory are not fetched ahead
   size_t width, chromaWidth;  // chroma may lack the last sample of an odd width
   bool stream;                // past the cache; for planes' rows on lines of it
+  bool continues;             // of four-channel pixels: those before stand in memory before the lines
 };
 using EncodeLines = void (*)(const LinePair& lines, const Factors& factors);
 
