@@ -75,15 +75,23 @@ void FillPicture(const Picture& picture, const std::string& color) {
               result == VX_ErrFormatNotHandled ? "; there is no encoder for that" : "");
 }
 
+bool IsDv(VX_PixelFormat format) { return FrameKind(format) >= 1 && FrameKind(format) <= 8; }
+
+// As asked for; a DV frame is as large as its standard says, and only those of 25 Mbit/s have an encoder.
+std::pair<int, int> SizeOf(VX_PixelFormat format, const std::string& size) {
+  if (IsDv(format)) {
+    if (!size.empty()) throw ToolError(FormatName(format) + " has a size of its own; leave --size out");
+    return {720, format == VX_PixelFormat::PALDV25 ? 576 : 480};
+  }
+  if (size.empty()) throw ToolError("--size is required: " + FormatName(format) + " has no size of its own");
+  return ParseSize(size);
+}
+
 void RunFill(const FillCommand& command) {
   const VX_PixelFormat format = ParseFormat(command.format);
-  const uint32_t kind = FrameKind(format);
-  const bool isDv = kind >= 1 && kind <= 8;
-  if (command.size.empty() && !isDv)
-    throw ToolError("--size is required: " + FormatName(format) + " has no size of its own");
-  // A DV frame is as large as its standard says.
-  const auto [width, height] = command.size.empty() ? std::pair{720, 480} : ParseSize(command.size);
-  const Picture picture(format, width, height);
+  const bool isDv = IsDv(format);
+  const std::pair<int, int> size = SizeOf(format, command.size);
+  const Picture picture(format, size.first, size.second);
   FillPicture(picture, command.color);
   SinkOptions options;
   options.container = command.container.empty() ? ContainerByExtension(command.out) : ParseContainer(command.container);

@@ -27,9 +27,11 @@ holds g.raw 15 '56 34 12 78'
 # What a decoder makes of five frames.
 for format in NTSCDV25 PALDV25; do
   run fill one.dv --format $format --color black
+  mv log said
   cat one.dv one.dv one.dv one.dv one.dv >five.dv
   convert five.dv decoded.raw --format UYVY_422_8u
   [ $format = NTSCDV25 ] && lines=480 || lines=576
+  grep -q "^one.dv: 720x$lines, $format\$" said || fail "$format: $(cat said)"
   [ "$(stat -c %s one.dv)" = $((lines * 250)) ] || fail "$format: $(stat -c %s one.dv) bytes"
   holds decoded.raw $((5 * 360 * lines)) '80 10 80 10'
   "$vexel" info five.dv | grep -q "dvvideo, 720x$lines, .* 5 frames" || fail "$format: $("$vexel" info five.dv)"
@@ -50,6 +52,7 @@ convert first.png first.raw --format BGRX_4444_8u
 same same.raw first.raw "a picture mixed with itself"
 
 run fill small.png --format BGRX_4444_8u --size 7x4 --color black
+refuses 1 "PALDV25 has a size of its own" fill f.dv --format PALDV25 --size 720x576 --color black
 refuses 1 "a DV frame is a file of its own" fill f.png --format PALDV25 --color black
 refuses 1 'UYVY_422_8u has no alpha.*--color black' fill x.raw --format UYVY_422_8u --size 4x4 --color transparent-black
 refuses 1 '"red" is not a colour; write black' fill x.raw --format BGRA_4444_8u --size 4x4 --color red
