@@ -81,10 +81,10 @@ class VX_API CSMatrix {
 // The order of the virtual functions is part of the interface; there is no virtual destructor.
 class VX_API ColorSpace {
  public:
-  // CIE 1931 chromaticities: x, y of red, green and blue (six floats); x, y of white (two floats).
+  // CIE 1931 x, y of red, green and blue (six floats) and of white (two floats). They live as long as the object.
   virtual const float* Primaries() const = 0;
   virtual const float* WhitePoint() const = 0;
-  // Weights of R, G and B in luma (three floats), or null.
+  // Weights of R, G and B in luma (three floats, which live as long as the object), or null.
   virtual const float* LuminanceCoeffs() const = 0;
   // Linear light to the signal value and back, for one channel value.
   virtual float LinearToEOTF(float linear) const = 0;

@@ -80,10 +80,10 @@ typedef enum VX_Result
 
 /* Starts the library: detects processor features and the cache, reads the configuration keys "VX.disableAVX" and
  * "VX.disableAVX2" (true only if the text is exactly "true"; our own key "VX.disableAVX512" keeps AVX2 kernels but no
- * wider ones), creates the CPU-bound executor. Reference counted; call it and VX_Terminate from one thread. Always
- * VX_Success. Before it, all feature switches are off and plain kernels run. */
+ * wider ones), creates the CPU-bound executor, loads the host's DV module if there is one. Reference counted; call it
+ * and VX_Terminate from one thread. Always VX_Success. Before it, all switches are off and plain kernels run. */
 VX_API VX_Result VX_Initialize(void) VX_NOEXCEPT;
-/* Undoes one VX_Initialize; the last one releases the executor. Switches and debug flags keep their values. */
+/* Undoes one VX_Initialize, if there is one; the last releases executor and module, flags stay. Always VX_Success. */
 VX_API VX_Result VX_Terminate(void) VX_NOEXCEPT;
 
 /* The current value of the has-SSE4.1, has-AVX and has-AVX2 switches, after keys and debug flags. */
@@ -101,7 +101,7 @@ VX_API VX_Result VX_SetDebugFlag(uint32_t index, int32_t value) VX_NOEXCEPT;
 VX_API bool VX_IsOriginTopLeft(VX_PixelFormat format) VX_NOEXCEPT;
 VX_API bool VX_IsOriginBottomLeft(VX_PixelFormat format) VX_NOEXCEPT;
 
-/* "Low" for render quality 2, "High" for every other value. */
+/* "Low" for render quality 2, "High" for every other value. The text is constant, as all texts here are. */
 VX_API const char* VX_RenderQualityName(int32_t renderQuality) VX_NOEXCEPT;
 /* Bytes of the largest-level unified cache found at start-up; 0 if unknown. */
 VX_API uint32_t VX_GetCacheSize(void) VX_NOEXCEPT;
@@ -176,14 +176,14 @@ VX_API VX_Result VX_ExplainConversion(VX_PixelFormat srcFormat, VX_PixelFormat d
 
 /* Plane pointers and row bytes of a 4:2:0 picture held in one block: luma pitch = width (2 * width above 8 bits) to
  * 128, chroma pitch = width / 2 to 128 (the luma pitch above 8 bits), planes of height rounded up to 32 rows; biplanar
- * pictures have no height padding, chroma pitch = luma pitch and no third plane (null). Only computes. */
+ * pictures have no height padding, chroma pitch = luma pitch and no third plane (null). Computes only, never fails. */
 VX_API VX_Result VX_GetPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, int32_t height, void* planes[3],
                                      int32_t rowBytes[3]) VX_NOEXCEPT;
-/* The same for 8-bit biplanar pictures: both pitches are width to 128. The format is not used. */
+/* The same for 8-bit biplanar pictures: both pitches are width to 128. The format is not used. Never fails. */
 VX_API VX_Result VX_GetBiPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, int32_t height,
                                        void* planes[2], int32_t rowBytes[2]) VX_NOEXCEPT;
 /* Copies the planes of 8-bit 4:2:0 pictures: height rows of width bytes of luma, height / 2 rows of width / 2 bytes of
- * each chroma plane (width bytes of the interleaved one). */
+ * each chroma plane (width bytes of the interleaved one); unpadded rows as one piece, width * height / 4 (2) bytes. */
 VX_API VX_Result VX_CopyPlanar_8u(const void* const srcPlanes[3], const int32_t srcRowBytes[3],
                                   void* const dstPlanes[3], const int32_t dstRowBytes[3], int32_t width,
                                   int32_t height) VX_NOEXCEPT;
