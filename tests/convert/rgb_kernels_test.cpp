@@ -33,12 +33,21 @@ std::vector<float> NarrowingValues(int most) {
   return values;
 }
 
-// The scaling is a float product; what the processor cannot convert counts as the least int32.
+// The scaling is a float product, rounded as the processor does at the moment; what it cannot convert counts as the
+// least int32.
 int NarrowedFloat(float value, int most) {
   const double product = value * static_cast<float>(most);
   const double rounded = std::nearbyint(product);
   if (!(rounded >= -2147483648.0 && rounded <= 2147483647.0)) return 0;
   return static_cast<int>(std::clamp(rounded, 0.0, static_cast<double>(most)));
+}
+
+// Not inlined, so that all is computed in the mode of the call.
+[[gnu::noinline]] std::vector<int> NarrowedFloats(const std::vector<float>& values, int most) {
+  const FpModeGuard guard;
+  std::vector<int> codes;
+  for (const float value : values) codes.push_back(NarrowedFloat(value, most));
+  return codes;
 }
 
 TEST(DepthKernels, WideningToFloat) {
@@ -60,12 +69,17 @@ TEST(DepthKernels, IntegerDepths) {
 }
 
 TEST(DepthKernels, NarrowingFromFloat) {
-  const auto to8 = NarrowingValues(255);
-  const auto bytes = RunKernel<uint8_t>(kNarrow32fTo8u, to8, to8.size() / 4, to8.size());
-  for (size_t i = 0; i < to8.size(); ++i) ASSERT_EQ(bytes[i], NarrowedFloat(to8[i], 255)) << to8[i];
-  const auto to15 = NarrowingValues(32768);
-  const auto words = RunKernel<uint16_t>(kNarrow32fTo15u, to15, to15.size() / 4, to15.size());
-  for (size_t i = 0; i < to15.size(); ++i) ASSERT_EQ(words[i], NarrowedFloat(to15[i], 32768)) << to15[i];
+  const auto to8 = NarrowingValues(255), to15 = NarrowingValues(32768);
+  const unsigned callers = _mm_getcsr();
+  for (const unsigned mode : {0x0000u, 0x2000u, 0x4000u, 0x6000u}) {
+    _mm_setcsr((callers & ~0x6000u) | mode);
+    const auto bytes = RunKernel<uint8_t>(kNarrow32fTo8u, to8, to8.size() / 4, to8.size());
+    const auto words = RunKernel<uint16_t>(kNarrow32fTo15u, to15, to15.size() / 4, to15.size());
+    const auto expectedBytes = NarrowedFloats(to8, 255), expectedWords = NarrowedFloats(to15, 32768);
+    _mm_setcsr(callers);
+    for (size_t i = 0; i < to8.size(); ++i) ASSERT_EQ(bytes[i], expectedBytes[i]) << to8[i] << ", mode " << mode;
+    for (size_t i = 0; i < to15.size(); ++i) ASSERT_EQ(words[i], expectedWords[i]) << to15[i] << ", mode " << mode;
+  }
 }
 
 uint32_t Word(uint32_t red, uint32_t green, uint32_t blue) { return red << 2 | green << 12 | blue << 22; }
