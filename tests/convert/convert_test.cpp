@@ -1,4 +1,5 @@
 // Conversions of pictures: their plans, every pair of formats, every direct kernel in the armed arena.
+#include <map>
 
 #include "convert/Planar420.h"
 #include "convert/Planner.h"
