@@ -11,7 +11,8 @@ constexpr int64_t RoundUp(int64_t value, int64_t multiple) noexcept { return (va
 
 struct Layout420 {
   int64_t rowBytes[3];
-  int64_t offset[3];  // -1: no such plane
+  uint64_t offset[3];  // modulo 2^64: heights may be negative
+  int planes;
 };
 
 Layout420 LayoutOf(VX_PixelFormat format, int64_t width, int64_t height) noexcept {
@@ -19,8 +20,9 @@ Layout420 LayoutOf(VX_PixelFormat format, int64_t width, int64_t height) noexcep
   const int64_t luma = RoundUp(wide ? 2 * width : width, 128);
   const int64_t chroma = wide ? luma : RoundUp(width / 2, 128);
   const int64_t rows = biplanar ? height : RoundUp(height, 32);
-  const int64_t first = rows * luma;
-  return {{luma, biplanar ? luma : chroma, chroma}, {0, first, biplanar ? -1 : first + rows * chroma / 2}};
+  const uint64_t first = static_cast<uint64_t>(rows) * static_cast<uint64_t>(luma);
+  const uint64_t second = first + static_cast<uint64_t>(rows / 2 * chroma);
+  return {{luma, biplanar ? luma : chroma, chroma}, {0, first, second}, biplanar ? 2 : 3};
 }
 
 void CopyRows(const void* src, ptrdiff_t srcRowBytes, void* dst, ptrdiff_t dstRowBytes, int64_t rows,
@@ -42,7 +44,7 @@ void CopyPlane(const void* src, int32_t srcRowBytes, void* dst, int32_t dstRowBy
 }
 
 // As integers: callers ask for the offsets of a null block too.
-uint8_t* Plane(const void* base, int64_t offset) {
+uint8_t* Plane(const void* base, uint64_t offset) {
   return reinterpret_cast<uint8_t*>(reinterpret_cast<uintptr_t>(base) + static_cast<uintptr_t>(offset));
 }
 
@@ -52,7 +54,7 @@ Picture420 PictureFromBlock(const void* block, VX_PixelFormat format, int32_t wi
   const Layout420 layout = LayoutOf(format, width, height);
   Picture420 picture{{}, {}, width, height, format};
   for (int i = 0; i < 3; ++i) {
-    picture.planes[i] = layout.offset[i] < 0 ? nullptr : Plane(block, layout.offset[i]);
+    picture.planes[i] = i < layout.planes ? Plane(block, layout.offset[i]) : nullptr;
     picture.rowBytes[i] = layout.rowBytes[i];
   }
   return picture;
@@ -70,8 +72,7 @@ void CopyField420(const void* src, VX_PixelFormat format, int32_t width, int32_t
   const Layout420 from = LayoutOf(format, width, height), to = LayoutOf(format, width, height / 2);
   const int sampleBytes = HasWideSamples(format) ? 2 : 1;
   const int64_t samples = IsBiplanar(format) ? width / 2 * 2 : width / 2;
-  for (int i = 0; i < 3; ++i) {
-    if (from.offset[i] < 0) continue;
+  for (int i = 0; i < from.planes; ++i) {
     const auto* source = static_cast<const uint8_t*>(src) + from.offset[i];
     if (i == 0 && field == 2) source += from.rowBytes[0];
     CopyRows(source, 2 * from.rowBytes[i], static_cast<uint8_t*>(dst) + to.offset[i], to.rowBytes[i],
@@ -87,7 +88,7 @@ VX_Result VX_GetPlanarBuffers(void* base, VX_PixelFormat format, int32_t width, 
                               int32_t rowBytes[3]) noexcept {
   const Layout420 layout = LayoutOf(format, width, height);
   for (int i = 0; i < 3; ++i) {
-    planes[i] = layout.offset[i] < 0 ? nullptr : Plane(base, layout.offset[i]);
+    planes[i] = i < layout.planes ? Plane(base, layout.offset[i]) : nullptr;
     rowBytes[i] = static_cast<int32_t>(layout.rowBytes[i]);
   }
   return VX_Success;
@@ -97,7 +98,7 @@ VX_Result VX_GetBiPlanarBuffers(void* base, VX_PixelFormat, int32_t width, int32
                                 int32_t rowBytes[2]) noexcept {
   const int64_t pitch = RoundUp(width, 128);
   planes[0] = base;
-  planes[1] = Plane(base, height * pitch);
+  planes[1] = Plane(base, static_cast<uint64_t>(height * pitch));
   rowBytes[0] = rowBytes[1] = static_cast<int32_t>(pitch);
   return VX_Success;
 }

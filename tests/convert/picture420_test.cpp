@@ -31,6 +31,9 @@ TEST(Planar420, Layouts) {
       {biplanar, 129, 3, 256 * 3, -1, {256, 256, 128}},
       {biplanar10, 1920, 1080, 3840 * 1080, -1, {3840, 3840, 3840}},
       {biplanar10, 65, 3, 256 * 3, -1, {256, 256, 256}},
+      {F::YUV_420_MPEG2_FRAME, 16, -33, -128 * 32, -128 * 48, {128, 128, 128}},  // the formulas hold on
+      {biplanar, 16, -3, -128 * 3, -1, {128, 128, 128}},
+      {FromBits(0x0A000071), INT_MAX, 64, int64_t{1} << 38, (int64_t{1} << 38) + (int64_t{1} << 37), {0, 0, 0}},
   };
   std::vector<uint8_t> memory(16);
   for (const auto& c : cases) {
@@ -40,7 +43,7 @@ TEST(Planar420, Layouts) {
     const auto* base = memory.data();
     EXPECT_EQ(planes[0], base);
     EXPECT_EQ(planes[1], base + c.chroma);
-    EXPECT_EQ(planes[2], c.second < 0 ? nullptr : base + c.second) << c.width;
+    EXPECT_EQ(planes[2], c.second == -1 ? nullptr : base + c.second) << c.width;
     for (int i = 0; i < 3; ++i) EXPECT_EQ(rowBytes[i], c.rowBytes[i]) << c.width << " plane " << i;
     if (IsBiplanar(c.format) && Depth(c.format) == kDepth8u) {
       void* two[2];
