@@ -39,7 +39,7 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
   mVariant = variant;
   mIsCopy = src == dst;
   mStream = false;
-  mWholeRow = false;
+  mReach = 0;
   mOutlastsMemory = false;
   // What had no alpha gets an opaque one on its way. Numbers that come from floats are left to their steps, which may
   // flush or quiet them.
@@ -55,14 +55,14 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
       --mStepCount;
     }
     mSteps[mStepCount++] = (*kernel)[variant];
-    mWholeRow |= plan.steps[i].span == StepSpan::Row;
+    if (plan.steps[i].span == StepSpan::Row) mReach += kReach;
     mOutlastsMemory |= OutlastsMemory(kernel);
     before = kernel;
   }
   if (const RowKernelSet* fused = FusedKernelFor(src, dst)) {
     mSteps[0] = (*fused)[variant];
     mStepCount = 1;
-    mWholeRow = true;
+    mReach = kReach;
   }
   return VX_Success;
 }
@@ -89,12 +89,14 @@ void RowConverter::RunSteps(const uint8_t* src, uint8_t* dst, size_t count) cons
 }
 
 void RowConverter::StreamInBlocks(const uint8_t* src, uint8_t* dst) const noexcept {
-  for (size_t done = 0; done < mWidth; done += kStreamBlock) {
-    const size_t first = done - std::min(done, kReach), end = std::min(mWidth, done + kStreamBlock + kReach);
-    mSteps[0](src + first / kBlockMultiple * mSrcBytesPerSixPixels, mScratch, end - first);
-    const auto count = static_cast<int64_t>(std::min(kStreamBlock, mWidth - done));
+  const size_t block = StreamBlock();
+  uint8_t* const staging = Staging();
+  for (size_t done = 0; done < mWidth; done += block) {
+    const size_t first = done - std::min(done, mReach), end = std::min(mWidth, done + block + mReach);
+    RunSteps(src + first / kBlockMultiple * mSrcBytesPerSixPixels, staging, end - first);
+    const auto count = static_cast<int64_t>(std::min(block, mWidth - done));
     StreamCopy(dst + done / kBlockMultiple * mDstBytesPerSixPixels,
-               mScratch + (done - first) / kBlockMultiple * mDstBytesPerSixPixels,
+               staging + (done - first) / kBlockMultiple * mDstBytesPerSixPixels,
                static_cast<size_t>(UnpaddedRowBytes(mDstFormat, count)), mVariant);
   }
 }
@@ -112,7 +114,7 @@ void RowConverter::Convert(const void* srcRow, void* dstRow) const noexcept {
     return;
   }
   const size_t unit = UnitPixels();
-  uint8_t* const staging = mScratch + static_cast<size_t>(std::min(mStepCount - 1, 2)) * ScratchRowBytes();
+  uint8_t* const staging = Staging();
   for (size_t done = 0; done < mWidth; done += unit) {
     const size_t count = std::min(unit, mWidth - done);
     const uint8_t* from = src + done / kBlockMultiple * mSrcBytesPerSixPixels;

@@ -2,6 +2,7 @@
 // every operation converts rows.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 
@@ -15,9 +16,11 @@ namespace vexel {
 inline constexpr size_t kChainBlock = 384;
 static_assert(kChainBlock % kBlockMultiple == 0);
 
-// Pixels per block of a kernel that needs its neighbours, and how far it may look to either side.
-inline constexpr size_t kStreamBlock = 1920, kReach = 12;
-static_assert(kStreamBlock % kBlockMultiple == 0 && kReach % kBlockMultiple == 0);
+// Pixels per block of a kernel that needs its neighbours, and how far it may look to either side; and pixels per block
+// of a chain with such a kernel, which with that reach is a whole number of vectors.
+inline constexpr size_t kStreamBlock = 1920, kReach = 12, kStreamChainBlock = 408;
+static_assert(kStreamBlock % kBlockMultiple == 0 && kReach % kBlockMultiple == 0 &&
+              kStreamChainBlock % kBlockMultiple == 0);
 
 // Use: Prepare, then give it ScratchBytes() bytes with UseScratch (none needed when 0), then Convert any number of
 // rows. A prepared converter is read-only but for its scratch memory: copies with scratch of their own may run in
@@ -36,7 +39,7 @@ class RowConverter {
   void UseScratch(uint8_t* scratch) noexcept { mScratch = scratch; }
 
   // Whether every pixel stands for itself, so that ConvertBlock may be used.
-  bool IsPointWise() const noexcept { return !mWholeRow; }
+  bool IsPointWise() const noexcept { return mReach == 0; }
 
   // Converts one row. Source and destination must not overlap.
   void Convert(const void* srcRow, void* dstRow) const noexcept;
@@ -49,20 +52,25 @@ class RowConverter {
  private:
   // Runs the chain on `count` pixels; the last step writes to dst.
   void RunSteps(const uint8_t* src, uint8_t* dst, size_t count) const noexcept;
-  // A single kernel that needs its neighbours, in overlapping blocks that are staged in the first-level cache.
+  // Kernels that need their neighbours, in overlapping blocks that are staged in the first-level cache.
   void StreamInBlocks(const uint8_t* src, uint8_t* dst) const noexcept;
-  bool StreamsInBlocks() const noexcept { return mStream && mWholeRow && mStepCount == 1 && !mIsCopy; }
+  bool StreamsInBlocks() const noexcept { return mStream && mReach != 0; }
+  size_t StreamBlock() const noexcept { return mStepCount == 1 ? kStreamBlock : kStreamChainBlock; }
   size_t UnitPixels() const noexcept {
-    return StreamsInBlocks() ? kStreamBlock + 2 * kReach : mWholeRow ? mWidth : kChainBlock;
+    return StreamsInBlocks() ? StreamBlock() + 2 * mReach : mReach != 0 ? mWidth : kChainBlock;
+  }
+  uint8_t* Staging() const noexcept {
+    return mScratch + static_cast<size_t>(std::min(mStepCount - 1, 2)) * ScratchRowBytes();
   }
   size_t ScratchRowBytes() const noexcept;
 
   RowKernel mSteps[kMaxSteps] = {};
   int mStepCount = 0;
   size_t mWidth = 0;
+  size_t mReach = 0;  // how far the steps together may look to either side
   VX_PixelFormat mDstFormat{};
   uint32_t mSrcBytesPerSixPixels = 0, mDstBytesPerSixPixels = 0;
-  bool mWholeRow = false, mStream = false, mIsCopy = false, mOutlastsMemory = false;
+  bool mStream = false, mIsCopy = false, mOutlastsMemory = false;
   KernelVariant mVariant = KernelVariant::Plain;
   uint8_t* mScratch = nullptr;
 };
