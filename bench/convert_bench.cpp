@@ -165,6 +165,8 @@ void FloatCases(Size size) {
   Job linear = Convert("BGRA8 to BGRA32f_Linear", F::BGRA_4444_8u, F::BGRA_4444_32f_Linear, size);
   Job coded = Convert("BGRA32f_Linear to BGRA8", F::BGRA_4444_32f_Linear, F::BGRA_4444_8u, size);
   Convert("BGRA32f to BGRA32f_Linear", F::BGRA_4444_32f, F::BGRA_4444_32f_Linear, size);
+  Convert("V210 to BGRA32f", F::V210_422_10u, F::BGRA_4444_32f, size);
+  Convert("BGRA32f to V210", F::BGRA_4444_32f, F::V210_422_10u, size);
 #ifdef VEXEL_PEER_BABL
   babl_init();
   const auto babl = [&](Job& job, const char* from, const char* to) {
