@@ -215,7 +215,7 @@ void AddDemoCommand(CLI::App& app) {
   const auto options = std::make_shared<DemoOptions>();
   command->add_option("files", options->files, "Pictures or videos")->required();
   command->add_option("-o,--out", options->out, "The sheet (default vexel-demo.png)");
-  options->run.AddTo(*command);
+  options->run.AddTo(*command, "one, so that speeds compare");
   command->callback([options] {
     options->run.Apply();
     RunDemo(*options);

@@ -57,8 +57,9 @@ void ForceIsa(const Isa& isa) {
 
 }  // namespace
 
-void RunOptions::AddTo(CLI::App& command) {
-  command.add_option("--threads", threads, "Threads to use (default: one per processor)")->check(CLI::Range(1, 1024));
+void RunOptions::AddTo(CLI::App& command, const std::string& threadsUnlessSaid) {
+  command.add_option("--threads", threads, "Threads to use (default: " + threadsUnlessSaid + ")")
+      ->check(CLI::Range(1, 1024));
   command.add_option("--isa", isa, "Use no kernels beyond plain, ssse3, sse4.1, avx2 or avx512")
       ->check(CLI::IsMember({"plain", "ssse3", "sse4.1", "avx2", "avx512"}));
 }

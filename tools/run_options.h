@@ -11,7 +11,7 @@ struct RunOptions {
   int threads = 0;  // 0 = one per processor
   std::string isa;  // empty = the best the processor has
 
-  void AddTo(CLI::App& command);
+  void AddTo(CLI::App& command, const std::string& threadsUnlessSaid = "one per processor");
   // Limits the library's threads and kernels. Throws ToolError when the processor cannot run what was asked for.
   void Apply() const;
   int ThreadCount() const;
