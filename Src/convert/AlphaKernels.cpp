@@ -56,19 +56,24 @@ namespace vexel {
 namespace HWY_NAMESPACE {
 namespace {
 
-// Maps blocks of four vectors by op.Map(a, b), two at a time; a block of opaque pixels only is copied, which gives the
-// same bytes.
+template <const Layout& kLayout, class T>
+HWY_INLINE bool AllOpaque(Full<T> v0, Full<T> v1, Full<T> v2, Full<T> v3) {
+  const auto opaque = OpaqueVector<kLayout.alpha, T>();
+  // One after the other, so that compilers load in this order: prefetchers follow ascending addresses.
+  const auto all = hn::And(hn::And(hn::And(v0, v1), v2), v3);
+  return hn::AllTrue(hn::ScalableTag<T>(), hn::Eq(hn::And(all, opaque), opaque));
+}
+
+// Maps blocks of four vectors by op.MapOne; a block of opaque pixels only is copied, which gives the same bytes.
 template <class T, const Layout& kLayout, class Op>
 struct UnlessOpaque {
   HWY_INLINE void operator()(const uint8_t* in, uint8_t* out) const {
-    const hn::ScalableTag<T> d;
     auto v0 = Op::Load(in, 0), v1 = Op::Load(in, 1), v2 = Op::Load(in, 2), v3 = Op::Load(in, 3);
-    const auto opaque = OpaqueVector<kLayout.alpha, T>();
-    // One after the other, so that compilers load in this order: prefetchers follow ascending addresses.
-    const auto all = hn::And(hn::And(hn::And(v0, v1), v2), v3);
-    if (!hn::AllTrue(d, hn::Eq(hn::And(all, opaque), opaque))) {
-      Op::Map(v0, v1);
-      Op::Map(v2, v3);
+    if (!AllOpaque<kLayout, T>(v0, v1, v2, v3)) {
+      v0 = Op::MapOne(v0);
+      v1 = Op::MapOne(v1);
+      v2 = Op::MapOne(v2);
+      v3 = Op::MapOne(v3);
     }
     StoreVector(v0, out, 0);
     StoreVector(v1, out, 1);
@@ -77,15 +82,25 @@ struct UnlessOpaque {
   }
 };
 
-// An op with Map(a, b) of one with MapOne(a).
-template <class Op>
-struct Singly : Op {
-  template <class V>
-  static HWY_INLINE void Map(V& a, V& b) {
-    a = Op::MapOne(a);
-    b = Op::MapOne(b);
+// Maps blocks of four vectors by op.MapOne, with the next block's factors under way meanwhile: a division and what
+// follows it are a longer chain than processors overlap. Opaque blocks are copied.
+template <class T, class Op>
+HWY_INLINE void MapRowAhead(const uint8_t* HWY_RESTRICT src, uint8_t* HWY_RESTRICT dst, size_t count) {
+  constexpr size_t kPixel = 4 * sizeof(T), kBytes = 4 * HWY_MAX_BYTES, kBlock = kBytes / kPixel;
+  const size_t blocks = count / kBlock;
+  if (blocks > 0) {
+    typename Op::Factors now(src);
+    for (size_t i = 0; i < blocks; ++i, src += kBytes, dst += kBytes) {
+      FetchAhead<kBytes>(src);
+      const typename Op::Factors next(i + 1 < blocks ? src + kBytes : src);
+      Op::Map(src, now, dst);
+      now = next;
+    }
   }
-};
+  RowLoop<kBlock, kPixel, kPixel>(src, dst, count % kBlock, [](const uint8_t* in, uint8_t* out) HWY_ATTR {
+    Op::Map(in, typename Op::Factors(in), out);
+  });
+}
 
 // ---- 8u ----
 
@@ -178,10 +193,18 @@ struct Unpremultiply8 : Load8 {
 
 // ---- 15u ----
 
+// A constant that compilers keep in a register; in loops they would rather make it anew, by way of a general register.
+template <class T>
+HWY_INLINE Full<T> Constant(T value) {
+  auto v = hn::Set(hn::ScalableTag<T>(), value);
+  asm("" : "+v"(v.raw));
+  return v;
+}
+
 template <const Layout& kLayout>
 struct Alpha15 {
   static HWY_INLINE U16 Load(const uint8_t* in, size_t index) {
-    return hn::Min(LoadVector<uint16_t>(in, index), hn::Set(hn::ScalableTag<uint16_t>(), 32768));
+    return hn::Min(LoadVector<uint16_t>(in, index), Constant<uint16_t>(32768));
   }
   // Each pixel's alpha in all four channels.
   static HWY_INLINE U16 Spread(U16 v) {
@@ -206,57 +229,90 @@ struct Premultiply15 : Alpha15<kLayout> {
   }
 };
 
-// For each lane of the block-wise lower or upper halves of the first or second of two vectors of 16-bit pixels: the
-// pixel's index in the two.
-template <bool kSecond, bool kUpper>
-struct PixelIndices {
-  constexpr PixelIndices() {
-    for (size_t i = 0; i < kLanes<float>; ++i)
-      lanes[i] = static_cast<int32_t>((kSecond ? kLanes<float> / 2 : 0) + i / 4 * 2 + kUpper);
-  }
-  alignas(64) int32_t lanes[kLanes<float>] = {};
-};
-
-// 32768 c / a, c <= a (more saturates), from one division per pixel. The float result is off by less than 1/128, so the
-// rounded quotient comes out right or one too low; the remainder, of which 16 bits are enough, tells. No ties exist.
+// q = 32768 c / a, c <= a (more saturates), from one division for each pixel. A power of two p brings a to a p in
+// 32768..65535, and m = 2^31 / (a p) is 16 bits, rounded, 65536 as 65535. Then e = c p m >> 16 is q rounded or one
+// less. It is one less where (2 e + 1) a < 65536 c, that is where the high word of the product is c - 1 and not c: no
+// ties exist. Where c = a, e + 1 may be 32769. In the lane of alpha m is 0, which gives a.
 template <const Layout& kLayout>
 struct Unpremultiply15 : Alpha15<kLayout> {
-  template <bool kSecond, bool kUpper>
-  static HWY_INLINE I32 Estimate(U16 c16, F32 inverses) {
+  // In each block of 16 bytes: m of the block's two pixels of v0 and two of v1, then p of them.
+  static HWY_INLINE U16 PairFactors(U16 v0, U16 v1) {
     const hn::ScalableTag<float> df;
     const hn::ScalableTag<int32_t> di;
-    static constexpr PixelIndices<kSecond, kUpper> kIndices;
-    const auto inverse = hn::TableLookupLanes(inverses, hn::SetTableIndices(df, kIndices.lanes));
-    const auto quotient = hn::Mul(hn::ConvertTo(df, hn::BitCast(di, c16)), inverse);
-    return Truncate(hn::Add(quotient, hn::Set(df, 0.5f - 1.0f / 128)));
+    constexpr int32_t kExponent = 0x7F800000, kOf2To15 = (127 + 15) << 23, kOf1 = 127 << 23;
+    const auto a = hn::Max(hn::Min(hn::BitCast(di, AlphaOf(v0, v1)), Constant(32768)), Constant(1));
+    const auto alpha = hn::ConvertTo(df, a);
+    const auto exponent = hn::And(hn::BitCast(di, alpha), Constant(kExponent));
+    const auto p = hn::BitCast(df, hn::Sub(Constant(kOf2To15 + kOf1), exponent));
+    const auto m = hn::Div(Constant(0x1p31f), hn::Mul(alpha, p));
+    return PackBlocks(Truncate(hn::Add(m, Constant(0.5f))), Truncate(p));
   }
-  template <bool kSecond>
-  static HWY_INLINE U16 MapOne(U16 v, F32 inverses) {
+  static HWY_INLINE U32 AlphaOf(U16 v0, U16 v1) {
+    const hn::ScalableTag<uint32_t> d;
+    const auto a = hn::BitCast(d, v0), b = hn::BitCast(d, v1);
+    if constexpr (kLayout.alpha == 3) return hn::ShiftRight<16>(EachSecond<1>(a, b));
+    return hn::And(EachSecond<0>(a, b), hn::Set(d, 0xFFFF));
+  }
+  template <size_t kOfVector>
+  static HWY_INLINE U16 MapOne(U16 v, U16 factors) {
     const hn::ScalableTag<uint16_t> d;
-    const hn::ScalableTag<int16_t> di;
+    const auto spread = [&](const BlockBytes& bytes) HWY_ATTR {
+      const hn::ScalableTag<uint8_t> d8;
+      return hn::BitCast(d, hn::TableLookupBytesOr0(hn::BitCast(d8, factors), hn::LoadDup128(d8, bytes.indices)));
+    };
+    static constexpr BlockBytes kM(2 * kOfVector, kLayout.alpha), kP(2 * kOfVector + 4, 4);
     const auto a = Alpha15<kLayout>::Spread(v);
     const auto c = hn::Min(v, a);
-    const auto zero = hn::Zero(d);
-    const auto q = PackBlocks(Estimate<kSecond, false>(hn::InterleaveLower(d, c, zero), inverses),
-                              Estimate<kSecond, true>(hn::InterleaveUpper(d, c, zero), inverses));
-    const auto remainder = hn::BitCast(di, hn::Sub(hn::ShiftLeft<15>(c), hn::Mul(q, a)));
-    const auto tooLow = hn::VecFromMask(di, hn::Gt(remainder, hn::BitCast(di, hn::ShiftRight<1>(a))));
-    const auto isAlpha = hn::MaskFromVec(ChannelMask<kLayout.alpha, uint16_t>());
-    return hn::IfThenElse(isAlpha, v, hn::Sub(q, hn::BitCast(d, tooLow)));
+    const auto e = hn::MulHigh(hn::Mul(c, spread(kP)), spread(kM));
+    const auto high = hn::MulHigh(hn::Sub(e, hn::Not(e)), a);
+    return hn::Min(hn::Add(e, hn::Sub(c, high)), Constant<uint16_t>(32768));
   }
-  static HWY_INLINE U32 AlphaIn64(U16 v) {
-    const hn::ScalableTag<uint64_t> d;
-    const auto pixels = hn::BitCast(d, v);
-    return hn::BitCast(hn::ScalableTag<uint32_t>(),
-                       kLayout.alpha == 3 ? hn::ShiftRight<48>(pixels) : hn::And(pixels, hn::Set(d, 0xFFFF)));
+  struct Factors {
+    HWY_INLINE explicit Factors(const uint8_t* in) {
+      const auto v0 = LoadVector<uint16_t>(in, 0), v1 = LoadVector<uint16_t>(in, 1);
+      const auto v2 = LoadVector<uint16_t>(in, 2), v3 = LoadVector<uint16_t>(in, 3);
+      areOpaque = AllOpaque<kLayout, uint16_t>(v0, v1, v2, v3);
+      first = PairFactors(v0, v1);
+      second = PairFactors(v2, v3);
+    }
+    U16 first, second;
+    bool areOpaque;
+  };
+  static HWY_INLINE void Map(const uint8_t* in, const Factors& factors, uint8_t* out) {
+    using Base = Alpha15<kLayout>;
+    auto v0 = Base::Load(in, 0), v1 = Base::Load(in, 1), v2 = Base::Load(in, 2), v3 = Base::Load(in, 3);
+    if (!factors.areOpaque) {
+      v0 = MapOne<0>(v0, factors.first);
+      v1 = MapOne<1>(v1, factors.first);
+      v2 = MapOne<0>(v2, factors.second);
+      v3 = MapOne<1>(v3, factors.second);
+    }
+    StoreVector(v0, out, 0);
+    StoreVector(v1, out, 1);
+    StoreVector(v2, out, 2);
+    StoreVector(v3, out, 3);
   }
-  static HWY_INLINE void Map(U16& v0, U16& v1) {
-    const hn::ScalableTag<float> df;
-    const auto alphaBits = hn::ConcatEven(hn::ScalableTag<uint32_t>(), AlphaIn64(v1), AlphaIn64(v0));
-    const auto alpha = hn::ConvertTo(df, hn::BitCast(hn::ScalableTag<int32_t>(), alphaBits));
-    const auto inverses = hn::Div(hn::Set(df, 32768.0f), hn::Max(alpha, hn::Set(df, 1.0f)));
-    v0 = MapOne<false>(v0, inverses);
-    v1 = MapOne<true>(v1, inverses);
+
+ private:
+  // Bytes of a block: the words `first` and `first` + 1, each four times; 0 in the channel `clear` of either four.
+  struct BlockBytes {
+    constexpr BlockBytes(size_t first, size_t clear) {
+      for (size_t i = 0; i < 16; ++i)
+        indices[i] = static_cast<uint8_t>(i / 2 % 4 == clear ? 0x80 : 2 * (first + i / 8) + i % 2);
+    }
+    alignas(16) uint8_t indices[16] = {};
+  };
+  // Of each pair of lanes the first or the second: in each block those of `a`, then those of `b`.
+  template <int kSecond>
+  static HWY_INLINE U32 EachSecond(U32 a, U32 b) {
+    constexpr int kSelect = kSecond ? 0xDD : 0x88;
+#if HWY_TARGET == HWY_AVX3
+    return U32{_mm512_castps_si512(_mm512_shuffle_ps(_mm512_castsi512_ps(a.raw), _mm512_castsi512_ps(b.raw), kSelect))};
+#elif HWY_TARGET == HWY_AVX2
+    return U32{_mm256_castps_si256(_mm256_shuffle_ps(_mm256_castsi256_ps(a.raw), _mm256_castsi256_ps(b.raw), kSelect))};
+#else
+    return U32{_mm_castps_si128(_mm_shuffle_ps(_mm_castsi128_ps(a.raw), _mm_castsi128_ps(b.raw), kSelect))};
+#endif
   }
 };
 
@@ -285,21 +341,21 @@ struct Unpremultiply32 {
 
 template <const Layout& kLayout>
 HWY_ATTR void Premultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
-  MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Singly<Premultiply8<kLayout>>>());
+  MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Premultiply8<kLayout>>());
 }
 template <const Layout& kLayout>
 HWY_ATTR void Unpremultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
   if (HWY_TARGET == HWY_AVX3 && !IsVuy(kLayout) && HasVbmi())
     return kLayout.alpha == 3 ? UnpremultiplyLast512(src, dst, count) : UnpremultiplyFirst512(src, dst, count);
-  MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Singly<Unpremultiply8<kLayout>>>());
+  MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Unpremultiply8<kLayout>>());
 }
 template <const Layout& kLayout>
 HWY_ATTR void Premultiply15u(const uint8_t* src, uint8_t* dst, size_t count) {
-  MapRow<uint16_t>(src, dst, count, UnlessOpaque<uint16_t, kLayout, Singly<Premultiply15<kLayout>>>());
+  MapRow<uint16_t>(src, dst, count, UnlessOpaque<uint16_t, kLayout, Premultiply15<kLayout>>());
 }
 template <const Layout& kLayout>
 HWY_ATTR void Unpremultiply15u(const uint8_t* src, uint8_t* dst, size_t count) {
-  MapRow<uint16_t>(src, dst, count, UnlessOpaque<uint16_t, kLayout, Unpremultiply15<kLayout>>());
+  MapRowAhead<uint16_t, Unpremultiply15<kLayout>>(src, dst, count);
 }
 template <const Layout& kLayout>
 HWY_ATTR void Premultiply32f(const uint8_t* src, uint8_t* dst, size_t count) {
