@@ -355,6 +355,8 @@ HWY_ATTR void Premultiply15u(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 template <const Layout& kLayout>
 HWY_ATTR void Unpremultiply15u(const uint8_t* src, uint8_t* dst, size_t count) {
+  if (HWY_TARGET == HWY_AVX3 && HasVbmi())
+    return kLayout.alpha == 3 ? UnpremultiplyLast15u512(src, dst, count) : UnpremultiplyFirst15u512(src, dst, count);
   MapRowAhead<uint16_t, Unpremultiply15<kLayout>>(src, dst, count);
 }
 template <const Layout& kLayout>

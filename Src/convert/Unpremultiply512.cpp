@@ -25,13 +25,6 @@ constexpr Factors kFactors;
 
 constexpr size_t kPixels = 64, kBlockBytes = 4 * kPixels, kFetchAhead = 8192;
 
-// A constant that compilers keep in a register; in loops they would rather make it anew, by way of a general register.
-VX_VBMI_INLINE __m512i Constant(int value) {
-  __m512i vector = _mm512_set1_epi32(value);
-  asm("" : "+v"(vector));
-  return vector;
-}
-
 // Both products of 16-bit lanes, with the result in the high byte.
 VX_VBMI_INLINE __m512i Quotients(__m512i channels, __m512i p, __m512i m) {
   return _mm512_add_epi16(_mm512_mulhi_epu16(_mm512_mullo_epi16(channels, p), m), Constant(0x00800080));

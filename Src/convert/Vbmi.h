@@ -14,7 +14,7 @@
 #include <cstdint>
 
 // Of functions that use it. No Highway target has these instructions without more that processors lack.
-#define VX_VBMI __attribute__((target("avx512f,avx512bw,avx512dq,avx512vl,avx512vbmi")))
+#define VX_VBMI __attribute__((target("avx512f,avx512bw,avx512cd,avx512dq,avx512vl,avx512vbmi")))
 #define VX_VBMI_INLINE VX_VBMI __attribute__((always_inline)) inline
 
 namespace vexel {
@@ -22,6 +22,13 @@ namespace vexel {
 inline bool HasVbmi() noexcept {
   static const bool has = __builtin_cpu_supports("avx512vbmi");
   return has;
+}
+
+// A constant that compilers keep in a register; in loops they would rather make it anew, by way of a general register.
+VX_VBMI_INLINE __m512i Constant(int value) {
+  __m512i vector = _mm512_set1_epi32(value);
+  asm("" : "+v"(vector));
+  return vector;
 }
 
 // The table is two pairs of registers.
