@@ -9,7 +9,7 @@
 namespace vexel {
 
 std::mutex& LazyCacheMutex() noexcept {
-  static constinit std::mutex mutex;
+  static std::mutex mutex;
   return mutex;
 }
 

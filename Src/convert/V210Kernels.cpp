@@ -296,11 +296,11 @@ void Uyvy32fToV210(const uint8_t* src, uint8_t* dst, size_t count) {
 template <size_t kIndex>
 HWY_INLINE U8 RepeatGroups(U8 groups) {
 #if HWY_TARGET == HWY_AVX3
-  constexpr int kOrder[3] = {0x40, 0xA5, 0xFE};
-  return U8{_mm512_shuffle_i64x2(groups.raw, groups.raw, kOrder[kIndex])};
+  constexpr int kOrders[3] = {0x40, 0xA5, 0xFE}, kOrder = kOrders[kIndex];
+  return U8{_mm512_shuffle_i64x2(groups.raw, groups.raw, kOrder)};
 #elif HWY_TARGET == HWY_AVX2
-  constexpr int kOrder[3] = {0x44, 0xE4, 0xEE};
-  return U8{_mm256_permute4x64_epi64(groups.raw, kOrder[kIndex])};
+  constexpr int kOrders[3] = {0x44, 0xE4, 0xEE}, kOrder = kOrders[kIndex];
+  return U8{_mm256_permute4x64_epi64(groups.raw, kOrder)};
 #else
   return groups;
 #endif

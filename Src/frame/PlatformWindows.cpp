@@ -23,7 +23,7 @@ CpuidRegisters Cpuid(uint32_t leaf, uint32_t subleaf) {
           static_cast<uint32_t>(r[3])};
 }
 
-uint64_t Xcr0() { return _xgetbv(0); }
+__attribute__((target("xsave"))) uint64_t Xcr0() { return _xgetbv(0); }
 
 // Records have their own lengths; the last one read must hold a whole fixed-size record.
 constexpr DWORD kLeastRecordBytes = 80;

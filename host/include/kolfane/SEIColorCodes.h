@@ -3,6 +3,7 @@
 
 #include <cstdint>
 
+#include "zovcore/Export.h"
 #include "zovmediatypes/ColorSpace.h"
 
 struct kqSEIColorCodesRec {
@@ -18,7 +19,6 @@ static_assert(sizeof(kqSEIColorCodesRec) == 24);
 namespace KF {
 
 // Never throws; codes are taken as they are.
-__attribute__((visibility("default"))) zovmediatypes::color::ColorSpace ZOVColorSpaceFromSEIColorCodes(
-    const kqSEIColorCodesRec& codes);
+ZOV_API zovmediatypes::color::ColorSpace ZOVColorSpaceFromSEIColorCodes(const kqSEIColorCodesRec& codes);
 
 }  // namespace KF
