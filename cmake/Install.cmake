@@ -5,6 +5,7 @@ set(vexel_package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/vexel)
 set(vexel_targets vexel)
 if(VEXEL_HOST STREQUAL "embedded")
   list(APPEND vexel_targets vexelhost)
+  set(vexel_pc_host " -lvexelhost")  # a program may use the host's controls, as the CMake target lets it
   install(DIRECTORY ${PROJECT_SOURCE_DIR}/host/include/ DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
           FILES_MATCHING PATTERN "*.h")
 endif()
