@@ -5,11 +5,8 @@
 #include "tool_error.h"
 #include "vexel/vexel.h"
 
-#if __has_include("vexel_host/host.h")
+#if TOOL_HAS_EMBEDDED_HOST
 #include "vexel_host/host.h"
-#define TOOL_HAS_EMBEDDED_HOST 1
-#else
-#define TOOL_HAS_EMBEDDED_HOST 0
 #endif
 
 namespace tool {
@@ -51,6 +48,9 @@ void ForceIsa(const Isa& isa) {
   if (isa.avx512Off) vexel_host::SetDebugEntry("VX.disableAVX512", "true");
   VX_Terminate();
   VX_Initialize();
+#else
+  if (isa.name == std::string("avx2") && ProcessorHas("avx512"))
+    throw ToolError("only the embedded host can keep to avx2 on this processor");
 #endif
   for (uint32_t flag = isa.firstFlagOff; flag <= kAvx2; ++flag) VX_SetDebugFlag(flag, 0);
 }
