@@ -53,6 +53,12 @@ class Rows420 {
   // Whether beginning a row costs nothing: pixels are made of the picture's own samples.
   bool ReadsSource() const noexcept { return mLumaFromSource && mChromaFromSource; }
 
+  // Whether rows of full size keep luma as it is and mix chroma of the picture's own bytes, and of what kind these are;
+  // then, the samples of the row that has begun.
+  bool KeepsCodes() const noexcept { return mKeepsCodes; }
+  decode420::ByteChroma OwnChroma() const noexcept;
+  decode420::PixelRow OwnSamples() const noexcept;
+
   // Makes the samples of a row ready, then any part of it: `count` pixels from an even `first` on. Past the cache,
   // which takes a dst on a line of it, if `stream` says so; StreamFence (frame/StreamCopy.h) is the caller's.
   void BeginRow(int32_t row) noexcept;
@@ -75,7 +81,6 @@ class Rows420 {
 
   VX_Result ChooseLines(int32_t field, int32_t quality) noexcept;
   void ChooseKernels(VX_PixelFormat format) noexcept;
-  decode420::ByteChroma OwnChroma() const noexcept;
   size_t PlaceRows(uint8_t* scratch) noexcept;
 
   int32_t LineOf(int32_t row, int32_t index) const noexcept { return row * mAdvance + mFirstLine + index * mLineStep; }

@@ -102,6 +102,12 @@ ByteChroma Rows420::OwnChroma() const noexcept {
   return IsReversed(mSrc.format) ? ByteChroma::SwappedPairs : ByteChroma::Pairs;
 }
 
+PixelRow Rows420::OwnSamples() const noexcept {
+  PixelRow row = mRow;
+  row.chroma = static_cast<size_t>(mChromaWidth);
+  return row;
+}
+
 bool Rows420::TakeStep(const PlannedStep& step) noexcept {
   if (!mKeepsCodes) return false;
   const bool to601 = step.kernel == &kVuyx8ToBgrx8_601, to709 = step.kernel == &kVuyx8ToBgrx8_709;
@@ -111,6 +117,7 @@ bool Rows420::TakeStep(const PlannedStep& step) noexcept {
     mMakePixels = CodesToBgrx512(OwnChroma(), to709);
   else
     return false;
+  mKeepsCodes = false;
   return true;
 }
 

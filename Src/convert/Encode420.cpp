@@ -15,6 +15,7 @@
 namespace vexel {
 
 using namespace encode420;
+using decode420::ByteChroma;
 
 namespace {
 
@@ -104,6 +105,9 @@ class Lines {
 
   int64_t RowBytes() const noexcept { return mSrcRowBytes; }
 
+  // The decoder, if what it makes is encoded as it is and keeps the codes of a 4:2:0 picture.
+  Rows420* Codes() noexcept { return mDecodes && !mConverts && mDecoder.KeepsCodes() ? &mDecoder : nullptr; }
+
   // Where a line is read from, as far as it is in memory before.
   uintptr_t Address(int64_t line) const noexcept {
     if (mDecodes) return reinterpret_cast<uintptr_t>(mSlots[0]);
@@ -176,7 +180,6 @@ const uint8_t* Lines::Get(int64_t line, int slot, int32_t first, int32_t count) 
 // has a pair more than chroma rows.
 struct Pair {
   int64_t a, b;
-  EncodeLines encode;
 };
 
 class Encoder {
@@ -191,7 +194,13 @@ class Encoder {
 
  private:
   Pair PairOf(int64_t row) const noexcept;
+  template <class Kernel>
+  Kernel Choose(const ByWeights<Kernel>& kernels, int64_t row) const noexcept;
+  void CopyLuma(const uint8_t* luma, int64_t line, bool stream) const noexcept;
+  void Recode(Rows420& lines, bool stream) const noexcept;
   bool GoesPastCache(const Lines& lines) const noexcept;
+  int32_t ChromaColumns() const noexcept { return ChromaWidth(PictureFromBlock(mPlanes[0], mFormat, mWidth, mHeight)); }
+  int64_t ChromaRows() const noexcept { return mHeight / 2 + mHeight % 2; }
   uint8_t* PlaneRow(int plane, int64_t row) const noexcept {
     return static_cast<uint8_t*>(mPlanes[plane]) + row * mRowBytes[plane];
   }
@@ -205,9 +214,15 @@ class Encoder {
 };
 
 Pair Encoder::PairOf(int64_t row) const noexcept {
-  if (!IsFieldPicture(mFormat)) return {2 * row, 2 * row + 1, mKernels.even[mVariant]};
-  const int64_t parity = row % 2, first = row / 2 * 4 + parity;
-  return {first, first + 2, (parity == 0 ? mKernels.nearFirst : mKernels.nearSecond)[mVariant]};
+  if (!IsFieldPicture(mFormat)) return {2 * row, 2 * row + 1};
+  const int64_t first = row / 2 * 4 + row % 2;
+  return {first, first + 2};
+}
+
+template <class Kernel>
+Kernel Encoder::Choose(const ByWeights<Kernel>& kernels, int64_t row) const noexcept {
+  if (!IsFieldPicture(mFormat)) return kernels.even[mVariant];
+  return (row % 2 == 0 ? kernels.nearFirst : kernels.nearSecond)[mVariant];
 }
 
 // Whether reading the source would push the planes out of the cache before anyone looks at them, and they suit stores
@@ -220,30 +235,64 @@ bool Encoder::GoesPastCache(const Lines& lines) const noexcept {
   return places % 64 == 0 && cache != 0 && lines.RowBytes() * mHeight + planeBytes >= int64_t{cache / 2};
 }
 
+void Encoder::CopyLuma(const uint8_t* luma, int64_t line, bool stream) const noexcept {
+  const auto bytes = static_cast<size_t>(mWidth);
+  if (stream)
+    StreamCopy(PlaneRow(0, line), luma, bytes, mVariant);
+  else
+    std::memcpy(PlaneRow(0, line), luma, bytes);
+}
+
+// Without making pixels.
+void Encoder::Recode(Rows420& lines, bool stream) const noexcept {
+  const bool isPlanes = lines.OwnChroma() == ByteChroma::Planes, swaps = lines.OwnChroma() == ByteChroma::SwappedPairs;
+  const auto begin = [&](int64_t line) {
+    lines.BeginRow(static_cast<int32_t>(line));
+    const decode420::PixelRow samples = lines.OwnSamples();
+    CopyLuma(samples.y, line, stream);
+    return samples;
+  };
+  const int64_t chromaRows = ChromaRows();
+  for (int64_t row = 0; row <= chromaRows; ++row) {
+    const Pair pair = PairOf(row);
+    if (pair.a >= mHeight) continue;
+    const decode420::PixelRow a = begin(pair.a), b = pair.b < mHeight ? begin(pair.b) : a;
+    if (row == chromaRows) continue;
+    Choose(isPlanes ? kRecodePlanes : kRecodePairs, row)(
+        a, b, PlaneRow(swaps ? 2 : 1, row), PlaneRow(swaps ? 1 : 2, row), static_cast<size_t>(ChromaColumns()));
+  }
+}
+
 VX_Result Encoder::Run(Lines& lines) const noexcept {
   const Factors& factors = Colorimetry(mFormat) == 0 ? kFactors601 : kFactors709;
-  const int32_t chromaWidth = ChromaWidth(PictureFromBlock(mPlanes[0], mFormat, mWidth, mHeight));
-  const int64_t chromaRows = mHeight / 2 + mHeight % 2, pairs = chromaRows + (IsFieldPicture(mFormat) ? 1 : 0);
+  const int32_t chromaWidth = ChromaColumns();
+  const int64_t chromaRows = ChromaRows(), pairs = chromaRows + (IsFieldPicture(mFormat) ? 1 : 0);
   const size_t noChromaBytes = Pad(static_cast<size_t>(chromaWidth) + 1);
   VX_SCRATCH(scratch, noChromaBytes + lines.ScratchBytes());
   if (!scratch) return VX_ErrOutOfMemory;
   lines.UseScratch(scratch.get() + noChromaBytes);
   const bool stream = GoesPastCache(lines);
+  if (Rows420* const codes = lines.Codes()) {
+    Recode(*codes, stream);
+    if (stream) StreamFence();
+    return VX_Success;
+  }
   const int32_t part = lines.PartPixels();
   for (int64_t row = 0; row < pairs; ++row) {
     const Pair pair = PairOf(row), next = PairOf(row + 1);
     if (pair.a >= mHeight) continue;
     const int64_t lineB = pair.b < mHeight ? pair.b : pair.a;
     const bool hasChroma = row < chromaRows;
+    const EncodeLines encode = Choose(mKernels, row);
     const auto chroma = [&](int plane) { return hasChroma ? PlaneRow(plane, row) : scratch.get(); };
     for (int32_t x = 0; x < mWidth; x += part) {
       const int32_t count = std::min(part, mWidth - x), half = x / 2;
       const uint8_t* const a = lines.Get(pair.a, 0, x, count);
       const uint8_t* const b = lineB == pair.a ? a : lines.Get(lineB, 1, x, count);
-      pair.encode({a, b, PlaneRow(0, pair.a) + x, PlaneRow(0, lineB) + x, chroma(1) + half, chroma(2) + half,
-                   lines.Address(next.a), lines.Address(next.b), static_cast<size_t>(count),
-                   static_cast<size_t>(x + count < mWidth ? count / 2 : chromaWidth - half), stream, x != 0},
-                  factors);
+      encode({a, b, PlaneRow(0, pair.a) + x, PlaneRow(0, lineB) + x, chroma(1) + half, chroma(2) + half,
+              lines.Address(next.a), lines.Address(next.b), static_cast<size_t>(count),
+              static_cast<size_t>(x + count < mWidth ? count / 2 : chromaWidth - half), stream, x != 0},
+             factors);
     }
   }
   if (stream) StreamFence();

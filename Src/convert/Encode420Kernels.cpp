@@ -20,6 +20,8 @@
 namespace vexel::encode420 {
 namespace {
 
+using decode420::PixelRow;
+
 // Fractional bits of the factors.
 inline constexpr int kFactorBits = 15;
 
@@ -113,6 +115,12 @@ HWY_INLINE void WriteChroma(U8 chroma, uint8_t* u, uint8_t* v) {
     hn::StoreU(low, d, u);
     hn::StoreU(high, d, v);
   }
+}
+
+// Bytes of two vectors of words (u, v), U in the lower half.
+HWY_INLINE U8 PackPlanes(I16 low, I16 high) {
+  static constexpr ShuffleTable kPlanes({0, 2, 4, 6, 8, 10, 12, 14, 1, 3, 5, 7, 9, 11, 13, 15});
+  return OrderPacked4(hn::TableLookupBytes(PackBlocks(low, high), kPlanes.Load()));
 }
 
 // Bytes of four vectors of pixels, from words (0, 1) and (2, 3) side by side, to memory order.
@@ -319,9 +327,8 @@ class PairEncoder {
   }
   template <bool kStream>
   HWY_INLINE void Chroma(uint8_t* u, uint8_t* v) {
-    static constexpr ShuffleTable kPlanes({0, 2, 4, 6, 8, 10, 12, 14, 1, 3, 5, 7, 9, 11, 13, 15});
     const I16 low = Filter(mNow[0], mNow[1]), high = Filter(mNow[1], mNext[0]);
-    WriteChroma<kStream>(OrderPacked4(hn::TableLookupBytes(PackBlocks(low, high), kPlanes.Load())), u, v);
+    WriteChroma<kStream>(PackPlanes(low, high), u, v);
     Advance();
   }
   HWY_INLINE void Advance() { mNow[0] = mNext[0], mNow[1] = mNext[1]; }
@@ -419,6 +426,123 @@ void EncodeBgra(const LinePair& lines, const Factors& factors) {
 template <class W>
 void EncodeVuyx(const LinePair& lines, const Factors& factors) {
   lines.stream ? EncodeRows<W, FromVuy, true>(lines, factors) : EncodeRows<W, FromVuy, false>(lines, factors);
+}
+
+// Chroma between 4:2:0 pictures, in words (u, v). Even pixels have a mixture of two rows, odd ones the mean of two
+// mixtures, rounded as pixels are.
+template <class W, bool kPlanes>
+class ChromaRecoder {
+ public:
+  static constexpr size_t kStep = 2 * kVectorPairs, kBytes = kPlanes ? 1 : 2;  // samples, and bytes of one in a row
+  static constexpr size_t kRows = kPlanes ? 8 : 4;                             // rows of line a and b, of V likewise
+
+  // The first sample goes on to the left.
+  HWY_INLINE ChromaRecoder(const PixelRow& a, const PixelRow& b)
+      : mA{Weight(a.weightA), Weight(a.weightB)}, mB{Weight(b.weightA), Weight(b.weightB)} {
+    const auto first = [&](size_t plane) HWY_ATTR {
+      const auto even = [&](const PixelRow& row) {
+        const uint8_t *const p = kPlanes && plane == 1 ? row.v : row.u, *const q =
+                                                                            kPlanes && plane == 1 ? row.vB : row.uB;
+        const size_t at = kPlanes ? 0 : plane;
+        return (row.weightA * p[at] + row.weightB * q[at] + 4) / 8;
+      };
+      return W::kA * even(a) + W::kB * even(b);
+    };
+    mBefore = AsI16(Dwords(first(0) | first(1) << 16));
+  }
+
+  HWY_INLINE void Take(const uint8_t* const (&rows)[kRows], size_t first) {
+    const size_t low = first * kBytes, high = (first + kVectorPairs) * kBytes;  // by hand: loops keep vectors in memory
+    mNextA[0] = Mix(rows, 0, low, mA), mNextA[1] = Mix(rows, 0, high, mA);
+    mNextB[0] = Mix(rows, 2, low, mB), mNextB[1] = Mix(rows, 2, high, mB);
+  }
+  HWY_INLINE void Advance() { mNowA[0] = mNextA[0], mNowA[1] = mNextA[1], mNowB[0] = mNextB[0], mNowB[1] = mNextB[1]; }
+  HWY_INLINE void Make(uint8_t* u, uint8_t* v) {
+    const I16 low = Filter(mNowA[0], mNowA[1], mNowB[0], mNowB[1]);
+    WriteChroma<false>(PackPlanes(low, Filter(mNowA[1], mNextA[0], mNowB[1], mNextB[0])), u, v);
+    Advance();
+  }
+
+ private:
+  static HWY_INLINE U16 Weight(uint32_t weight) {
+    return hn::Set(ScalableTag<uint16_t>(), static_cast<uint16_t>(weight));
+  }
+  static HWY_INLINE U16 Load(const uint8_t* const (&rows)[kRows], size_t row, size_t offset) {
+    if constexpr (!kPlanes) return LoadPromoted<uint16_t, uint8_t>(rows[row] + offset);
+    return AsU16(hn::Or(LoadPromoted<uint32_t, uint8_t>(rows[row] + offset),
+                        hn::ShiftLeft<16>(LoadPromoted<uint32_t, uint8_t>(rows[row + kRows / 2] + offset))));
+  }
+  // In eighths, with half a unit for rounding.
+  static HWY_INLINE U16 Mix(const uint8_t* const (&rows)[kRows], size_t row, size_t offset, const U16 (&weights)[2]) {
+    const U16 sum =
+        hn::Add(hn::Mul(Load(rows, row, offset), weights[0]), hn::Mul(Load(rows, row + 1, offset), weights[1]));
+    return hn::Add(sum, Weight(4));
+  }
+  // (1, 2, 1) about the even pixels, in all 2^kBits.
+  HWY_INLINE I16 Filter(U16 a, U16 followingA, U16 b, U16 followingB) {
+    const auto odd = [](U16 own, U16 following)
+                         HWY_ATTR { return AsI16(hn::ShiftRight<4>(hn::Add(own, ShiftLaneIn(own, following)))); };
+    const I16 evens = WeightedSum<W>(AsI16(hn::ShiftRight<3>(a)), AsI16(hn::ShiftRight<3>(b)));
+    const I16 odds = WeightedSum<W>(odd(a, followingA), odd(b, followingB)), before = ShiftLaneOut(mBefore, odds);
+    mBefore = odds;
+    const I16 sum = hn::Add(hn::Add(evens, evens), hn::Add(odds, before));
+    return hn::ShiftRight<W::kBits>(hn::Add(sum, AsI16(Weight(1 << (W::kBits - 1)))));
+  }
+
+  U16 mA[2], mB[2];
+  U16 mNowA[2], mNextA[2], mNowB[2], mNextB[2];
+  I16 mBefore;  // the odd pixels before, weighted, the last ones in the last place
+};
+
+template <class W, bool kPlanes>
+HWY_INLINE void RecodeRows(const PixelRow& a, const PixelRow& b, uint8_t* u, uint8_t* v, size_t count) {
+  using Recoder = ChromaRecoder<W, kPlanes>;
+  constexpr size_t kStep = Recoder::kStep, kBytes = Recoder::kBytes, kRows = Recoder::kRows;
+  const uint8_t* const all[] = {a.u, a.uB, b.u, b.uB, a.v, a.vB, b.v, b.vB};
+  const size_t steps = a.chroma / kStep, rest = a.chroma % kStep, done = steps * kStep;
+  // The last sample goes on to the right.
+  const uint8_t *rows[kRows], *ends[kRows];
+  alignas(64) uint8_t tails[kRows][2 * kStep * kBytes];
+  for (size_t k = 0; k < kRows; ++k) {
+    rows[k] = all[k], ends[k] = tails[k];
+    uint16_t last = all[k][(a.chroma - 1) * kBytes];
+    if (kPlanes)
+      last = static_cast<uint16_t>(last * 0x101);
+    else
+      std::memcpy(&last, all[k] + (a.chroma - 1) * kBytes, 2);
+    for (size_t i = 0; i < sizeof tails[k] / HWY_MAX_BYTES; ++i)
+      StoreVector(hn::Set(ScalableTag<uint16_t>(), last), tails[k], i);
+    std::memcpy(tails[k], all[k] + done * kBytes, rest * kBytes);
+  }
+  Recoder recoder(a, b);
+  if (steps > 0) {
+    recoder.Take(rows, 0);
+    recoder.Advance();
+    for (size_t i = 1; i < steps; ++i) {
+      recoder.Take(rows, i * kStep);
+      recoder.Make(u + (i - 1) * kStep, v + (i - 1) * kStep);
+    }
+    recoder.Take(ends, 0);
+    recoder.Make(u + done - kStep, v + done - kStep);
+  } else {
+    recoder.Take(ends, 0);
+    recoder.Advance();
+  }
+  if (count == done) return;
+  alignas(64) uint8_t lastU[kStep], lastV[kStep];
+  recoder.Take(ends, kStep);
+  recoder.Make(lastU, lastV);
+  std::memcpy(u + done, lastU, count - done);
+  std::memcpy(v + done, lastV, count - done);
+}
+
+template <class W>
+void RecodePlanes(const PixelRow& a, const PixelRow& b, uint8_t* u, uint8_t* v, size_t count) {
+  RecodeRows<W, true>(a, b, u, v, count);
+}
+template <class W>
+void RecodePairs(const PixelRow& a, const PixelRow& b, uint8_t* u, uint8_t* v, size_t count) {
+  RecodeRows<W, false>(a, b, u, v, count);
 }
 
 }  // namespace
@@ -549,6 +673,34 @@ void EncodeVuyx(const LinePair& lines, const Factors& factors) {
   EncodeRows<W, FromVuy>(lines, factors);
 }
 
+template <class W, bool kPlanes>
+void RecodePlane(const PixelRow& a, const PixelRow& b, size_t plane, uint8_t* out, size_t count) {
+  const auto code = [&](const PixelRow& row, size_t x) {
+    const uint8_t *const p = kPlanes && plane == 1 ? row.v : row.u, *const q = kPlanes && plane == 1 ? row.vB : row.uB;
+    const auto mixed = [&](size_t i) {
+      const size_t at = kPlanes ? i : 2 * i + plane;
+      return static_cast<int32_t>(row.weightA * p[at] + row.weightB * q[at]);
+    };
+    return (mixed(x / 2) + mixed(std::min((x + 1) / 2, row.chroma - 1)) + 8) / 16;
+  };
+  for (size_t i = 0; i < count; ++i) {
+    const auto across = [&](const PixelRow& row) {
+      return code(row, i == 0 ? 0 : 2 * i - 1) + 2 * code(row, 2 * i) + code(row, 2 * i + 1);
+    };
+    out[i] = Round<W::kBits>(W::kA * across(a) + W::kB * across(b));
+  }
+}
+template <class W>
+void RecodePlanes(const PixelRow& a, const PixelRow& b, uint8_t* u, uint8_t* v, size_t count) {
+  RecodePlane<W, true>(a, b, 0, u, count);
+  RecodePlane<W, true>(a, b, 1, v, count);
+}
+template <class W>
+void RecodePairs(const PixelRow& a, const PixelRow& b, uint8_t* u, uint8_t* v, size_t count) {
+  RecodePlane<W, false>(a, b, 0, u, count);
+  RecodePlane<W, false>(a, b, 1, v, count);
+}
+
 }  // namespace
 }  // namespace plain
 
@@ -559,6 +711,8 @@ const PairKernels kFromBgra = VX_PAIR_KERNELS(EncodeBgra);
 const PairKernels kFromVuyx = VX_PAIR_KERNELS(EncodeVuyx);
 const PairKernels kFromUyvy = VX_PAIR_KERNELS(EncodeUyvy);
 const PairKernels kFromYuyv = VX_PAIR_KERNELS(EncodeYuyv);
+const ByWeights<RecodeChroma> kRecodePlanes = VX_PAIR_KERNELS(RecodePlanes);
+const ByWeights<RecodeChroma> kRecodePairs = VX_PAIR_KERNELS(RecodePairs);
 #undef VX_PAIR_KERNELS
 
 }  // namespace vexel::encode420

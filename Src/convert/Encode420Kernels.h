@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "convert/Decode420Kernels.h"
 #include "frame/KernelVariant.h"
 
 namespace vexel::encode420 {
@@ -30,12 +31,20 @@ struct LinePair {
 using EncodeLines = void (*)(const LinePair& lines, const Factors& factors);
 
 // By the weights of the two lines in chroma.
-struct PairKernels {
-  KernelVariants<EncodeLines> even, nearFirst, nearSecond;  // (2, 2), (3, 1), (1, 3)
+template <class Kernel>
+struct ByWeights {
+  KernelVariants<Kernel> even, nearFirst, nearSecond;  // (2, 2), (3, 1), (1, 3)
 };
+using PairKernels = ByWeights<EncodeLines>;
 extern const PairKernels kFromBgrx, kFromVuyx;
 extern const PairKernels kFromBgra;  // premultiplied first
 // Packed 4:2:2: pairs of pixels, the last one whole, with the chroma that kUyvy8ToVuyx8 and kYuyv8ToVuyx8 give them.
 extern const PairKernels kFromUyvy, kFromYuyv;
+
+// The first `count` samples of a chroma row of either plane, from two lines of chroma as decode420::kToCodes would make
+// pixels of it. Those lines have `count` samples, or one more where the row lacks that of an odd width.
+using RecodeChroma = void (*)(const decode420::PixelRow& a, const decode420::PixelRow& b, uint8_t* u, uint8_t* v,
+                              size_t count);
+extern const ByWeights<RecodeChroma> kRecodePlanes, kRecodePairs;
 
 }  // namespace vexel::encode420
