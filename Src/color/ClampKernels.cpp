@@ -9,10 +9,14 @@
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
+#include "frame/KernelTable.h"
+
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
+namespace {
 
 void ClampFloats(const void* src, void* dst, size_t count, float lo, float hi) {
   const hn::ScalableTag<float> d;
@@ -34,16 +38,16 @@ void ClampFloats(const void* src, void* dst, size_t count, float lo, float hi) {
   }
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 void ClampFloats(const void* src, void* dst, size_t count, float lo, float hi) {
   for (size_t i = 0; i < count * sizeof(float); i += sizeof(float)) {
@@ -54,10 +58,10 @@ void ClampFloats(const void* src, void* dst, size_t count, float lo, float hi) {
   }
 }
 
+}  // namespace
 }  // namespace plain
 
 const KernelVariants<ClampKernel> kClampFloats = VX_KERNEL_VARIANTS(ClampFloats);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

@@ -1,5 +1,4 @@
 #include <cmath>
-#include <cstring>
 
 #include "vexel/color_space.h"
 

@@ -6,8 +6,6 @@
 #define VEXEL_COLOR_COLORVECTORS_INL_H_
 #endif
 
-#include <cstddef>
-#include <cstdint>
 #include <limits>
 
 #include <hwy/highway.h>

@@ -1,8 +1,6 @@
 // ITU-R BT.2100 hybrid log-gamma from and to the Rec.709 working space.
 #include <cmath>
 #include <cstddef>
-#include <cstring>
-#include <limits>
 
 #include "color/HdrConstants.h"
 #include "color/PixelKernels.h"
@@ -14,11 +12,13 @@
 #include <hwy/highway.h>
 
 #include "color/ColorVectors-inl.h"
+#include "frame/KernelTable.h"
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
+namespace {
 
 HWY_INLINE ColorVector HlgLuma(const RgbVectors& c) {
   LumaWeights weights;
@@ -98,17 +98,16 @@ void HlgToRec709(const float* src, float* dst, size_t count, const HlgJob& job) 
   });
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
 #endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 void Rec709ToHlg(const float* src, float* dst, size_t count, const HlgJob& job) {
   ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
@@ -136,11 +135,11 @@ void HlgToRec709(const float* src, float* dst, size_t count, const HlgJob& job) 
   });
 }
 
+}  // namespace
 }  // namespace plain
 
 const KernelVariants<HlgKernel> kRec709ToHlg = VX_KERNEL_VARIANTS(Rec709ToHlg);
 const KernelVariants<HlgKernel> kHlgToRec709 = VX_KERNEL_VARIANTS(HlgToRec709);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

@@ -1,7 +1,6 @@
 // The scalar definitions that the plain kernels share. Vector forms: ColorVectors-inl.h.
 #pragma once
 
-#include <cmath>
 #include <cstddef>
 #include <cstring>
 

@@ -2,7 +2,6 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
-#include <limits>
 
 #include "color/HdrConstants.h"
 #include "color/PixelKernels.h"
@@ -14,11 +13,13 @@
 #include <hwy/highway.h>
 
 #include "color/ColorVectors-inl.h"
+#include "frame/KernelTable.h"
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
+namespace {
 
 // PqRatioBelowOne of the halves of a vector.
 using HalfColorTag = hn::Half<ColorTag>;
@@ -162,17 +163,16 @@ void PqToRec709Compressed(const float* src, float* dst, size_t count, const PqJo
   PqToRec709Loop<true>(src, dst, count, job);
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
 #endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 void Rec709ToPq(const float* src, float* dst, size_t count, const PqJob& job) {
   ForEachPlainPixel(src, dst, count, [&](LinearRgb& c) {
@@ -210,6 +210,7 @@ void PqToRec709Compressed(const float* src, float* dst, size_t count, const PqJo
   });
 }
 
+}  // namespace
 }  // namespace plain
 
 const KernelVariants<PqKernel> kRec709ToPq = VX_KERNEL_VARIANTS(Rec709ToPq);
@@ -218,5 +219,4 @@ const KernelVariants<PqKernel> kPqToRec709 = VX_KERNEL_VARIANTS(PqToRec709);
 const KernelVariants<PqKernel> kPqToRec709Compressed = VX_KERNEL_VARIANTS(PqToRec709Compressed);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

@@ -1,8 +1,6 @@
 // Tone compression: luminance through a logarithmic curve with a soft shoulder at both ends, chromaticity kept.
 #include <cmath>
 #include <cstddef>
-#include <cstring>
-#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -13,20 +11,24 @@
 #include <hwy/highway.h>
 
 #include "color/ColorVectors-inl.h"
+#include "frame/KernelTable.h"
 
+#ifndef VEXEL_COLOR_TONEKERNELS_CONSTANTS
+#define VEXEL_COLOR_TONEKERNELS_CONSTANTS
 namespace vexel {
-#ifndef VEXEL_COLOR_TONE_CONSTANTS_
-#define VEXEL_COLOR_TONE_CONSTANTS_
+namespace {
 constexpr float kDarkest = 1e-6f;         // Below it a pixel has no chromaticity of its own.
 constexpr float kLogScale = 99.99f;       // Linear 1 reaches log10(100.99 a).
 constexpr float kLogRange = 0.01010101f;  // 1 / 99
-#endif
+}  // namespace
 }  // namespace vexel
+#endif
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
+namespace {
 
 HWY_INLINE void DecodeTones(PixelBlock& block, const ToneCurve& curve) {
   const ColorTag d;
@@ -112,17 +114,16 @@ void CompressTones(const float* src, float* dst, size_t count, const ToneJob& jo
   });
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
 #endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 float CompressLuminance(float y, const ToneJob& job) {
   const float t = 0.5f * Log10(Most(y, 0.0f) * job.a * kLogScale + 1.0f) - 1.0f;
@@ -158,10 +159,10 @@ void CompressTones(const float* src, float* dst, size_t count, const ToneJob& jo
   });
 }
 
+}  // namespace
 }  // namespace plain
 
 const KernelVariants<ToneKernel> kCompressTones = VX_KERNEL_VARIANTS(CompressTones);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

@@ -1,8 +1,6 @@
 // Power law to power law and sRGB, with a matrix and gamut compression between.
 #include <cmath>
 #include <cstddef>
-#include <cstring>
-#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -13,21 +11,25 @@
 #include <hwy/highway.h>
 
 #include "color/ColorVectors-inl.h"
+#include "frame/KernelTable.h"
 
+#ifndef VEXEL_COLOR_TRANSFERKERNELS_CONSTANTS
+#define VEXEL_COLOR_TRANSFERKERNELS_CONSTANTS
 namespace vexel {
-#ifndef VEXEL_COLOR_SRGB_CONSTANTS_
-#define VEXEL_COLOR_SRGB_CONSTANTS_
+namespace {
 // The converters multiply by reciprocals where the scalar slot functions divide.
 constexpr float kSrgbDecodeThreshold = 0.04045f, kSrgbDecodeScale = 0.94786733f, kSrgbDecodeSlope = 0.07739938f;
 constexpr float kSrgbEncodeThreshold = 0.0031308f, kSrgbEncodeScale = 1.055f, kSrgbEncodeSlope = 12.92f;
 constexpr float kSrgbOffset = 0.055f;
-#endif
+}  // namespace
 }  // namespace vexel
+#endif
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
+namespace {
 
 // kFloat: both exponents have the float core, as all usual ones; otherwise each block asks.
 template <bool kFloat>
@@ -105,17 +107,16 @@ void SrgbToPower(const float* src, float* dst, size_t count, const TransferJob& 
   });
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
 #endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 template <GamutStep kStep>
 void AnyPowerLoop(const float* src, float* dst, size_t count, const TransferJob& job) {
@@ -158,6 +159,7 @@ void SrgbToPower(const float* src, float* dst, size_t count, const TransferJob& 
   });
 }
 
+}  // namespace
 }  // namespace plain
 
 namespace {
@@ -176,5 +178,4 @@ const KernelVariants<TransferKernel> kPowerToSrgb = VX_KERNEL_VARIANTS(PowerToSr
 const KernelVariants<TransferKernel> kSrgbToPower = VX_KERNEL_VARIANTS(SrgbToPower);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

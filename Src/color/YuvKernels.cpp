@@ -2,7 +2,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
-#include <limits>
 
 #include "color/PixelKernels.h"
 #include "color/PlainPixels.h"
@@ -13,22 +12,26 @@
 #include <hwy/highway.h>
 
 #include "color/ColorVectors-inl.h"
+#include "frame/KernelTable.h"
 
+#ifndef VEXEL_COLOR_YUVKERNELS_CONSTANTS
+#define VEXEL_COLOR_YUVKERNELS_CONSTANTS
 namespace vexel {
-#ifndef VEXEL_COLOR_YUV_CONSTANTS_
-#define VEXEL_COLOR_YUV_CONSTANTS_
+namespace {
 constexpr float kBlueFromCb = 1.8814f, kGreenFromCb = 0.1645f, kGreenFromCr = 0.5713f, kRedFromCr = 1.4746f;
 // Rows Cr, Cb, Y' of R, G, B.
 constexpr float kFromRgb[9] = {0.5f, 0.4598f, 0.0402f, -0.1396f, 0.3604f, 0.5f, 0.2627f, 0.6780f, 0.0593f};
 constexpr int kP010Black = 4096, kP010Neutral = 32768;
 constexpr float kP010LumaRange = 56065.0f, kP010ChromaRange = 57345.0f;
-#endif
+}  // namespace
 }  // namespace vexel
+#endif
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
+namespace {
 
 HWY_INLINE RgbVectors FromYuv(ColorVector y, ColorVector cb, ColorVector cr) {
   const ColorTag d;
@@ -117,17 +120,16 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
   }
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel
 HWY_AFTER_NAMESPACE();
 #endif  // HWY_TARGET
 
 #if HWY_ONCE
-
-#include "frame/KernelTable.h"
-
 namespace vexel {
 namespace plain {
+namespace {
 
 LinearRgb FromYuv(float y, float cb, float cr) {
   return {y + kRedFromCr * cr, y - kGreenFromCb * cb - kGreenFromCr * cr, y + kBlueFromCb * cb};
@@ -161,6 +163,7 @@ void P010ToRgb2020(const uint16_t* luma, const uint16_t* chroma, float* dst, siz
   }
 }
 
+}  // namespace
 }  // namespace plain
 
 const KernelVariants<PixelKernel> kYuv2020ToRgb = VX_KERNEL_VARIANTS(Yuv2020ToRgb);
@@ -168,5 +171,4 @@ const KernelVariants<PixelKernel> kRgbToYuv2020 = VX_KERNEL_VARIANTS(RgbToYuv202
 const KernelVariants<P010Kernel> kP010ToRgb2020 = VX_KERNEL_VARIANTS(P010ToRgb2020);
 
 }  // namespace vexel
-
 #endif  // HWY_ONCE

@@ -1,7 +1,6 @@
 #include "frame/ImagePrimitives.h"
 
 #include <algorithm>
-#include <cstdlib>
 #include <cstring>
 
 #include "frame/Bands.h"
@@ -16,7 +15,7 @@
 
 #include "frame/KernelTable.h"
 
-#if !defined(VEXEL_FRAME_IMAGEPRIMITIVES_TYPES)
+#ifndef VEXEL_FRAME_IMAGEPRIMITIVES_TYPES
 #define VEXEL_FRAME_IMAGEPRIMITIVES_TYPES
 namespace vexel::primitives {
 
@@ -36,10 +35,12 @@ struct Scale {
 }  // namespace vexel::primitives
 #endif
 
+#if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
 namespace vexel::primitives {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
+namespace {
 
 using D = hn::ScalableTag<uint8_t>;
 constexpr size_t kLanes = hn::MaxLanes(D());
@@ -123,9 +124,11 @@ void MultiplyRow(const uint8_t* src, uint8_t* dst, size_t bytes, const Pattern& 
   });
 }
 
+}  // namespace
 }  // namespace HWY_NAMESPACE
 }  // namespace vexel::primitives
 HWY_AFTER_NAMESPACE();
+#endif  // HWY_TARGET
 
 #if HWY_ONCE
 namespace vexel::primitives {
@@ -220,16 +223,21 @@ Status Check(const void* base, ptrdiff_t rowBytes, int width, int height, size_t
   return Status::Ok;
 }
 
-// Calls row(r) for every row.
-template <class Row>
-void ForEachRow(int height, size_t bytesOfAll, Row row) {
-  const auto rows = [&](int first, int end) {
-    for (int r = first; r < end; ++r) row(r);
-  };
+// Calls rows(first, end) for all rows.
+template <class Rows>
+void ForEachRun(int height, size_t bytesOfAll, const Rows& rows) {
   if (bytesOfAll < kBandsFrom)
     rows(0, height);
   else
     ForEachBand(height, rows);
+}
+
+// Calls row(r) for every row.
+template <class Row>
+void ForEachRow(int height, size_t bytesOfAll, const Row& row) {
+  ForEachRun(height, bytesOfAll, [&](int first, int end) {
+    for (int r = first; r < end; ++r) row(r);
+  });
 }
 
 uint8_t* RowAt(void* base, ptrdiff_t rowBytes, int row) {
@@ -250,17 +258,13 @@ Status FillWithPixel(const T (&pixel)[N], T* dst, ptrdiff_t rowBytes, int width,
   const bool byCopy = isBig && hasString && withoutGaps && bytesOfAll < UnifiedCache().bytes;
   const bool stream = isBig && !byCopy;
   const auto fillRow = byString ? &FillRowByString : byCopy ? &FillRowByStringCopy : kFillRow[variant];
-  const auto rows = [&](int first, int end) {
+  ForEachRun(height, bytesOfAll, [&](int first, int end) {
     if (withoutGaps)
       fillRow(RowAt(dst, rowBytes, first), bytes * static_cast<size_t>(end - first), pattern, stream);
     else
       for (int r = first; r < end; ++r) fillRow(RowAt(dst, rowBytes, r), bytes, pattern, stream);
     if (stream) StreamFence();
-  };
-  if (bytesOfAll < kBandsFrom)
-    rows(0, height);
-  else
-    ForEachBand(height, rows);
+  });
   return Status::Ok;
 }
 
