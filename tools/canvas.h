@@ -15,6 +15,8 @@ namespace tool {
 struct Colour {
   uint8_t red, green, blue;
 };
+// Of sheets.
+inline constexpr Colour kPaper{24, 26, 30}, kInk{235, 235, 235}, kFaintInk{150, 155, 165}, kFrame{70, 74, 82};
 
 // An opaque BGRX_4444_8u picture, measured in pixels from its top left corner. What falls outside is cut off.
 class Canvas {

@@ -1,6 +1,4 @@
 // vexel color: pictures and video between colour spaces, computed in float; and plots of the spaces.
-#include <algorithm>
-#include <cstring>
 #include <iostream>
 #include <memory>
 #include <optional>
@@ -55,7 +53,7 @@ bool IsRec2020TenBit(VX_PixelFormat format) {
 
 // The luma rows that share chroma row `row`: neighbours, or neighbours within a field.
 std::pair<int, int> LumaRowsOf(VX_PixelFormat format, int row) {
-  const bool isField = (Bits(format) >> 24) % 2 != 0;
+  const bool isField = FrameKind(format) % 2 != 0;
   return isField ? std::pair{row / 2 * 4 + row % 2, row / 2 * 4 + row % 2 + 2} : std::pair{2 * row, 2 * row + 1};
 }
 

@@ -1,7 +1,6 @@
 #include "color_plot.h"
 
 #include <cmath>
-#include <functional>
 
 #include "color_spaces.h"
 #include "svg_plot.h"

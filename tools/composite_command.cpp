@@ -1,7 +1,5 @@
 // vexel composite and vexel blend-sheet: one picture over another.
 #include <algorithm>
-#include <cmath>
-#include <iostream>
 #include <memory>
 #include <string>
 #include <vector>
@@ -18,7 +16,6 @@
 namespace tool {
 namespace {
 
-constexpr Colour kPaper{24, 26, 30}, kInk{235, 235, 235}, kFaintInk{150, 155, 165}, kFrame{70, 74, 82};
 constexpr int kTileWidth = 240, kMargin = 12, kLabelHeight = 30, kColumns = 6;
 
 struct CompositeOptions {

@@ -4,7 +4,6 @@
 #include <iostream>
 #include <limits>
 #include <memory>
-#include <optional>
 
 #include "checksum.h"
 #include "commands.h"

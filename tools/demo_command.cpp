@@ -18,7 +18,6 @@ namespace tool {
 namespace {
 
 constexpr VX_PixelFormat kRgb = VX_PixelFormat::BGRA_4444_8u;
-constexpr Colour kPaper{24, 26, 30}, kInk{235, 235, 235}, kFaintInk{150, 155, 165}, kFrame{70, 74, 82};
 constexpr int kTileWidth = 480, kMargin = 16, kLabelHeight = 52, kTitleHeight = 44, kColumns = 3;
 constexpr int kErrorGain = 32;
 constexpr int kLeastInset = 90;  // the width of its label

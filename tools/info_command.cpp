@@ -1,5 +1,4 @@
 // vexel info: what a file holds, and the library format of each stream.
-#include <cstdio>
 #include <iostream>
 #include <memory>
 

@@ -1,6 +1,5 @@
 #include "sample_rows.h"
 
-#include <algorithm>
 #include <bit>
 #include <cmath>
 #include <cstring>
