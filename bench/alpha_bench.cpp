@@ -1,6 +1,5 @@
 // The alpha utilities, one thread, beside the memory floor, libyuv and pixman.
 #include <algorithm>
-#include <functional>
 #include <memory>
 #include <string>
 

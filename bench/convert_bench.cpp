@@ -1,5 +1,4 @@
 // VX_Convert on whole frames, one thread, beside the peers that know the same conversion.
-#include <algorithm>
 #include <memory>
 #include <string>
 #include <vector>

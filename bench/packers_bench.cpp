@@ -1,7 +1,6 @@
 // Codec packers and camera converters beside the memory floor.
 #include <cmath>
 #include <cstring>
-#include <functional>
 #include <memory>
 #include <string>
 
