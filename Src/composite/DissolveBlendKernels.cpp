@@ -3,8 +3,10 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <type_traits>
 
 #include "composite/BlendKernels.h"
+#include "composite/Opacity.h"
 #include "composite/PlainBlend.h"
 
 #undef HWY_TARGET_INCLUDE
@@ -120,13 +122,11 @@ HWY_ATTR void DissolveRow(const uint8_t* src, const uint8_t* background, uint8_t
   TwoRowLoop<kBlock * kBytes>(src, background, dst, count * kBytes, block);
 }
 
-HWY_ATTR void DissolveByPlace4(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
-                               float opacity, RandomSequence& sequence) {
-  DissolveRow<DissolveBytes>(src, background, dst, count, reversed, opacity, sequence);
-}
-HWY_ATTR void DissolveByPlace16(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count,
-                                bool reversed, float opacity, RandomSequence& sequence) {
-  DissolveRow<DissolveFloats>(src, background, dst, count, reversed, opacity, sequence);
+template <size_t kPixel>
+HWY_ATTR void DissolveByPlace(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
+                              float opacity, RandomSequence& sequence) {
+  using Body = std::conditional_t<kPixel == 4, DissolveBytes, DissolveFloats>;
+  DissolveRow<Body>(src, background, dst, count, reversed, opacity, sequence);
 }
 
 }  // namespace
@@ -166,20 +166,17 @@ void DissolveRow(const uint8_t* src, const uint8_t* background, uint8_t* dst, si
   randomSequence = sequence;
 }
 
-void DissolveByPlace4(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
-                      float opacity, RandomSequence& sequence) {
-  DissolveRow<4, true>(src, background, dst, count, reversed, opacity, sequence);
-}
-void DissolveByPlace16(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
-                       float opacity, RandomSequence& sequence) {
-  DissolveRow<16, true>(src, background, dst, count, reversed, opacity, sequence);
+template <size_t kPixel>
+void DissolveByPlace(const uint8_t* src, const uint8_t* background, uint8_t* dst, size_t count, bool reversed,
+                     float opacity, RandomSequence& sequence) {
+  DissolveRow<kPixel, true>(src, background, dst, count, reversed, opacity, sequence);
 }
 
 }  // namespace
 }  // namespace plain
 
-const KernelVariants<DissolveBlendKernel> kBlendDissolveBytesByPlace = VX_KERNEL_VARIANTS(DissolveByPlace4);
-const KernelVariants<DissolveBlendKernel> kBlendDissolveFloatsByPlace = VX_KERNEL_VARIANTS(DissolveByPlace16);
+const KernelVariants<DissolveBlendKernel> kBlendDissolveBytesByPlace = VX_KERNEL_VARIANTS(DissolveByPlace<4>);
+const KernelVariants<DissolveBlendKernel> kBlendDissolveFloatsByPlace = VX_KERNEL_VARIANTS(DissolveByPlace<16>);
 const DissolveBlendKernel kBlendDissolveBytesInTurn = &plain::DissolveRow<4, false>;
 const DissolveBlendKernel kBlendDissolveFloatsInTurn = &plain::DissolveRow<16, false>;
 

@@ -1,6 +1,5 @@
 // Blend modes that take hue, saturation or luminosity of a pixel from one picture and the rest from the other.
 #include <cstddef>
-#include <cstdint>
 
 #include "composite/BlendKernels.h"
 #include "composite/PlainBlend.h"

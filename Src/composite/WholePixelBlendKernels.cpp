@@ -1,6 +1,4 @@
 // Blend modes that take the darker or the lighter pixel as a whole.
-#include <cstddef>
-#include <cstdint>
 
 #include "composite/BlendKernels.h"
 #include "composite/PlainBlend.h"
