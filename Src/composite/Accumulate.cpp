@@ -1,6 +1,5 @@
 // Weighted sums of images.
 #include <algorithm>
-#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -10,7 +9,6 @@
 #include "composite/RowJob.h"
 #include "convert/RgbKernels.h"
 #include "formats/FormatBits.h"
-#include "frame/Bands.h"
 #include "frame/FpModeGuard.h"
 #include "frame/Scratch.h"
 #include "vexel/compositing.h"
@@ -59,26 +57,16 @@ class Accumulation {
       own = std::max(own, converter->ScratchBytes());
     }
     mBlock = whole ? mWidth : std::min(mWidth, static_cast<int32_t>(kChainBlock));
-    mConverterBytes = Rounded(own);
-    mRowBytes = Rounded(static_cast<size_t>(mBlock) * 16);
+    mConverterBytes = ScratchRounded(own);
+    mRowBytes = ScratchRounded(static_cast<size_t>(mBlock) * 16);
     return VX_Success;
   }
 
   VX_Result Run() noexcept {
-    std::atomic<int32_t> result{VX_Success};
-    const auto rows = [&](int first, int end) {
-      if (const VX_Result band = RunBand(first, end)) result.store(band, std::memory_order_relaxed);
-    };
-    if (mHeight <= RowJob::kInlineRows)
-      rows(0, mHeight);
-    else if (!ForEachBand(mHeight, rows))
-      return VX_ErrFailed;
-    return static_cast<VX_Result>(result.load(std::memory_order_relaxed));
+    return RunInBands(mHeight, [this](int first, int end) { return RunBand(first, end); });
   }
 
  private:
-  static size_t Rounded(size_t bytes) noexcept { return (bytes + 63) & ~size_t{63}; }
-
   VX_Result RunBand(int32_t first, int32_t end) noexcept {
     VX_SCRATCH(scratch, mConverterBytes + 2 * mRowBytes);
     if (!scratch) return VX_ErrOutOfMemory;
@@ -158,10 +146,8 @@ VX_Result CheckBuffers(const Sources& sources, const TargetImage& target, int32_
 
 // The sum of no images.
 VX_Result FillWithZeros(const TargetImage& target, int32_t width, int32_t height) noexcept {
-  const uint32_t alpha = AlphaKind(target.format);
-  const bool hasAlpha = alpha == kAlphaStraight || alpha == kAlphaPremultiplied;
-  return (hasAlpha ? VX_FillWithTransparentBlack : VX_FillWithOpaqueBlack)(target.base, target.rowBytes, width, height,
-                                                                           target.format);
+  return (HasAlpha(target.format) ? VX_FillWithTransparentBlack : VX_FillWithOpaqueBlack)(target.base, target.rowBytes,
+                                                                                          width, height, target.format);
 }
 
 }  // namespace

@@ -49,7 +49,7 @@ using namespace vexel;
 bool VX_IsOpacityNOP(int32_t blendMode, float opacity) noexcept {
   const FpModeGuard fpMode;
   const auto mode = static_cast<VX_BlendMode>(blendMode);
-  return (mode == VX_BlendMode::Dissolve || mode == VX_BlendMode::Normal) && std::fabs(opacity - 1) < kOpacityMargin;
+  return (mode == VX_BlendMode::Dissolve || mode == VX_BlendMode::Normal) && std::fabs(opacity - 1) < kAlphaGuard;
 }
 
 VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcFormat, void* dst, int32_t dstRowBytes,
@@ -58,7 +58,7 @@ VX_Result VX_AlphaGain(const void* src, int32_t srcRowBytes, VX_PixelFormat srcF
   const FpModeGuard fpMode;
   if (IsSpecial(srcFormat)) return VX_ErrUnsupportedFormat;
   if (IsSpecial(dstFormat)) return VX_ErrUnsupportedDestinationFormat;
-  if (!(gain >= kOpacityMargin)) return VX_FillWithTransparentBlack(dst, dstRowBytes, width, height, dstFormat);
+  if (!(gain >= kAlphaGuard)) return VX_FillWithTransparentBlack(dst, dstRowBytes, width, height, dstFormat);
 
   const VX_PixelFormat working = WorkingFormat(dstFormat, precisionHint);
   RowJob job(width, height, precisionHint);

@@ -57,9 +57,6 @@ using DissolveBlendKernel = void (*)(const uint8_t* src, const uint8_t* backgrou
 extern const KernelVariants<DissolveBlendKernel> kBlendDissolveBytesByPlace, kBlendDissolveFloatsByPlace;
 extern const DissolveBlendKernel kBlendDissolveBytesInTurn, kBlendDissolveFloatsInTurn;
 
-// Below this, an alpha counts as nothing.
-inline constexpr float kAlphaGuard = 8e-6f;
-
 }  // namespace vexel
 
 // Defines a mode's kernels in the HWY_ONCE block of the file that holds them.

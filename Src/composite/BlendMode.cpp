@@ -83,7 +83,7 @@ VX_Result Dissolve(const BlendJob& blend) noexcept {
   const bool inBytes = IsByteRgb(format) && AlphaKind(format) == kAlphaStraight && blend.src.format == format &&
                        blend.background.format == format;
   const bool reversed = IsReversed(format);
-  if (blend.height > RowJob::kInlineRows) {
+  if (blend.height > kInlineRows) {
     const auto& variants = inBytes ? kBlendDissolveBytesByPlace : kBlendDissolveFloatsByPlace;
     return RunJob(blend, inBytes, [&](const RowSpan& span, KernelVariant variant) {
       RandomSequence sequence(1);

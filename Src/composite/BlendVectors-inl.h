@@ -13,6 +13,7 @@
 #include <hwy/highway.h>
 
 #include "composite/BlendKernels.h"
+#include "composite/Opacity.h"
 #include "convert/PixelVectors-inl.h"
 #include "frame/FloatTranspose-inl.h"
 

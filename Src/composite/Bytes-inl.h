@@ -7,7 +7,6 @@
 #define VEXEL_COMPOSITE_BYTES_INL_H_
 #endif
 
-#include <cstddef>
 #include <cstdint>
 
 #include <hwy/highway.h>
@@ -18,17 +17,6 @@
 HWY_BEFORE_NAMESPACE();
 namespace vexel {
 namespace HWY_NAMESPACE {
-
-// Sums of neighbours of unsigned times signed bytes; the caller knows that they fit.
-HWY_INLINE I16 MultiplyAddBytes(U8 u, U8 s) {
-#if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_maddubs_epi16(u.raw, s.raw)};
-#elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_maddubs_epi16(u.raw, s.raw)};
-#else
-  return I16{_mm_maddubs_epi16(u.raw, s.raw)};
-#endif
-}
 
 HWY_INLINE U8 ShuffleBytes(U8 v, const uint8_t (&order)[16]) {
   return hn::TableLookupBytesOr0(v, hn::LoadDup128(hn::ScalableTag<uint8_t>(), order));

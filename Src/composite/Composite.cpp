@@ -11,9 +11,6 @@ namespace {
 
 using F = VX_PixelFormat;
 
-constexpr bool HasUsableAlpha(F format) {
-  return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied;
-}
 constexpr F WithAlphaKind(F format, uint32_t kind) { return FromBits((Bits(format) & ~kAlphaMask) | kind); }
 
 // The 4:4:4:4 format, alpha last, in which a result for `destination` is computed.
@@ -22,7 +19,7 @@ constexpr F ResultFormat(F destination) {
   if (Layout(destination) == kLayout422) return narrow ? F::VUYP_4444_8u : F::VUYP_4444_32f;
   uint32_t bits = Bits(destination) & ~(kReversedBit | kLayoutMask);
   if (!narrow) bits = (bits & ~kDepthMask) | kDepth32f;
-  return HasUsableAlpha(destination) ? FromBits(bits) : WithAlphaKind(FromBits(bits), kAlphaPremultiplied);
+  return HasAlpha(destination) ? FromBits(bits) : WithAlphaKind(FromBits(bits), kAlphaPremultiplied);
 }
 
 VX_Result Composite(const SourceImage& src, const SourceImage& background, const TargetImage& dst, int32_t width,
@@ -31,7 +28,7 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   if (IsSpecial(dst.format)) return VX_ErrUnsupportedDestinationFormat;
   opacity = UsableOpacity(opacity);
   if (opacity == 0.0f) return CopyPicture(background, dst, width, height, renderQuality);
-  if (opacity == 1.0f && !HasUsableAlpha(src.format)) return CopyPicture(src, dst, width, height, renderQuality);
+  if (opacity == 1.0f && !HasAlpha(src.format)) return CopyPicture(src, dst, width, height, renderQuality);
   F result = ResultFormat(dst.format);
   // Where everything is alpha-first RGB of one depth, three reversals are saved; the bytes are the same.
   const auto alphaFirst = [](F format) {
@@ -41,8 +38,8 @@ VX_Result Composite(const SourceImage& src, const SourceImage& background, const
   const bool keepsOrder = alphaFirst(src.format) && alphaFirst(background.format) && alphaFirst(dst.format) &&
                           Depth(src.format) == Depth(dst.format) && Depth(background.format) == Depth(dst.format);
   if (keepsOrder) result = FromBits(Bits(result) | kReversedBit);
-  const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, keepsOrder, HasUsableAlpha(src.format),
-                          HasUsableAlpha(background.format)};
+  const OverChoice choice{IsYuv(result), AlphaKind(result) == kAlphaStraight, keepsOrder, HasAlpha(src.format),
+                          HasAlpha(background.format)};
   // Pictures that are premultiplied anyway are composited as they are.
   const auto is = [](F format, uint32_t kind) { return AlphaKind(format) == kind; };
   const bool premultiplied = (is(src.format, kAlphaPremultiplied) || is(background.format, kAlphaPremultiplied)) &&

@@ -80,7 +80,7 @@ class TestedRows {
         mHeight(height),
         mInPlace(src.base == dst.base && src.rowBytes == dst.rowBytes && src.format == dst.format),
         mUpsideDown(VX_IsOriginTopLeft(src.format) != VX_IsOriginTopLeft(dst.format)),
-        mHasAlpha(AlphaKind(src.format) == kAlphaStraight || AlphaKind(src.format) == kAlphaPremultiplied) {}
+        mHasAlpha(HasAlpha(src.format)) {}
 
   VX_Result Prepare(F working, int32_t quality, KernelVariant variant) noexcept {
     mKernels = KernelsFor(working, variant);
@@ -96,12 +96,7 @@ class TestedRows {
   }
 
   VX_Result Run() noexcept {
-    const auto rows = [this](int first, int end) { RunBand(first, end); };
-    if (mHeight <= RowJob::kInlineRows)
-      rows(0, mHeight);
-    else if (!ForEachBand(mHeight, rows))
-      return VX_ErrFailed;
-    return static_cast<VX_Result>(mResult.load());
+    return RunInBands(mHeight, [this](int first, int end) { return RunBand(first, end); });
   }
 
   AlphaState State() const noexcept {
@@ -109,13 +104,14 @@ class TestedRows {
   }
 
  private:
-  void RunBand(int32_t first, int32_t end) noexcept {
+  VX_Result RunBand(int32_t first, int32_t end) noexcept {
     const size_t row = mFromSource || mToTarget ? static_cast<size_t>(mWidth) * 16 : 0;
     VX_SCRATCH(scratch, mConverterBytes + row);
-    if (!scratch && mConverterBytes + row != 0) return mResult.store(VX_ErrOutOfMemory);
+    if (!scratch && mConverterBytes + row != 0) return VX_ErrOutOfMemory;
     Converters converters{mToWorking, mFromWorking, mDirect};
     converters.UseScratch(scratch.get());
     for (int32_t i = first; i < end; ++i) RunRow(i, converters, scratch.get() + mConverterBytes);
+    return VX_Success;
   }
 
   struct Converters {
@@ -164,7 +160,6 @@ class TestedRows {
   RowConverter mToWorking, mFromWorking, mDirect;
   size_t mConverterBytes = 0;
   std::atomic<bool> mAllOpaque{true}, mAllClear{true};
-  std::atomic<int32_t> mResult{VX_Success};
 };
 
 VX_Result ToBlackTested(const SourceImage& src, const TargetImage& dst, int32_t width, int32_t height,

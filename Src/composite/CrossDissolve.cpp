@@ -2,6 +2,7 @@
 #include <cstdint>
 
 #include "composite/DissolveKernels.h"
+#include "composite/Opacity.h"
 #include "composite/RowJob.h"
 #include "formats/FormatBits.h"
 #include "frame/FpModeGuard.h"
@@ -47,7 +48,7 @@ VX_Result VX_CrossDissolve(const void* a, int32_t aRowBytes, VX_PixelFormat aFor
   const SourceImage imageA{a, aRowBytes, aFormat}, imageB{b, bRowBytes, bFormat};
   const TargetImage target{dst, dstRowBytes, dstFormat};
   // NaN counts as 0.
-  if (!(mix >= kWeightGuard)) return CopyPicture(imageA, target, width, height, precisionHint);
-  if (mix + kWeightGuard > 1.0f) return CopyPicture(imageB, target, width, height, precisionHint);
+  if (!(mix >= kAlphaGuard)) return CopyPicture(imageA, target, width, height, precisionHint);
+  if (mix + kAlphaGuard > 1.0f) return CopyPicture(imageB, target, width, height, precisionHint);
   return CrossDissolve(imageA, imageB, target, width, height, mix, precisionHint);
 }

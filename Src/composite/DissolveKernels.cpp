@@ -2,6 +2,8 @@
 
 #include <cstring>
 
+#include "composite/Opacity.h"
+#include "composite/PlainOver8.h"
 #include "convert/PlainPixels.h"
 #include "formats/FormatBits.h"
 
@@ -24,7 +26,7 @@ struct Layout8 {
   size_t alpha;
   uint32_t black;
 };
-constexpr Layout8 kBgra8 = {3, 0}, kArgb8 = {0, 0}, kVuya8 = {3, 0x00108080};
+constexpr Layout8 kBgra8 = {3, 0}, kArgb8 = {0, 0}, kVuya8 = {3, kBlackVuyWord};
 
 // What becomes of the fourth channel: it mixes like the others, is written opaque, or weights them.
 template <class T, AlphaWrite kWrite>
@@ -50,7 +52,7 @@ template <class T>
 using StraightFirst = StraightMode<T, 0>;
 
 template <class T>
-constexpr float kAlphaGuard = kWeightGuard* kFullScale<T>;
+constexpr float kCodeGuard = kAlphaGuard* kFullScale<T>;
 
 // Ten bits each, three of them in a word from this bit on.
 constexpr int kV210Bit = 0, kRgb10Bit = 2;
@@ -92,7 +94,7 @@ struct AlphaWeights {
   HWY_INLINE AlphaWeights(const Weights& mix, F32 alphaA, F32 alphaB)
       : a(hn::Mul(alphaA, mix.a)), b(hn::Mul(alphaB, mix.b)), alpha(hn::Add(a, b)) {
     const hn::ScalableTag<float> d;
-    isClear = hn::Lt(alpha, hn::Set(d, kAlphaGuard<T>));
+    isClear = hn::Lt(alpha, hn::Set(d, kCodeGuard<T>));
     const auto isSame = hn::Eq(alphaA, alphaB);
     const auto divisor = hn::IfThenElse(isClear, hn::Set(d, 1.0f), alpha);
     a = hn::IfThenElse(isSame, mix.a, hn::Div(a, divisor));
@@ -250,7 +252,7 @@ void MixStraight(const uint8_t* a, const uint8_t* b, uint8_t* dst, size_t bytes,
     const float alphaA = Sample(inA[alpha]), alphaB = Sample(inB[alpha]);
     const Weights parts{alphaA * weights.a, alphaB * weights.b};
     const float sum = parts.a + parts.b;
-    const bool isClear = sum < kAlphaGuard<T>;
+    const bool isClear = sum < kCodeGuard<T>;
     const float divisor = isClear ? 1.0f : sum;
     const Weights color = alphaA == alphaB ? weights : Weights{parts.a / divisor, parts.b / divisor};
     ForChannels([&](size_t k) {

@@ -26,7 +26,4 @@ extern const MixKernelSet kAddScaled;
 // The format in which images of `format` mix as floats, every channel in its place and the chroma resolution kept.
 VX_PixelFormat InFloat(VX_PixelFormat format) noexcept;
 
-// A weight this small, or a mix this close to 1, counts as 0 or 1; so does alpha of 1.0.
-inline constexpr float kWeightGuard = 8e-6f;
-
 }  // namespace vexel

@@ -1,7 +1,6 @@
 // Compressed black frames of DV at 25 Mbit/s (IEC 61834-2, SMPTE 314M): 720 x 480 4:1:1 and 720 x 576 4:2:0.
 #pragma once
 
-#include <cstddef>
 #include <cstdint>
 
 namespace vexel {

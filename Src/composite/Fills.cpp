@@ -95,10 +95,8 @@ VX_Result FillOpaque(const Raster& raster, VX_PixelFormat format, FillLevel leve
 }
 
 VX_Result FillTransparent(const Raster& raster, VX_PixelFormat format, FillLevel level) noexcept {
-  const uint32_t alpha = AlphaKind(format);
   FillUnit unit;
-  if ((alpha != kAlphaStraight && alpha != kAlphaPremultiplied) || !MakeFillUnit(format, level, false, &unit))
-    return VX_ErrUnsupportedDestinationFormat;
+  if (!HasAlpha(format) || !MakeFillUnit(format, level, false, &unit)) return VX_ErrUnsupportedDestinationFormat;
   return FillRaster(raster, unit);
 }
 

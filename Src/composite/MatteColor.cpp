@@ -13,9 +13,7 @@ namespace vexel {
 namespace {
 
 bool HasMattedColor(VX_PixelFormat format) noexcept {
-  const uint32_t alpha = AlphaKind(format);
-  return !IsSpecial(format) && !IsYuv(format) && Layout(format) == kLayout4444 &&
-         (alpha == kAlphaStraight || alpha == kAlphaPremultiplied);
+  return !IsSpecial(format) && !IsYuv(format) && Layout(format) == kLayout4444 && HasAlpha(format);
 }
 
 // The matte as kernels take it: without alpha, 15u channels limited to full scale.

@@ -5,6 +5,7 @@
 #include <cstdint>
 
 #include "composite/NormalKernels.h"
+#include "composite/Opacity.h"
 #include "convert/PlainPixels.h"
 
 #undef HWY_TARGET_INCLUDE
@@ -15,18 +16,6 @@
 #include "composite/TwoRows-inl.h"
 #include "convert/FloatPixels-inl.h"
 #include "frame/KernelTable.h"
-
-#ifndef VEXEL_COMPOSITE_NORMALKERNELS32F_SHARED
-#define VEXEL_COMPOSITE_NORMALKERNELS32F_SHARED
-namespace vexel {
-namespace {
-
-// A straight result with less alpha than this has no colour.
-constexpr float kLeastAlpha = 8e-6f;
-
-}  // namespace
-}  // namespace vexel
-#endif
 
 #if HWY_TARGET != HWY_SCALAR
 HWY_BEFORE_NAMESPACE();
@@ -49,7 +38,7 @@ HWY_INLINE F32 Over(F32 s, F32 d, F32 opacity) {
   const auto ao = hn::Sub(hn::Add(ab, as), both);
   if constexpr (!kChoice.straight)
     return TakeChannels<kAlphaBit>(hn::Add(hn::Mul(s, as), hn::Mul(d, hn::Sub(ab, both))), ao);
-  const auto clear = hn::Lt(hn::Abs(ao), hn::Set(df, kLeastAlpha));
+  const auto clear = hn::Lt(hn::Abs(ao), hn::Set(df, kAlphaGuard));
   const auto t = hn::Mul(as, hn::Div(one, hn::IfThenElse(clear, one, ao)));
   return TakeChannels<kAlphaBit>(hn::IfThenZeroElse(clear, mix(t)), ao);
 }
@@ -92,7 +81,7 @@ void Over32(const uint8_t* source, const uint8_t* background, uint8_t* dst, size
     const float as = kChoice.sourceAlpha ? s[AlphaAt(kChoice)] * opacity : opacity;
     const float ab = kChoice.backgroundAlpha ? d[AlphaAt(kChoice)] : 1.0f;
     const float ao = kChoice.backgroundAlpha ? ab + as - as * ab : 1.0f;
-    const bool clear = kChoice.straight && std::fabs(ao) < kLeastAlpha;
+    const bool clear = kChoice.straight && std::fabs(ao) < kAlphaGuard;
     const float t = kChoice.backgroundAlpha && !clear ? as * (1 / ao) : as;
     float out[4];
     ForChannels([&](size_t k) {

@@ -8,6 +8,7 @@
 #include <xmmintrin.h>
 
 #include "composite/BlendKernels.h"
+#include "composite/Opacity.h"
 #include "convert/PlainPixels.h"
 
 namespace vexel::plain {

@@ -49,9 +49,9 @@ struct Adder {
   HWY_INLINE I16 Sum(U8 s, U8 d, I16 forBackground) const {
     const hn::ScalableTag<uint8_t> d8;
     const auto times64 = hn::BitCast(d8, hn::Set(hn::ScalableTag<uint16_t>(), kOdd ? 0x4000 : 0x0040));
-    auto s64 = MultiplyAddBytes(s, times64), d64 = MultiplyAddBytes(d, times64);
+    auto s64 = WeighBytes(s, times64), d64 = WeighBytes(d, times64);
     const auto black = hn::BitCast(
-        I16Tag(), MultiplyAddBytes(hn::BitCast(d8, hn::Set(hn::ScalableTag<uint32_t>(), kBlackVuyWord)), times64));
+        I16Tag(), WeighBytes(hn::BitCast(d8, hn::Set(hn::ScalableTag<uint32_t>(), kBlackVuyWord)), times64));
     if constexpr (kChoice.yuv) {
       s64 = hn::Sub(s64, black);
       d64 = hn::Sub(d64, black);

@@ -6,12 +6,6 @@
 #include "frame/StreamCopy.h"
 
 namespace vexel {
-namespace {
-
-constexpr size_t Rounded(size_t bytes) { return (bytes + 63) & ~size_t{63}; }
-
-}  // namespace
-
 VX_Result CopyPicture(const SourceImage& image, const TargetImage& target, int32_t width, int32_t height,
                       int32_t renderQuality) noexcept {
   const bool isThere =
@@ -82,10 +76,10 @@ void RowJob::Layout() noexcept {
   size_t own = mTarget.converts ? mTarget.converter.ScratchBytes() : 0;
   for (int i = 0; i < mSourceCount; ++i)
     if (mSources[i].converts) own = std::max(own, mSources[i].converter.ScratchBytes());
-  size_t end = Rounded(own);
+  size_t end = ScratchRounded(own);
   const auto take = [&](VX_PixelFormat format) {
     const size_t offset = end;
-    end += Rounded(static_cast<size_t>(UnpaddedRowBytes(format, mBlock)));
+    end += ScratchRounded(static_cast<size_t>(UnpaddedRowBytes(format, mBlock)));
     return offset;
   };
   for (int i = 0; i < mSourceCount; ++i)
@@ -95,13 +89,14 @@ void RowJob::Layout() noexcept {
   mScratchBytes = end;
 }
 
-const uint8_t* RowJob::StoredRow(const Side& side, int32_t row) const noexcept {
-  return side.base + ptrdiff_t{side.upsideDown ? mHeight - 1 - row : row} * side.rowBytes;
+uint8_t* RowJob::Stored(const Side& side, int32_t row, int32_t column) const noexcept {
+  return side.base + ptrdiff_t{side.upsideDown ? mHeight - 1 - row : row} * side.rowBytes +
+         static_cast<size_t>(column) / kBlockMultiple * side.bytesPerSixPixels;
 }
 
 const uint8_t* RowJob::Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column,
                              size_t count) const noexcept {
-  const uint8_t* from = StoredRow(side, row) + static_cast<size_t>(column) / kBlockMultiple * side.bytesPerSixPixels;
+  const uint8_t* from = Stored(side, row, column);
   if (!side.converts) return from;
   uint8_t* const to = scratch + side.scratchOffset;
   if (side.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock))
@@ -115,22 +110,18 @@ void RowJob::PrefetchNext(const RowSpan& span) const noexcept {
   for (int i = 0; i < mSourceCount; ++i) {
     const Side& side = mSources[i];
     const size_t bytes = span.count / kBlockMultiple * side.bytesPerSixPixels;
-    PrefetchBlock(
-        StoredRow(side, span.row) + static_cast<size_t>(span.column) / kBlockMultiple * side.bytesPerSixPixels + bytes,
-        bytes);
+    PrefetchBlock(Stored(side, span.row, span.column) + bytes, bytes);
   }
 }
 
 uint8_t* RowJob::Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept {
   if (mTarget.converts || mStages) return scratch + mTarget.scratchOffset;
-  return mTarget.base + row * mTarget.rowBytes +
-         static_cast<size_t>(column) / kBlockMultiple * mTarget.bytesPerSixPixels;
+  return Stored(mTarget, row, column);
 }
 
 void RowJob::Deliver(const RowSpan& span) const noexcept {
   if (!mTarget.converts && !mStages) return;
-  uint8_t* const to = mTarget.base + span.row * mTarget.rowBytes +
-                      static_cast<size_t>(span.column) / kBlockMultiple * mTarget.bytesPerSixPixels;
+  uint8_t* const to = Stored(mTarget, span.row, span.column);
   const size_t bytes = static_cast<size_t>(UnpaddedRowBytes(mTarget.format, static_cast<int64_t>(span.count)));
   if (mStream) PrefetchNext(span);
   const bool block = mTarget.converter.IsPointWise() && mBlock <= static_cast<int32_t>(kChainBlock);

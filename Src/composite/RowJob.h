@@ -40,15 +40,30 @@ struct RowSpan {
   bool stream;
 };
 
+// Pictures of up to so many rows are worked on by the calling thread.
+inline constexpr int32_t kInlineRows = 64;
+
+// Calls rows(first, end) for the rows of a picture in bands. The result of a band that failed, if there is one; -999
+// when the host's fan-out failed.
+template <class Rows>
+VX_Result RunInBands(int32_t height, const Rows& rows) noexcept {
+  std::atomic<int32_t> result{VX_Success};
+  const auto band = [&](int first, int end) {
+    if (const VX_Result failure = rows(first, end)) result.store(failure, std::memory_order_relaxed);
+  };
+  if (height <= kInlineRows)
+    band(0, height);
+  else if (!ForEachBand(height, band))
+    return VX_ErrFailed;
+  return static_cast<VX_Result>(result.load(std::memory_order_relaxed));
+}
+
 // Use: AddSource for each source, SetTarget, CheckBuffers, Run.
 //
 // Pictures meet upright: a source whose origin differs from the destination's is walked from its last row. The
 // destination may be exactly one of the sources (base, row bytes and format); any other overlap is undefined.
 class RowJob {
  public:
-  // Heights up to this run on the calling thread.
-  static constexpr int32_t kInlineRows = 64;
-
   RowJob(int32_t width, int32_t height, int32_t renderQuality, KernelVariant variant = ActiveKernelVariant()) noexcept
       : mWidth(width), mHeight(height), mRenderQuality(renderQuality), mVariant(variant) {}
 
@@ -69,15 +84,7 @@ class RowJob {
   template <class Kernel>
   VX_Result Run(const Kernel& kernel) noexcept {
     Layout();
-    std::atomic<int32_t> result{VX_Success};
-    const auto rows = [&](int first, int end) {
-      if (const VX_Result band = RunBand(first, end, kernel)) result.store(band, std::memory_order_relaxed);
-    };
-    if (mHeight <= kInlineRows)
-      rows(0, mHeight);
-    else if (!ForEachBand(mHeight, rows))
-      return VX_ErrFailed;
-    return static_cast<VX_Result>(result.load(std::memory_order_relaxed));
+    return RunInBands(mHeight, [&](int first, int end) { return RunBand(first, end, kernel); });
   }
 
   KernelVariant Variant() const noexcept { return mVariant; }
@@ -98,7 +105,8 @@ class RowJob {
   // Decides between blocks and whole rows, and where in the scratch memory everything lies.
   void Layout() noexcept;
   bool TargetIsASource() const noexcept;
-  const uint8_t* StoredRow(const Side& side, int32_t row) const noexcept;
+  // Where a block begins in memory.
+  uint8_t* Stored(const Side& side, int32_t row, int32_t column) const noexcept;
   void PrefetchNext(const RowSpan& span) const noexcept;
   const uint8_t* Fetch(const Side& side, uint8_t* scratch, int32_t row, int32_t column, size_t count) const noexcept;
   uint8_t* Place(uint8_t* scratch, int32_t row, int32_t column) const noexcept;

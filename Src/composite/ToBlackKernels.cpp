@@ -107,7 +107,7 @@ struct Darken32 {
     const hn::ScalableTag<float> d;
     const auto one = hn::Set(d, 1.0f);
     const auto alpha = hn::Mul(hn::Broadcast<kLayout.alpha>(v), opacity);
-    const auto keeps = hn::Or(hn::Gt(hn::Add(alpha, hn::Set(d, kOpacityMargin)), one), hn::IsNaN(v));
+    const auto keeps = hn::Or(hn::Gt(hn::Add(alpha, hn::Set(d, kAlphaGuard)), one), hn::IsNaN(v));
     const auto isAlpha = hn::MaskFromVec(ChannelMask<kLayout.alpha, float>());
     return hn::IfThenElse(isAlpha, one, hn::IfThenElse(keeps, v, hn::Mul(v, alpha)));
   }
@@ -182,7 +182,7 @@ template <BlackLayout kLayout>
 void ToBlack32(const uint8_t* src, uint8_t* dst, size_t count, float opacity) {
   MapPixels<float, float>(src, dst, count, [&](const float* in, float* out) {
     const float alpha = in[kLayout.alpha] * opacity;
-    const bool keeps = alpha + kOpacityMargin > 1.0f;
+    const bool keeps = alpha + kAlphaGuard > 1.0f;
     ForChannels([&](size_t k) {
       out[k] = k == kLayout.alpha ? 1.0f : keeps || in[k] != in[k] ? in[k] : in[k] * alpha;
     });

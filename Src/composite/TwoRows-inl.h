@@ -47,11 +47,7 @@ struct Put {
   uint8_t* out;
   template <class V>
   HWY_INLINE void operator()(V v, size_t index) const {
-    const hn::ScalableTag<uint8_t> d;
-    if constexpr (kStream)
-      hn::Stream(hn::BitCast(d, v), d, out + index * HWY_MAX_BYTES);
-    else
-      StoreVector(v, out, index);
+    WriteVector<kStream>(v, out, index);
   }
 };
 

@@ -108,8 +108,8 @@ VX_Result Decode(const Picture420& src, const TopDown& dst, VX_PixelFormat worki
 
   const bool streams = GoesPastCache(src, dst);
   if (streams && converts) converter.StreamOutput();
-  const auto pad = [](size_t bytes) { return (bytes + 63) & ~size_t{63}; };
-  const size_t rowsBytes = pad(rows.ScratchBytes()), converterBytes = converts ? pad(converter.ScratchBytes()) : 0;
+  const size_t rowsBytes = ScratchRounded(rows.ScratchBytes());
+  const size_t converterBytes = converts ? ScratchRounded(converter.ScratchBytes()) : 0;
   const size_t pixels = converts ? static_cast<size_t>(dst.width) : streams ? kStreamPixels : 0;
   VX_SCRATCH(scratch, rowsBytes + converterBytes + pixels * 4);
   if (!scratch) return VX_ErrOutOfMemory;

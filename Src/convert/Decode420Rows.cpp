@@ -4,6 +4,7 @@
 #include "convert/Decode420Rgb512.h"
 #include "convert/Vbmi.h"
 #include "convert/YuvKernels.h"
+#include "frame/Scratch.h"
 
 namespace vexel {
 
@@ -126,7 +127,7 @@ size_t Rows420::PlaceRows(uint8_t* scratch) noexcept {
   const auto place = [&](auto*& row, size_t elements) {
     using Element = std::remove_reference_t<decltype(*row)>;
     row = scratch ? reinterpret_cast<Element*>(scratch + used) : nullptr;
-    used += (elements * sizeof(Element) + 63) & ~size_t{63};
+    used += ScratchRounded(elements * sizeof(Element));
   };
   const auto placeRow = [&](uint16_t*& row, size_t samples) {
     place(row, RowSamples(samples));

@@ -5,7 +5,6 @@
 // always (round to nearest, saturate; NaN and what int32 cannot hold give 0).
 #include <xmmintrin.h>
 
-#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>

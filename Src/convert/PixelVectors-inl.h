@@ -13,6 +13,7 @@
 
 #include "convert/PlainPixels.h"
 #include "frame/RowLoop-inl.h"
+#include "frame/StreamStore-inl.h"
 
 // Highway's scalar fallback target is never chosen (the plain definitions serve there), so it gets no kernels.
 #if HWY_TARGET != HWY_SCALAR
@@ -39,10 +40,14 @@ HWY_INLINE Full<T> LoadVector(const uint8_t* p, size_t index = 0) {
   return hn::BitCast(hn::ScalableTag<T>(), hn::LoadU(hn::ScalableTag<uint8_t>(), p + index * HWY_MAX_BYTES));
 }
 
+// Past the cache if kStream; p is aligned to a vector then.
+template <bool kStream, class V>
+HWY_INLINE void WriteVector(V v, uint8_t* p, size_t index) {
+  StoreBytes<kStream>(v, p + index * HWY_MAX_BYTES);
+}
 template <class V>
 HWY_INLINE void StoreVector(V v, uint8_t* p, size_t index = 0) {
-  const hn::ScalableTag<uint8_t> d8;
-  hn::StoreU(hn::BitCast(d8, v), d8, p + index * HWY_MAX_BYTES);
+  WriteVector<false>(v, p, index);
 }
 
 // Half and quarter vectors of bytes or words, widened to a full vector.
@@ -54,7 +59,7 @@ HWY_INLINE Full<T> LoadPromoted(const uint8_t* p) {
   return hn::PromoteTo(d, hn::BitCast(dFrom, hn::LoadU(d8, p)));
 }
 
-// Runs op.Map over four vectors of lane type T at a time; the pixels have four channels of type T on both sides.
+// Calls op(in, out) for four vectors of lane type T at a time; the pixels have four channels of type T on both sides.
 template <class T, class Op>
 HWY_INLINE void MapRow(const uint8_t* src, uint8_t* dst, size_t count, const Op& op) {
   constexpr size_t kPixel = 4 * sizeof(T);
@@ -140,6 +145,17 @@ HWY_INLINE U16 PackBlocks(I32 a, I32 b) {
   const hn::ScalableTag<int16_t> d;
   const auto packed = hn::ReorderDemote2To(d, biased(a), biased(b));
   return hn::BitCast(hn::ScalableTag<uint16_t>(), hn::Xor(packed, hn::Set(d, INT16_MIN)));
+#endif
+}
+
+// Byte 0 of each word times a weight, plus byte 1 times another; the caller knows that the sums fit.
+HWY_INLINE I16 WeighBytes(U8 unsignedBytes, U8 signedBytes) {
+#if HWY_TARGET == HWY_AVX3
+  return I16{_mm512_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
+#elif HWY_TARGET == HWY_AVX2
+  return I16{_mm256_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
+#else
+  return I16{_mm_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
 #endif
 }
 

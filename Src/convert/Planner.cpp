@@ -88,9 +88,6 @@ constexpr int BitsOfDepth(F format) noexcept {
       return 32;
   }
 }
-constexpr bool CarriesAlpha(F format) noexcept {
-  return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied;
-}
 constexpr bool IsSubsampled(F format) noexcept {
   return Layout(format) == kLayout422 || (IsYuv(format) && AlphaKind(format) == kAlphaNone);
 }
@@ -101,7 +98,7 @@ class Price {
   Price(F src, F dst) noexcept
       : mDst(dst),
         mLeastDepth(std::min(BitsOfDepth(src), BitsOfDepth(dst))),
-        mKeepsAlpha(CarriesAlpha(src) && CarriesAlpha(dst)),
+        mKeepsAlpha(HasAlpha(src) && HasAlpha(dst)),
         mKeepsStraight(AlphaKind(src) == kAlphaStraight && AlphaKind(dst) == kAlphaStraight),
         mKeepsChroma(!IsSubsampled(src) && !IsSubsampled(dst)),
         mPrecise(std::max(BitsOfDepth(src), BitsOfDepth(dst)) > 8) {}
@@ -109,8 +106,8 @@ class Price {
   uint32_t Of(const Step& step) const noexcept {
     const uint32_t rounds = step.loss == StepLoss::Rounds;
     const uint32_t cost = Depth(step.to) == kDepth32f ? 3 : Depth(step.to) == kDepth15u ? 2 : 1;
-    const uint32_t alphaInYuv = IsYuv(step.from) && IsYuv(step.to) && CarriesAlpha(step.from) &&
-                                CarriesAlpha(step.to) && AlphaKind(step.from) != AlphaKind(step.to);
+    const uint32_t alphaInYuv = IsYuv(step.from) && IsYuv(step.to) && HasAlpha(step.from) && HasAlpha(step.to) &&
+                                AlphaKind(step.from) != AlphaKind(step.to);
     uint32_t price = kStep + (mPrecise ? kPreciseRounding : kRounding) * rounds + cost + 2 * alphaInYuv;
     if (!mPrecise && Depth(step.to) != kDepth8u) price += kDetour;
     if (step.to != mDst) price += kLoss * Losses(step.to);
@@ -123,7 +120,7 @@ class Price {
                             kPreciseRounding = kStep * 9, kLoss = kPreciseRounding * 9;
 
   uint32_t Losses(F through) const noexcept {
-    return (BitsOfDepth(through) < mLeastDepth) + (mKeepsAlpha && !CarriesAlpha(through)) +
+    return (BitsOfDepth(through) < mLeastDepth) + (mKeepsAlpha && !HasAlpha(through)) +
            (mKeepsStraight && AlphaKind(through) != kAlphaStraight) + (mKeepsChroma && IsSubsampled(through));
   }
 

@@ -4,6 +4,7 @@
 
 #include "convert/RgbKernels.h"
 #include "formats/FormatBits.h"
+#include "frame/Scratch.h"
 #include "frame/StreamCopy.h"
 
 namespace vexel {
@@ -43,8 +44,7 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
   mOutlastsMemory = false;
   // What had no alpha gets an opaque one on its way. Numbers that come from floats are left to their steps, which may
   // flush or quiet them.
-  const bool opaque =
-      AlphaKind(src) != kAlphaStraight && AlphaKind(src) != kAlphaPremultiplied && Depth(src) != kDepth32f;
+  const bool opaque = !HasAlpha(src) && Depth(src) != kDepth32f;
   const RowKernelSet* before = nullptr;
   mStepCount = 0;
   for (int i = 0; i < plan.stepCount; ++i) {
@@ -69,7 +69,7 @@ VX_Result RowConverter::Prepare(VX_PixelFormat src, VX_PixelFormat dst, int32_t 
 
 size_t RowConverter::ScratchRowBytes() const noexcept {
   // One 4 x 32-bit float pixel per pixel; V210 groups and pairs of the last few pixels fit in the rounding.
-  return (UnitPixels() * 16 + 63) & ~size_t{63};
+  return ScratchRounded(UnitPixels() * 16);
 }
 
 size_t RowConverter::ScratchBytes() const noexcept {

@@ -36,16 +36,6 @@ HWY_INLINE U8 AsU8(V v) {
   return hn::BitCast(hn::ScalableTag<uint8_t>(), v);
 }
 
-// Into the cache, or past it where dst is aligned.
-template <bool kStream, class V>
-HWY_INLINE void WriteVector(V v, uint8_t* dst, size_t index) {
-  const hn::ScalableTag<uint8_t> d;
-  if constexpr (kStream)
-    hn::Stream(AsU8(v), d, dst + index * HWY_MAX_BYTES);
-  else
-    StoreVector(v, dst, index);
-}
-
 // The same pair of words, or dword, in all lanes.
 HWY_INLINE I16 WordPair(int low, int high) {
   return AsI16(hn::Set(hn::ScalableTag<uint32_t>(),
@@ -61,17 +51,6 @@ HWY_INLINE I32 MultiplyPairs(I16 a, I16 b) {
   return I32{_mm256_madd_epi16(a.raw, b.raw)};
 #else
   return I32{_mm_madd_epi16(a.raw, b.raw)};
-#endif
-}
-
-// Byte 0 of each word times a weight, plus byte 1 times another.
-HWY_INLINE I16 WeighBytes(U8 unsignedBytes, U8 signedBytes) {
-#if HWY_TARGET == HWY_AVX3
-  return I16{_mm512_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
-#elif HWY_TARGET == HWY_AVX2
-  return I16{_mm256_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
-#else
-  return I16{_mm_maddubs_epi16(unsignedBytes.raw, signedBytes.raw)};
 #endif
 }
 

@@ -22,6 +22,10 @@ inline constexpr uint32_t kColorimetryMask = 0x600, kColorimetry709 = 0x200, kCo
 constexpr bool IsYuv(VX_PixelFormat f) noexcept { return (Bits(f) & kYuvBit) != 0; }
 constexpr bool IsLinear(VX_PixelFormat f) noexcept { return (Bits(f) & kLinearBit) != 0; }
 constexpr uint32_t AlphaKind(VX_PixelFormat f) noexcept { return Bits(f) & kAlphaMask; }
+// That counts: straight or premultiplied.
+constexpr bool HasAlpha(VX_PixelFormat f) noexcept {
+  return AlphaKind(f) == kAlphaStraight || AlphaKind(f) == kAlphaPremultiplied;
+}
 constexpr uint32_t Layout(VX_PixelFormat f) noexcept { return Bits(f) & kLayoutMask; }
 constexpr uint32_t Depth(VX_PixelFormat f) noexcept { return Bits(f) & kDepthMask; }
 constexpr uint32_t Colorimetry(VX_PixelFormat f) noexcept { return Bits(f) & kColorimetryMask; }

@@ -1,8 +1,6 @@
 // Spreads the rows of a kernel over the host's processors.
 #pragma once
 
-#include <cstdint>
-
 #include "frame/SeededBug.h"
 
 namespace vexel {

@@ -18,6 +18,11 @@ namespace vexel {
 inline constexpr size_t kScratchStackLimit = 262144;
 inline constexpr size_t kScratchAlignment = 64;
 
+// The size of a piece of scratch memory after which the next one is as well aligned.
+constexpr size_t ScratchRounded(size_t bytes) noexcept {
+  return (bytes + kScratchAlignment - 1) & ~(kScratchAlignment - 1);
+}
+
 class Scratch {
  public:
   Scratch(void* stack, size_t bytes) noexcept {

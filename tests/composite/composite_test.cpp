@@ -34,8 +34,7 @@ void ExpectNearExact8(F src, F background, F dst, float opacity) {
   for (int i = 0; i < 256 * 256; ++i) {
     const uint8_t *sp = &s.bytes[4 * i], *dp = &d.bytes[4 * i], *op = &out.bytes[4 * i];
     const double opaque = opacity >= 0.999992f ? 1 : double{opacity};
-    const Exact exact(CarriesAlpha(src) ? sp[3] / 255.0 * opaque : opaque,
-                      CarriesAlpha(background) ? dp[3] / 255.0 : 1);
+    const Exact exact(HasAlpha(src) ? sp[3] / 255.0 * opaque : opaque, HasAlpha(background) ? dp[3] / 255.0 : 1);
     for (int k = 0; k < 3; ++k) {
       const double black = !IsYuv(dst) ? 0 : k == 2 ? 16 : 128;
       const double colour =
@@ -177,10 +176,10 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
       // Straight inputs, unless none is and the result can do without.
       const auto isStraight = [](F format) { return AlphaKind(format) == kAlphaStraight; };
       const bool premultiplied = (IsPremultiplied(src) || IsPremultiplied(background)) && !isStraight(src) &&
-                                 !isStraight(background) && !(CarriesAlpha(background) && isStraight(working));
+                                 !isStraight(background) && !(HasAlpha(background) && isStraight(working));
       const auto input = [&](F format) {
         const uint32_t kind = premultiplied ? kAlphaPremultiplied : kAlphaStraight;
-        return FromBits((Bits(working) & ~kAlphaMask) | (CarriesAlpha(format) ? kind : kAlphaIgnored));
+        return FromBits((Bits(working) & ~kAlphaMask) | (HasAlpha(format) ? kind : kAlphaIgnored));
       };
       Image s(src, kWidth, kHeight), d(background, kWidth, kHeight, Contents::Random, 2), out(dst, kWidth, kHeight);
       Image ws(input(src), kWidth, kHeight), wd(input(background), kWidth, kHeight), wout(working, kWidth, kHeight);
@@ -200,7 +199,7 @@ TEST(Composite, ConvertsIntoAndOutOfTheWorkingFormat) {
       }
       Image one = out;
       ASSERT_EQ(Composite(s, d, one, 1.0f), VX_Success);
-      if (!CarriesAlpha(src)) {
+      if (!HasAlpha(src)) {
         ASSERT_EQ(Convert(s, plain), VX_Success);
         ASSERT_EQ(one.bytes, plain.bytes);
       }

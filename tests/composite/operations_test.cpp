@@ -97,7 +97,7 @@ std::vector<Operation> Operations() {
       {"opaque white", 0, [](Sources, To to) { return FillWith(VX_FillWithOpaqueWhite, to); },
        All(VX_ErrFormatNotHandled)},
       {"transparent black", 0, [](Sources, To to) { return FillWith(VX_FillWithTransparentBlack, to); },
-       All(VX_ErrUnsupportedDestinationFormat), CarriesAlpha}};
+       All(VX_ErrUnsupportedDestinationFormat), HasAlpha}};
   for (const float opacity : {0.0f, 0.6f, 1.0f}) {
     const std::string at = " at " + std::to_string(opacity);
     // At 0 one of the pictures does not count.

@@ -50,7 +50,7 @@ TEST(Planner, EveryPairWalksAlongStepsOfTheGraphAndLosesNothing) {
         ASSERT_TRUE(src == dst || std::ranges::any_of(AllSteps(), isStep));
         current = through;
         EXPECT_GE(DepthBits(through), std::min(DepthBits(src), DepthBits(dst)));
-        EXPECT_TRUE(CarriesAlpha(through) || !CarriesAlpha(src) || !CarriesAlpha(dst));
+        EXPECT_TRUE(HasAlpha(through) || !HasAlpha(src) || !HasAlpha(dst));
         EXPECT_TRUE(Layout(through) == kLayout4444 || Layout(src) != kLayout4444 || Layout(dst) != kLayout4444);
         EXPECT_TRUE(AlphaKind(through) == kAlphaStraight || AlphaKind(src) != kAlphaStraight ||
                     AlphaKind(dst) != kAlphaStraight);

@@ -20,7 +20,7 @@ struct Colour {
 using Codes = std::array<double, 4>;
 
 Codes CodesOf(F format, Colour c) {
-  if (!CarriesAlpha(format)) c = c.OverBlack();
+  if (!HasAlpha(format)) c = c.OverBlack();
   if (IsLinear(format))
     for (double* v : {&c.r, &c.g, &c.b}) *v = std::pow(*v, 2.4);
   if (AlphaKind(format) == kAlphaPremultiplied) c = {c.r * c.a, c.g * c.a, c.b * c.a, c.a};
@@ -70,9 +70,9 @@ TEST(Meaning, EveryPairOfFormats) {
     for (const F src : RasterFormats())
       for (const F dst : RasterFormats()) {
         // Whether light is added over black before or after linearisation depends on the chain.
-        if (colour.a < 1 && (IsLinear(src) || IsLinear(dst)) && CarriesAlpha(src) != CarriesAlpha(dst)) continue;
+        if (colour.a < 1 && (IsLinear(src) || IsLinear(dst)) && HasAlpha(src) != HasAlpha(dst)) continue;
         // Alpha that the source dropped cannot come back.
-        const Image expected = Encode(dst, CarriesAlpha(src) ? colour : colour.OverBlack());
+        const Image expected = Encode(dst, HasAlpha(src) ? colour : colour.OverBlack());
         const Image result = Encode(src, colour).Converted(dst, 2);
         // Half a code of the coarser end, amplified by Cb's gain of 2 and by division by alpha, once for what comes in
         // and a few times for what is rounded on the way.

@@ -1,6 +1,5 @@
 // Start-up, what it detects, and what can be switched.
 #include <boost/make_shared.hpp>
-#include <fstream>
 #include <map>
 #include <unistd.h>
 

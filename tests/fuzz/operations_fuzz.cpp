@@ -7,7 +7,6 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <string>
 #include <vector>
 
 #include "frame/KernelVariant.h"

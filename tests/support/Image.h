@@ -76,11 +76,6 @@ inline bool IsSettable(VX_PixelFormat f) {
   return std::find(std::begin(kSettable), std::end(kSettable), f) != std::end(kSettable);
 }
 
-// Whether a format has alpha to honour.
-inline bool CarriesAlpha(VX_PixelFormat format) {
-  return AlphaKind(format) == kAlphaStraight || AlphaKind(format) == kAlphaPremultiplied;
-}
-
 // The format of a given name.
 inline VX_PixelFormat FormatByName(const std::string& wanted) {
   const VX_PixelFormat format = VX_PixelFormatFromName(wanted.c_str());

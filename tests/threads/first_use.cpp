@@ -3,13 +3,10 @@
 // still agree. By a caller of another rounding mode: later results must not tell.
 //   vexel_first_use plans | conversions | planar | colour
 #include <barrier>
-#include <bit>
 #include <cfenv>
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
-#include <functional>
-#include <string>
 #include <sys/wait.h>
 #include <thread>
 #include <unistd.h>
