@@ -142,53 +142,103 @@ struct Premultiply8 : Load8 {
 
 // black + (c - black) * (255 / a) in float. The product is off by less than 2^-14 where it matters, and a quotient that
 // is no tie is at least 1/510 away from one; so adding 1/2 + 1/1024 before truncating rounds exactly, ties up.
+template <const Layout& kLayout, size_t kChannel>
+HWY_INLINE I32 RoundedQuotients(F32 c, F32 inverse) {
+  const hn::ScalableTag<float> d;
+  constexpr float kBlack = BlackOf(kLayout, kChannel);
+  if constexpr (IsVuy(kLayout)) c = hn::Sub(c, hn::Set(d, kBlack));
+  return Truncate(hn::Add(hn::Mul(c, inverse), hn::Set(d, kBlack + 0.5f + 1.0f / 1024)));
+}
+
+// Byte kByte of each pixel in all its four bytes, or in the lowest one above which zeros stand.
+template <size_t kByte, bool kInAll>
+HWY_INLINE U8 SpreadByte(U8 v) {
+  constexpr uint8_t b = kByte, no = kInAll ? kByte : 0x80, up = kInAll ? 4 : 0;
+  alignas(16) static constexpr uint8_t kSpread[16] = {
+      b,     no,          no,          no,          b + 4,  no + up,     no + up,     no + up,
+      b + 8, no + 2 * up, no + 2 * up, no + 2 * up, b + 12, no + 3 * up, no + 3 * up, no + 3 * up};
+  return hn::TableLookupBytesOr0(v, hn::LoadDup128(hn::ScalableTag<uint8_t>(), kSpread));
+}
+template <size_t kByte>
+HWY_INLINE F32 FloatsOfByte(U8 v) {
+  return hn::ConvertTo(hn::ScalableTag<float>(), hn::BitCast(hn::ScalableTag<int32_t>(), SpreadByte<kByte, false>(v)));
+}
+
+// c <= a saturates, and gives black where alpha is 0; which must not be divided by, since hosts may trap that.
 template <const Layout& kLayout>
 struct Unpremultiply8 : Load8 {
-  // Byte kByte of each pixel in all its four bytes, or in the lowest one above which zeros stand.
-  template <size_t kByte, bool kInAll>
-  static HWY_INLINE U8 Spread(U8 v) {
-    constexpr uint8_t b = kByte, no = kInAll ? kByte : 0x80, up = kInAll ? 4 : 0;
-    alignas(16) static constexpr uint8_t kSpread[16] = {
-        b,     no,          no,          no,          b + 4,  no + up,     no + up,     no + up,
-        b + 8, no + 2 * up, no + 2 * up, no + 2 * up, b + 12, no + 3 * up, no + 3 * up, no + 3 * up};
-    return hn::TableLookupBytesOr0(v, hn::LoadDup128(hn::ScalableTag<uint8_t>(), kSpread));
-  }
-  template <size_t kByte>
-  static HWY_INLINE F32 Floats(U8 v) {
-    return hn::ConvertTo(hn::ScalableTag<float>(), hn::BitCast(hn::ScalableTag<int32_t>(), Spread<kByte, false>(v)));
-  }
   template <size_t kChannel>
   static HWY_INLINE U32 Channel(U8 v, F32 inverse) {
-    const hn::ScalableTag<float> df;
-    const hn::ScalableTag<uint32_t> du;
+    const hn::ScalableTag<uint32_t> d;
     if constexpr (kChannel == kLayout.alpha) {
-      return hn::And(hn::BitCast(du, v), hn::Set(du, uint32_t{255} << (8 * kChannel)));
+      return hn::And(hn::BitCast(d, v), hn::Set(d, uint32_t{255} << (8 * kChannel)));
     } else {
-      constexpr float kBlack = BlackOf(kLayout, kChannel);
-      auto c = Floats<kChannel>(v);
-      if constexpr (IsVuy(kLayout)) c = hn::Sub(c, hn::Set(df, kBlack));
-      auto q = hn::Add(hn::Mul(c, inverse), hn::Set(df, kBlack + 0.5f + 1.0f / 1024));
-      if constexpr (IsVuy(kLayout)) q = hn::Max(hn::Min(q, hn::Set(df, 255.0f)), hn::Zero(df));
-      return hn::ShiftLeft<8 * kChannel>(hn::BitCast(du, Truncate(q)));
+      const auto q = RoundedQuotients<kLayout, kChannel>(FloatsOfByte<kChannel>(v), inverse);
+      return hn::ShiftLeft<8 * kChannel>(hn::BitCast(d, q));
     }
   }
   static HWY_INLINE U8 MapOne(U8 v) {
-    const hn::ScalableTag<float> df;
-    const auto alpha = Floats<kLayout.alpha>(v);
-    // Alpha 0 must give black, without a division by zero that the host may trap. Without video black, c <= a does it
-    // and saturates too; with it, a huge alpha does.
-    auto divisor = alpha;
-    if constexpr (IsVuy(kLayout)) {
-      divisor = hn::IfThenElse(hn::Eq(alpha, hn::Zero(df)), hn::Set(df, 0x1p40f), alpha);
-    } else {
-      divisor = hn::Max(alpha, hn::Set(df, 1.0f));
-      v = hn::Min(v, Spread<kLayout.alpha, true>(v));
-    }
-    const auto inverse = hn::Div(hn::Set(df, 255.0f), divisor);
+    const hn::ScalableTag<float> d;
+    const auto alpha = FloatsOfByte<kLayout.alpha>(v);
+    const auto inverse = hn::Div(hn::Set(d, 255.0f), hn::Max(alpha, hn::Set(d, 1.0f)));
+    v = hn::Min(v, SpreadByte<kLayout.alpha, true>(v));
     const auto low = hn::Or(Channel<0>(v, inverse), Channel<1>(v, inverse));
     const auto high = hn::Or(Channel<2>(v, inverse), Channel<3>(v, inverse));
     return hn::BitCast(hn::ScalableTag<uint8_t>(), hn::Or(low, high));
   }
+};
+
+// Around video black: packing four vectors' quotients saturates them on both sides. A huge alpha in place of 0 gives
+// black.
+struct UnpremultiplyVuya8 {
+  struct Factors {
+    HWY_INLINE explicit Factors(const uint8_t* in) {
+      const auto v0 = Load8::Load(in, 0), v1 = Load8::Load(in, 1), v2 = Load8::Load(in, 2), v3 = Load8::Load(in, 3);
+      areOpaque = AllOpaque<kVuya, uint8_t>(v0, v1, v2, v3);
+      inverse0 = Inverse(v0), inverse1 = Inverse(v1), inverse2 = Inverse(v2), inverse3 = Inverse(v3);
+    }
+    static HWY_INLINE F32 Inverse(U8 v) {
+      const hn::ScalableTag<float> d;
+      const auto alpha = FloatsOfByte<kVuya.alpha>(v);
+      return hn::Div(hn::Set(d, 255.0f), hn::IfThenElse(hn::Eq(alpha, hn::Zero(d)), hn::Set(d, 0x1p40f), alpha));
+    }
+    F32 inverse0, inverse1, inverse2, inverse3;
+    bool areOpaque;
+  };
+  // In each block of 16 bytes the channel of four pixels of each vector.
+  template <size_t kChannel>
+  static HWY_INLINE U8 Channel(const uint8_t* in, const Factors& factors) {
+    const hn::ScalableTag<int16_t> d;
+    const auto quotients = [&](size_t index, F32 inverse) HWY_ATTR {
+      return RoundedQuotients<kVuya, kChannel>(FloatsOfByte<kChannel>(Load8::Load(in, index)), inverse);
+    };
+    return PackBlocks(hn::ReorderDemote2To(d, quotients(0, factors.inverse0), quotients(1, factors.inverse1)),
+                      hn::ReorderDemote2To(d, quotients(2, factors.inverse2), quotients(3, factors.inverse3)));
+  }
+  static HWY_INLINE void StoreUnder(const uint8_t* in, U16 colors, uint8_t* out, size_t index) {
+    const auto pixels = hn::BitCast(hn::ScalableTag<uint8_t>(), colors);
+    const auto alpha = hn::And(Load8::Load(in, index), ChannelMask<kVuya.alpha, uint8_t>());
+    StoreVector(hn::Or(pixels, alpha), out, index);
+  }
+  static HWY_INLINE void Map(const uint8_t* in, const Factors& factors, uint8_t* out) {
+    const hn::ScalableTag<uint8_t> d;
+    const hn::ScalableTag<uint16_t> d16;
+    if (factors.areOpaque) return EachVector<uint8_t, Same>{}(in, out);
+    const auto v = Channel<0>(in, factors), u = Channel<1>(in, factors), y = Channel<2>(in, factors);
+    const auto vuLow = hn::BitCast(d16, hn::InterleaveLower(d, v, u));
+    const auto vuHigh = hn::BitCast(d16, hn::InterleaveUpper(d, v, u));
+    const auto yLow = hn::BitCast(d16, hn::InterleaveLower(d, y, hn::Zero(d)));
+    const auto yHigh = hn::BitCast(d16, hn::InterleaveUpper(d, y, hn::Zero(d)));
+    StoreUnder(in, hn::InterleaveLower(d16, vuLow, yLow), out, 0);
+    StoreUnder(in, hn::InterleaveUpper(d16, vuLow, yLow), out, 1);
+    StoreUnder(in, hn::InterleaveLower(d16, vuHigh, yHigh), out, 2);
+    StoreUnder(in, hn::InterleaveUpper(d16, vuHigh, yHigh), out, 3);
+  }
+
+ private:
+  struct Same {
+    HWY_INLINE U8 operator()(U8 v) const { return v; }
+  };
 };
 
 // ---- 15u ----
@@ -345,9 +395,13 @@ HWY_ATTR void Premultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
 }
 template <const Layout& kLayout>
 HWY_ATTR void Unpremultiply8u(const uint8_t* src, uint8_t* dst, size_t count) {
-  if (HWY_TARGET == HWY_AVX3 && !IsVuy(kLayout) && HasVbmi())
-    return kLayout.alpha == 3 ? UnpremultiplyLast512(src, dst, count) : UnpremultiplyFirst512(src, dst, count);
-  MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Unpremultiply8<kLayout>>());
+  if constexpr (IsVuy(kLayout)) {
+    MapRowAhead<uint8_t, UnpremultiplyVuya8>(src, dst, count);
+  } else if (HWY_TARGET == HWY_AVX3 && HasVbmi()) {
+    kLayout.alpha == 3 ? UnpremultiplyLast512(src, dst, count) : UnpremultiplyFirst512(src, dst, count);
+  } else {
+    MapRow<uint8_t>(src, dst, count, UnlessOpaque<uint8_t, kLayout, Unpremultiply8<kLayout>>());
+  }
 }
 template <const Layout& kLayout>
 HWY_ATTR void Premultiply15u(const uint8_t* src, uint8_t* dst, size_t count) {
