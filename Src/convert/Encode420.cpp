@@ -282,7 +282,7 @@ VX_Result Encoder::Run(Lines& lines) const noexcept {
     const Pair pair = PairOf(row), next = PairOf(row + 1);
     if (pair.a >= mHeight) continue;
     const int64_t lineB = pair.b < mHeight ? pair.b : pair.a;
-    const bool hasChroma = row < chromaRows;
+    const bool hasChroma = row < chromaRows, streams = stream && hasChroma;  // scratch memory may lie anywhere
     const EncodeLines encode = Choose(mKernels, row);
     const auto chroma = [&](int plane) { return hasChroma ? PlaneRow(plane, row) : scratch.get(); };
     for (int32_t x = 0; x < mWidth; x += part) {
@@ -291,7 +291,7 @@ VX_Result Encoder::Run(Lines& lines) const noexcept {
       const uint8_t* const b = lineB == pair.a ? a : lines.Get(lineB, 1, x, count);
       encode({a, b, PlaneRow(0, pair.a) + x, PlaneRow(0, lineB) + x, chroma(1) + half, chroma(2) + half,
               lines.Address(next.a), lines.Address(next.b), static_cast<size_t>(count),
-              static_cast<size_t>(x + count < mWidth ? count / 2 : chromaWidth - half), stream, x != 0},
+              static_cast<size_t>(x + count < mWidth ? count / 2 : chromaWidth - half), streams, x != 0},
              factors);
     }
   }

@@ -7,6 +7,7 @@
 #include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/PaddedRows.h"
+#include "support/Processor.h"
 #include "support/Reference420.h"
 #include "support/Test.h"
 #include "vexel/host_types.h"
@@ -660,6 +661,36 @@ TEST(Encode420, SavesStepsOfConversions) {
         ASSERT_EQ(VX_Success, Encode420(src.data(), rowBytes, c.from, dst.bytes.data(), format, width, height));
         ASSERT_EQ(expected.bytes, dst.bytes) << VX_PixelFormatName(c.from) << " " << width;
       }
+}
+
+// The last lines of a picture of an odd number of line pairs in fields have chroma that goes nowhere, here to memory of
+// the least alignment that a host may give.
+TEST(Encode420, StreamsWithMemoryOfAnyAlignment) {
+  struct LeastAligned : vexel_host::Allocator {
+    void* Allocate(size_t bytes, size_t* rawSize) noexcept override {
+      ++count;
+      *rawSize = bytes;
+      return static_cast<uint8_t*>(::operator new (bytes + 16, std::align_val_t{128})) + 16;
+    }
+    void Recycle(void* block, size_t) noexcept override {
+      ::operator delete (static_cast<uint8_t*>(block) - 16, std::align_val_t{128});
+    }
+    int count = 0;
+  } allocator;
+  const int width = 40001, height = 6;
+  const F from = F::UYVY_422_32f_709, format = F::YUV_420_MPEG2_FIELD_709;
+  const auto rowBytes = static_cast<int32_t>(UnpaddedRowBytes(from, width));
+  std::vector<uint8_t> src(static_cast<size_t>(rowBytes) * height);
+  Random(1).Fill(src.data(), src.size());
+  Block420 expected(format, width, height);
+  ASSERT_EQ(VX_Success, Encode420(src.data(), rowBytes, from, expected.bytes.data(), format, width, height));
+  const SmallCache cache;
+  LineBytes dst(expected.bytes.size());  // streams need planes on lines of the cache
+  ASSERT_TRUE(vexel_host::SetAllocator(&allocator));
+  EXPECT_EQ(VX_Success, Encode420(src.data(), rowBytes, from, dst.data(), format, width, height));
+  ASSERT_TRUE(vexel_host::SetAllocator(nullptr));
+  EXPECT_GT(allocator.count, 0);
+  EXPECT_TRUE(std::equal(dst.begin(), dst.end(), expected.bytes.begin(), expected.bytes.end()));
 }
 
 TEST(Encode420, Refuses) {
