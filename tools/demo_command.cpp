@@ -199,7 +199,7 @@ Canvas DrawSheet(const std::vector<Clip>& clips) {
 
 void RunDemo(const DemoOptions& options) {
   const ConvertOptions convert{3, std::max(1, options.run.threads)};  // one thread unless asked: speeds compare
-  ContainerOf(options.out);                                           // refused before the work is done
+  OpenSink(options.out, {});                                          // refused before the work is done
   std::vector<Clip> clips;
   for (const std::string& file : options.files) clips.push_back(RunClip(file, convert));
   SavePicture(DrawSheet(clips).Result(), options.out, convert);

@@ -33,6 +33,7 @@ constexpr NamedFill kFills[] = {{"black", VX_FillWithOpaqueBlack, false},
                                 {"transparent-black", VX_FillWithTransparentBlack, true},
                                 {"transparent-white", VX_FillWithTransparentWhite, true}};
 
+bool IsDv(VX_PixelFormat format) { return FrameKind(format) >= 1 && FrameKind(format) <= 8; }
 bool HasFourChannels(VX_PixelFormat format) { return IsRaster(format) && !IsPacked422(format) && !Is10Bit(format); }
 
 struct Bgra {
@@ -55,6 +56,8 @@ Bgra ParseColor(const std::string& text) {
 
 void FillPicture(const Picture& picture, const std::string& color) {
   const std::string format = FormatName(picture.Format());
+  if (IsDv(picture.Format()) && color != "black" && color != "white")
+    throw ToolError(format + (FrameKind(picture.Format()) <= 2 ? " takes black only" : " has no encoder"));
   VX_Result result;
   const NamedFill* const named =
       std::find_if(std::begin(kFills), std::end(kFills), [&](const NamedFill& f) { return color == f.name; });
@@ -66,16 +69,13 @@ void FillPicture(const Picture& picture, const std::string& color) {
   } else {
     const Bgra bgra = ParseColor(color);
     if (!HasFourChannels(picture.Format()))
-      throw ToolError("only formats of four channels take any colour; " + format + " takes black" +
-                      (FrameKind(picture.Format()) == 1 || FrameKind(picture.Format()) == 2 ? "" : " and white"));
+      throw ToolError("only formats of four channels take any colour; " + format + " takes black and white");
     result = VX_FillWithColor(picture.Pixels(), picture.RowBytes(), picture.Width(), picture.Height(), picture.Format(),
                               bgra.bytes, VX_PixelFormat::BGRA_4444_8u);
   }
   CheckResult(result, "cannot fill " + format + " with " + color,
               result == VX_ErrFormatNotHandled ? "; there is no encoder for that" : "");
 }
-
-bool IsDv(VX_PixelFormat format) { return FrameKind(format) >= 1 && FrameKind(format) <= 8; }
 
 // As asked for; a DV frame is as large as its standard says, and only those of 25 Mbit/s have an encoder.
 std::pair<int, int> SizeOf(VX_PixelFormat format, const std::string& size) {

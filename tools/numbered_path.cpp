@@ -28,7 +28,8 @@ std::optional<int64_t> NumberedPath::FirstThere() const {
     int64_t number = 0;
     std::from_chars(name.data() + std::min(name.find_first_not_of(' ', prefix.size()), name.size()),
                     name.data() + name.size(), number);
-    if (name == At(number).substr(before.size() - prefix.size())) first = std::min(first.value_or(number), number);
+    if (number >= 0 && name == At(number).substr(before.size() - prefix.size()) && !entry.is_directory(error))
+      first = std::min(first.value_or(number), number);
   }
   return first;
 }

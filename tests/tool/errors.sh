@@ -33,6 +33,7 @@ refuses 1 'unknown container "gif"' convert picture.png x.png "${to_bgra[@]}" --
 refuses 1 'holds one picture.*out_%04d.png' convert "$clip420" x.png "${to_bgra[@]}" --frames 0-3
 refuses 1 '"x_%04d.raw" would be one file of all frames' convert "$clip420" x_%04d.raw "${to_bgra[@]}"
 refuses 1 'cannot tell from its name.*"x.foo"' demo picture.png -o x.foo
+refuses 1 'not a sequence pattern' demo nowhere.png -o x_%d_%d.png
 refuses 1 'not a sequence pattern' convert "$clip420" 'x_%d_%d.png' "${to_bgra[@]}"
 refuses 1 'has only 24 frames' convert "$clip420" x.png "${to_bgra[@]}" --frames 24
 refuses 1 'not a range of frames' convert "$clip420" x.png "${to_bgra[@]}" --frames 5-3
@@ -54,9 +55,12 @@ refuses 1 'no library format holds yuv422p10le frames coded with the BT.2020 mat
 convert "$clip420" short.raw --format BGRA_4444_8u --frames 22-30
 grep -q 'note: .* ends with frame 23' log || fail "a short file goes unnoticed: $(cat log)"
 
-# Frames of several sizes fit no single file. A sequence is found wherever it begins.
+# Frames of several sizes fit no single file. A sequence is found wherever it begins, which no directory and no name below
+# zero does.
 run fill size_10.png --format BGRX_4444_8u --size 64x48 --color black
 run fill size_11.png --format BGRX_4444_8u --size 32x48 --color white
+cp size_10.png size_-3.png
+mkdir size_5.png
 for name in x.raw x.y4m; do
   refuses 1 'frame 1 is 32x48, those before are 64x48' convert size_%d.png $name "${to_bgra[@]}"
   [ ! -e $name ] || fail "$name of frames of two sizes"

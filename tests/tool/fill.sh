@@ -53,6 +53,8 @@ same same.raw first.raw "a picture mixed with itself"
 
 run fill small.png --format BGRX_4444_8u --size 7x4 --color black
 refuses 1 "PALDV25 has a size of its own" fill f.dv --format PALDV25 --size 720x576 --color black
+refuses 1 "NTSCDV25 takes black only" fill f.dv --format NTSCDV25 --color transparent-white
+refuses 1 "NTSCDV50 has no encoder" fill f.dv --format NTSCDV50 --color '#123456'
 refuses 1 "a DV frame is a file of its own" fill f.png --format PALDV25 --color black
 refuses 1 'UYVY_422_8u has no alpha.*--color black' fill x.raw --format UYVY_422_8u --size 4x4 --color transparent-black
 refuses 1 '"red" is not a colour; write black' fill x.raw --format BGRA_4444_8u --size 4x4 --color red
