@@ -289,10 +289,11 @@ struct Unpremultiply15 : Alpha15<kLayout> {
   static HWY_INLINE U16 PairFactors(U16 v0, U16 v1) {
     const hn::ScalableTag<float> df;
     const hn::ScalableTag<int32_t> di;
-    constexpr int32_t kExponent = 0x7F800000, kOf2To15 = (127 + 15) << 23, kOf1 = 127 << 23;
+    const hn::ScalableTag<uint32_t> du;
+    constexpr uint32_t kExponent = 0x7F800000, kOf2To15 = (127 + 15) << 23, kOf1 = 127 << 23;
     const auto a = hn::Max(hn::Min(hn::BitCast(di, AlphaOf(v0, v1)), Constant(32768)), Constant(1));
     const auto alpha = hn::ConvertTo(df, a);
-    const auto exponent = hn::And(hn::BitCast(di, alpha), Constant(kExponent));
+    const auto exponent = hn::And(hn::BitCast(du, alpha), Constant(kExponent));
     const auto p = hn::BitCast(df, hn::Sub(Constant(kOf2To15 + kOf1), exponent));
     const auto m = hn::Div(Constant(0x1p31f), hn::Mul(alpha, p));
     return PackBlocks(Truncate(hn::Add(m, Constant(0.5f))), Truncate(p));
