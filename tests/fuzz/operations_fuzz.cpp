@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "frame/KernelVariant.h"
+#include "frame/RuntimeRandom.h"
 #include "support/Arena.h"
 #include "support/Formats.h"
 #include "support/Operations.h"
@@ -58,7 +59,12 @@ Operation AnyOperation(Input& input) {
   const Operation all[] = {
       {{a}, to, [=](Sources s, To d) { return Convert(*s, d, option); }},
       {{to}, to, [=](Sources s, To d) { return Rotate(*s, d, other ? -angle : angle, option > 2); }, angle % 180 != 0},
-      {{a, b}, to, [=](Sources s, To d) { return Blend(static_cast<VX_BlendMode>(choice), s[0], s[1], d, x, option); }},
+      {{a, b},
+       to,
+       [=](Sources s, To d) {
+         SeedRuntimeRandom(1);  // which Dissolve of a single row goes on from
+         return Blend(static_cast<VX_BlendMode>(choice), s[0], s[1], d, x, option);
+       }},
       {{a}, to, [=](Sources s, To d) { return ToBlack(*s, d, x, option); }},
       {{a}, to, [=](Sources s, To d) { return ToBlackTested(*s, d, nullptr, option); }},
       {{a, b}, to, [=](Sources s, To d) { return Dissolve(s[0], s[1], d, x, option); }},
