@@ -20,8 +20,6 @@ struct KernelCase {
 };
 
 const KernelCase kCases[] = {
-    {"copy 4", &kCopy4, 4, 4},
-    {"copy 16", &kCopy16, 16, 16},
     {"BGRA8 to ARGB8", &kReverse8u, 4, 4},
     {"BGRA15 to ARGB15", &kReverse15u, 8, 8},
     {"BGRA32f to ARGB32f", &kReverse32f, 16, 16},
