@@ -1,12 +1,10 @@
-#include <cstring>
-
 #include "convert/Unpremultiply512.h"
 #include "convert/Vbmi.h"
 
 namespace vexel {
 namespace {
 
-constexpr size_t kPixels = 32, kBlockBytes = 8 * kPixels, kFetchAhead = 8192;
+constexpr size_t kPixels = 32, kBlockBytes = 8 * kPixels;
 constexpr int kFirsts = 0x88, kSeconds = 0xDD;  // of the pairs of 32-bit lanes of two vectors, block by block
 constexpr __mmask32 kOddWords = 0xAAAAAAAA;
 
@@ -95,34 +93,19 @@ VX_VBMI_INLINE void Divide32(const uint8_t* src, const Alphas<kAlpha>& a, uint8_
   Interleave(OddWords(c0, c1), OddWords(c2, c3), dst + 128);
 }
 
-// Alpha's part is one block ahead: both in a row are a longer chain than processors overlap.
 template <int kAlpha>
-VX_VBMI void Unpremultiply(const uint8_t* src, uint8_t* dst, size_t count) {
-  const size_t blocks = count / kPixels, rest = count % kPixels;
-  if (blocks > 0) {
-    Alphas<kAlpha> now(src);
-    for (size_t i = 0; i < blocks; ++i, src += kBlockBytes, dst += kBlockBytes) {
-      for (size_t line = 0; line < kBlockBytes; line += 64)
-        __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + line));
-      const Alphas<kAlpha> next(i + 1 < blocks ? src + kBlockBytes : src);
-      Divide32<kAlpha>(src, now, dst);
-      now = next;
-    }
-  }
-  if (rest == 0) return;
-  uint8_t in[kBlockBytes] = {}, out[kBlockBytes];
-  std::memcpy(in, src, 8 * rest);
-  Divide32<kAlpha>(in, Alphas<kAlpha>(in), out);
-  std::memcpy(dst, out, 8 * rest);
-}
+struct Ahead : Alphas<kAlpha> {
+  VX_VBMI_INLINE explicit Ahead(const uint8_t* src) : Alphas<kAlpha>(src) {}
+  VX_VBMI_INLINE void Map(const uint8_t* src, uint8_t* dst) const { Divide32<kAlpha>(src, *this, dst); }
+};
 
 }  // namespace
 
-void UnpremultiplyLast15u512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
-  Unpremultiply<3>(src, dst, count);
+VX_VBMI void UnpremultiplyLast15u512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
+  MapRowAhead512<Ahead<3>, kPixels, 8>(src, dst, count);
 }
-void UnpremultiplyFirst15u512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
-  Unpremultiply<0>(src, dst, count);
+VX_VBMI void UnpremultiplyFirst15u512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
+  MapRowAhead512<Ahead<0>, kPixels, 8>(src, dst, count);
 }
 
 }  // namespace vexel

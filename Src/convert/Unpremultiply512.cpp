@@ -1,7 +1,5 @@
 #include "convert/Unpremultiply512.h"
 
-#include <cstring>
-
 #include "convert/Vbmi.h"
 
 namespace vexel {
@@ -23,7 +21,7 @@ struct Factors {
 };
 constexpr Factors kFactors;
 
-constexpr size_t kPixels = 64, kBlockBytes = 4 * kPixels, kFetchAhead = 8192;
+constexpr size_t kPixels = 64;
 
 // Both products of 16-bit lanes, with the result in the high byte.
 VX_VBMI_INLINE __m512i Quotients(__m512i channels, __m512i p, __m512i m) {
@@ -102,34 +100,19 @@ VX_VBMI_INLINE void Divide64(const uint8_t* src, const Alphas<kAlpha>& a, uint8_
                    _mm512_unpackhi_epi8(a.mLow, ones), dst + 128);
 }
 
-// The factors are looked up one block ahead: both parts in a row are a longer chain than processors overlap.
 template <int kAlpha>
-VX_VBMI void Unpremultiply(const uint8_t* src, uint8_t* dst, size_t count) {
-  const size_t blocks = count / kPixels, rest = count % kPixels;
-  if (blocks > 0) {
-    Alphas<kAlpha> now(src);
-    for (size_t i = 0; i < blocks; ++i, src += kBlockBytes, dst += kBlockBytes) {
-      for (size_t line = 0; line < kBlockBytes; line += 64)
-        __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(src) + kFetchAhead + line));
-      const Alphas<kAlpha> next(i + 1 < blocks ? src + kBlockBytes : src);
-      Divide64<kAlpha>(src, now, dst);
-      now = next;
-    }
-  }
-  if (rest == 0) return;
-  uint8_t in[kBlockBytes] = {}, out[kBlockBytes];
-  std::memcpy(in, src, 4 * rest);
-  Divide64<kAlpha>(in, Alphas<kAlpha>(in), out);
-  std::memcpy(dst, out, 4 * rest);
-}
+struct Ahead : Alphas<kAlpha> {
+  VX_VBMI_INLINE explicit Ahead(const uint8_t* src) : Alphas<kAlpha>(src) {}
+  VX_VBMI_INLINE void Map(const uint8_t* src, uint8_t* dst) const { Divide64<kAlpha>(src, *this, dst); }
+};
 
 }  // namespace
 
-void UnpremultiplyLast512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
-  Unpremultiply<3>(src, dst, count);
+VX_VBMI void UnpremultiplyLast512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
+  MapRowAhead512<Ahead<3>, kPixels, 4>(src, dst, count);
 }
-void UnpremultiplyFirst512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
-  Unpremultiply<0>(src, dst, count);
+VX_VBMI void UnpremultiplyFirst512(const uint8_t* src, uint8_t* dst, size_t count) noexcept {
+  MapRowAhead512<Ahead<0>, kPixels, 4>(src, dst, count);
 }
 
 }  // namespace vexel
